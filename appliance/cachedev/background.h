@@ -1,0 +1,24 @@
+// Going to the background so that the command returns when, and only when, its outcome is known.
+//
+// The process is split before anything else happens. The parent waits and ends with the daemon's
+// outcome; the daemon goes on, may still print to the terminal, and reports once that it is ready.
+// To be used from one thread before others are started, except BackgroundReady.
+#pragma once
+
+// The daemon's end of the line to the waiting parent.
+struct Background {
+    int readyFd = -1; // -1: not in the background, or already reported
+    Background() = default;
+    ~Background();
+    Background(const Background &) = delete;
+    Background &operator=(const Background &) = delete;
+};
+
+// Splits the process. Returns in the daemon only, with 0, or with -1 when it cannot be split
+// (message on standard error). The parent ends: with 0 after BackgroundReady, with 1 when the
+// daemon ended before that.
+int BackgroundStart(Background &background);
+
+// Lets the parent end with 0 and leaves terminal and folder: a session of its own, standard streams
+// on /dev/null, working folder "/". Does nothing without a waiting parent. Call it once.
+void BackgroundReady(Background &background);

@@ -1,0 +1,152 @@
+#include "cachedev/cache_images.h"
+
+#include "cachedev/driver_requests.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace {
+
+using TransferCall = ssize_t (*)(int, const struct iovec *, int, off_t);
+
+// preadv and pwritev may move less than was asked for; goes on until all is moved.
+int TransferAll(TransferCall call, int fd, uint64_t offset, ImagePieces pieces) {
+    struct iovec *part = pieces.parts;
+    struct iovec *const end = pieces.parts + pieces.count;
+    while (true) {
+        while (part != end && part->iov_len == 0)
+            ++part;
+        if (part == end)
+            return 0;
+        const ssize_t moved =
+            call(fd, part, static_cast<int>(end - part), static_cast<off_t>(offset));
+        if (moved < 0 && errno == EINTR)
+            continue;
+        if (moved < 0)
+            return -errno;
+        if (moved == 0)
+            return -EIO;
+        offset += static_cast<uint64_t>(moved);
+        for (auto left = static_cast<size_t>(moved); left > 0;) {
+            const size_t step = std::min(left, part->iov_len);
+            part->iov_base = static_cast<char *>(part->iov_base) + step;
+            part->iov_len -= step;
+            left -= step;
+            if (part->iov_len == 0)
+                ++part;
+        }
+    }
+}
+
+int OpenImage(const std::string &path, const char *what, ImageFile &image, struct stat &status,
+              uint64_t &bytes, std::string &error) {
+    const std::string name = std::string(what) + " image " + path;
+    image.fd = open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOCTTY | O_NONBLOCK);
+    if (image.fd < 0) {
+        error = "cannot open the " + name + ": " + strerror(errno);
+        return -1;
+    }
+    if (fstat(image.fd, &status) != 0 || (!S_ISREG(status.st_mode) && !S_ISBLK(status.st_mode))) {
+        error = "the " + name + " is neither a regular file nor a block device";
+        return -1;
+    }
+    // A second cache device on the same image would change it behind this one's back. Locks on
+    // block devices are left alone: udev takes them now and then while it probes.
+    if (S_ISREG(status.st_mode) && flock(image.fd, LOCK_EX | LOCK_NB) != 0) {
+        error = "the " + name + " is in use by another cache device";
+        return -1;
+    }
+    const off_t end = lseek(image.fd, 0, SEEK_END); // also right for a block device
+    if (end < 0) {
+        error = "cannot find the size of the " + name + ": " + strerror(errno);
+        return -1;
+    }
+    bytes = static_cast<uint64_t>(end);
+    return 0;
+}
+
+bool IsSameImage(const struct stat &one, const struct stat &other) {
+    if (S_ISBLK(one.st_mode) && S_ISBLK(other.st_mode))
+        return one.st_rdev == other.st_rdev;
+    return one.st_dev == other.st_dev && one.st_ino == other.st_ino;
+}
+
+} // namespace
+
+ImageFile::~ImageFile() {
+    if (fd >= 0)
+        close(fd);
+}
+
+int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, CacheImages &images,
+                    std::string &error) {
+    struct stat backing = {};
+    struct stat ssd = {};
+    if (stat(backingPath.c_str(), &backing) == 0 && stat(ssdPath.c_str(), &ssd) == 0 &&
+        IsSameImage(backing, ssd)) {
+        error = "the backing image and the SSD image are the same file";
+        return -1;
+    }
+    uint64_t ssdBytes = 0;
+    if (OpenImage(backingPath, "backing", images.backing, backing, images.deviceBytes, error) != 0)
+        return -1;
+    if (OpenImage(ssdPath, "SSD", images.ssd, ssd, ssdBytes, error) != 0)
+        return -1;
+    if (images.deviceBytes == 0 || images.deviceBytes % kSectorBytes != 0) {
+        error = "the size of the backing image (" + std::to_string(images.deviceBytes) +
+                " bytes) is not a multiple of 512 bytes above 0";
+        return -1;
+    }
+    if (ssdBytes < kBlockBytes) {
+        error = "the SSD image (" + std::to_string(ssdBytes) +
+                " bytes) is smaller than one cache block (65536 bytes)";
+        return -1;
+    }
+    images.slots =
+        static_cast<uint32_t>(std::min<uint64_t>(ssdBytes / kBlockBytes, UINT32_MAX - 1));
+    return 0;
+}
+
+int CacheImagesReadBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
+    return TransferAll(preadv, images.backing.fd, offset, pieces);
+}
+
+int CacheImagesWriteBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
+    return TransferAll(pwritev, images.backing.fd, offset, pieces);
+}
+
+int CacheImagesReadSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
+    return TransferAll(preadv, images.ssd.fd, offset, pieces);
+}
+
+int CacheImagesWriteSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
+    return TransferAll(pwritev, images.ssd.fd, offset, pieces);
+}
+
+ImagePieces ImagePiecesSlice(const ImagePieces &pieces, size_t start, size_t length) {
+    ImagePieces slice = pieces;
+    for (int i = 0; i < slice.count; ++i) {
+        struct iovec &part = slice.parts[i];
+        const size_t skipped = std::min(start, part.iov_len);
+        part.iov_base = static_cast<char *>(part.iov_base) + skipped;
+        part.iov_len = std::min(part.iov_len - skipped, length);
+        start -= skipped;
+        length -= part.iov_len;
+    }
+    return slice;
+}
+
+int CacheImagesSyncBacking(const CacheImages &images) {
+    return fdatasync(images.backing.fd) == 0 ? 0 : -errno;
+}
+
+int CacheImagesSyncAll(const CacheImages &images) {
+    const int backing = CacheImagesSyncBacking(images);
+    const int ssd = fdatasync(images.ssd.fd) == 0 ? 0 : -errno;
+    return backing != 0 ? backing : ssd;
+}

@@ -1,0 +1,54 @@
+// The two images behind the emulated cache device and the I/O on them.
+//
+// The backing image holds the whole device; the SSD image holds one cache block per slot, slot n at
+// byte n * kBlockBytes. Nothing here knows which block is in which slot, and nothing is locked:
+// any number of threads may call these functions, and the caller sees to it that nobody reads what
+// somebody else is writing.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+#include <sys/uio.h>
+
+// An open image; closed with the record.
+struct ImageFile {
+    int fd = -1;
+    ImageFile() = default;
+    ~ImageFile();
+    ImageFile(const ImageFile &) = delete;
+    ImageFile &operator=(const ImageFile &) = delete;
+};
+
+struct CacheImages {
+    ImageFile backing;
+    ImageFile ssd;
+    uint64_t deviceBytes = 0; // size of the backing image, a multiple of 512
+    uint32_t slots = 0;       // whole cache blocks in the SSD image
+};
+
+// Memory pieces whose bytes follow each other in an image. 1 .. 3 pieces.
+struct ImagePieces {
+    struct iovec parts[3]; // lengths in bytes, may be 0
+    int count;
+};
+
+// Opens both images for reading and writing. Regular files, which are locked against a second cache
+// device, and block devices are taken. 0, or -1 with a message for the user in `error`.
+int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, CacheImages &images,
+                    std::string &error);
+
+// Transfers, all bytes or an error: 0, or a negative errno (-EIO when the image ends too early).
+int CacheImagesReadBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);
+int CacheImagesWriteBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);
+int CacheImagesReadSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);
+int CacheImagesWriteSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);
+
+// The `length` bytes from byte `start` on of the memory that `pieces` describe.
+ImagePieces ImagePiecesSlice(const ImagePieces &pieces, size_t start, size_t length);
+
+// Makes what was written to the backing image durable. 0 or a negative errno.
+int CacheImagesSyncBacking(const CacheImages &images);
+
+// Makes both images durable. 0 or a negative errno.
+int CacheImagesSyncAll(const CacheImages &images);

@@ -1,0 +1,109 @@
+#include "cachedev/cachedev_mount.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <fcntl.h>
+#include <filesystem>
+#include <memory>
+#include <sys/stat.h>
+#include <system_error>
+
+namespace {
+
+struct FuseDestroyer {
+    void operator()(struct fuse *fuse) const { fuse_destroy(fuse); }
+};
+struct FuseUnmounter {
+    void operator()(struct fuse *fuse) const { fuse_unmount(fuse); }
+};
+struct SignalRemover {
+    void operator()(struct fuse_session *session) const { fuse_remove_signal_handlers(session); }
+};
+struct LoopConfigDestroyer {
+    void operator()(struct fuse_loop_config *config) const { fuse_loop_cfg_destroy(config); }
+};
+struct ArgumentFreer {
+    void operator()(struct fuse_args *arguments) const { fuse_opt_free_args(arguments); }
+};
+
+using FusePtr = std::unique_ptr<struct fuse, FuseDestroyer>;
+
+FusePtr MakeFuse(ServedDevice &served) {
+    struct fuse_args arguments = FUSE_ARGS_INIT(0, nullptr);
+    const std::unique_ptr<struct fuse_args, ArgumentFreer> freeArguments(&arguments);
+    for (const char *argument :
+         {"veskcachedev", "-o", "fsname=veskcachedev,subtype=veskcachedev,default_permissions"}) {
+        if (fuse_opt_add_arg(&arguments, argument) != 0)
+            return nullptr;
+    }
+    const struct fuse_operations operations = CachedevFuseOperations();
+    return FusePtr(fuse_new(&arguments, &operations, sizeof operations, &served));
+}
+
+bool IsMountPoint(const std::string &folder) {
+    struct statx status = {};
+    return statx(AT_FDCWD, folder.c_str(), AT_NO_AUTOMOUNT, 0, &status) == 0 &&
+           (status.stx_attributes & STATX_ATTR_MOUNT_ROOT) != 0;
+}
+
+} // namespace
+
+int CachedevPrepareFolder(const std::string &folder, std::string &error) {
+    std::error_code code;
+    std::filesystem::create_directories(folder, code);
+    // What a killed daemon leaves mounted answers everything with this error.
+    if (code == std::errc::not_connected) {
+        error = folder +
+                " is still the mount point of a cache device that has ended; run: umount " + folder;
+        return -1;
+    }
+    if (code) {
+        error = "cannot make the folder " + folder + ": " + code.message();
+        return -1;
+    }
+    if (IsMountPoint(folder)) {
+        error = folder + " is a mount point already";
+        return -1;
+    }
+    const bool isEmpty = std::filesystem::is_empty(folder, code);
+    if (code || !isEmpty) {
+        error = "the folder " + folder +
+                (code ? " cannot be read: " + code.message()
+                      : " is not empty: what it holds would be hidden behind the device");
+        return -1;
+    }
+    return 0;
+}
+
+int CachedevServe(ServedDevice &served, const std::string &folder) {
+    const FusePtr fuse = MakeFuse(served);
+    if (!fuse) {
+        fprintf(stderr, "veskcachedev: libfuse cannot be started\n");
+        return -1;
+    }
+    // libfuse names the cause itself: no /dev/fuse, no right to mount.
+    if (fuse_mount(fuse.get(), folder.c_str()) != 0) {
+        fprintf(stderr, "veskcachedev: cannot mount a FUSE filesystem on %s\n", folder.c_str());
+        return -1;
+    }
+    const std::unique_ptr<struct fuse, FuseUnmounter> unmount(fuse.get());
+    struct fuse_session *const session = fuse_get_session(fuse.get());
+    if (fuse_set_signal_handlers(session) != 0) {
+        fprintf(stderr, "veskcachedev: cannot set the signal handlers\n");
+        return -1;
+    }
+    const std::unique_ptr<struct fuse_session, SignalRemover> removeHandlers(session);
+    const std::unique_ptr<struct fuse_loop_config, LoopConfigDestroyer> config(
+        fuse_loop_cfg_create());
+    if (!config)
+        return -1;
+    // One descriptor per thread keeps the threads out of each other's queues.
+    fuse_loop_cfg_set_clone_fd(config.get(), 1);
+    const int result = fuse_loop_mt(fuse.get(), config.get());
+    if (result < 0) { // above 0: the signal that ended it
+        fprintf(stderr, "veskcachedev: serving ended with an error: %s\n", strerror(-result));
+        return -1;
+    }
+    return 0;
+}

@@ -1,0 +1,24 @@
+// The command line of veskcachedev. Parsing uses getopt_long: one thread at a time.
+#pragma once
+
+#include "cachedev/cache_device.h"
+
+#include <string>
+
+struct CachedevOptions {
+    std::string folder;      // absolute path of the folder that becomes the mount point
+    std::string deviceName;  // file name of the device in it
+    std::string backingPath; // as given
+    std::string ssdPath;     // as given
+    std::string pidFile;     // absolute; empty: none
+    CacheSettings settings;
+    bool foreground = false;
+    bool help = false; // print the usage and do nothing else
+};
+
+// Fills `options` from the arguments of main. 0, or -1 with a message for the user in `error`. With
+// --help nothing else is checked.
+int CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options, std::string &error);
+
+// The usage text.
+const char *CachedevUsage();

@@ -1,0 +1,85 @@
+// veskcachedev: serves an emulated cache device through FUSE.
+#include "cachedev/background.h"
+#include "cachedev/cache_device.h"
+#include "cachedev/cachedev_mount.h"
+#include "cachedev/cachedev_options.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <ctime>
+#include <exception>
+#include <fstream>
+#include <unistd.h>
+
+namespace {
+
+int Fail(const std::string &message) {
+    fprintf(stderr, "veskcachedev: %s\n", message.c_str());
+    return 1;
+}
+
+// The file that holds the daemon's process id; removed with the record.
+struct PidFile {
+    std::string path; // empty: none
+    PidFile() = default;
+    ~PidFile() {
+        if (!path.empty())
+            unlink(path.c_str());
+    }
+    PidFile(const PidFile &) = delete;
+    PidFile &operator=(const PidFile &) = delete;
+};
+
+int WritePidFile(const std::string &path, PidFile &file) {
+    std::ofstream stream(path, std::ios::trunc);
+    stream << getpid() << '\n';
+    if (!stream.flush())
+        return -1;
+    file.path = path;
+    return 0;
+}
+
+int Run(int argc, char **argv) {
+    CachedevOptions options;
+    std::string error;
+    if (CachedevOptionsParse(argc, argv, options, error) != 0)
+        return Fail(error + "\nTry 'veskcachedev --help'.");
+    if (options.help) {
+        fputs(CachedevUsage(), stdout);
+        return fflush(stdout) == 0 ? 0 : 1;
+    }
+    Background background;
+    if (!options.foreground && BackgroundStart(background) != 0)
+        return 1;
+
+    CacheDevice device;
+    device.settings = options.settings;
+    if (CacheImagesOpen(options.backingPath, options.ssdPath, device.images, error) != 0)
+        return Fail(error);
+    CacheDeviceStart(device);
+    if (CachedevPrepareFolder(options.folder, error) != 0)
+        return Fail(error);
+    PidFile pidFile;
+    if (!options.pidFile.empty() && WritePidFile(options.pidFile, pidFile) != 0)
+        return Fail("cannot write " + options.pidFile + ": " + strerror(errno));
+
+    const std::string devicePath = "/" + options.deviceName;
+    ServedDevice served = {device, devicePath, devicePath + ".json", time(nullptr),
+                           [&background] { BackgroundReady(background); }};
+    const int result = CachedevServe(served, options.folder);
+    const int synced = CacheImagesSyncAll(device.images);
+    if (synced != 0)
+        return Fail(std::string("cannot sync the images: ") + strerror(-synced));
+    return result == 0 ? 0 : 1;
+}
+
+} // namespace
+
+int main(int argc, char **argv) {
+    try {
+        return Run(argc, argv);
+    } catch (const std::exception &failure) {
+        return Fail(failure.what());
+    }
+}

@@ -1,0 +1,70 @@
+#include "cachedev/state_json.h"
+
+#include "cachedev/pin_bitmap_runs.h"
+
+#include <json/json.h>
+
+namespace {
+
+Json::Value Number(uint64_t value) {
+    return Json::Value(static_cast<Json::UInt64>(value));
+}
+
+Json::Value Pair(uint64_t first, uint64_t second) {
+    Json::Value pair(Json::arrayValue);
+    pair.append(Number(first));
+    pair.append(Number(second));
+    return pair;
+}
+
+Json::Value RunArray(const std::vector<BlockRun> &runs) {
+    Json::Value array(Json::arrayValue);
+    for (const BlockRun &run : runs)
+        array.append(Pair(run.first, run.count));
+    return array;
+}
+
+Json::Value RequestCounts(const RequestCounters &requests) {
+    Json::Value counts(Json::objectValue);
+    counts["setBitmap"] = Number(requests.setBitmap);
+    counts["queryBitmapSet"] = Number(requests.queryBitmapSet);
+    counts["unpinRanges"] = Number(requests.unpinRanges);
+    counts["unpinAll"] = Number(requests.unpinAll);
+    counts["queryAllUnpinned"] = Number(requests.queryAllUnpinned);
+    counts["getSize"] = Number(requests.getSize);
+    counts["refused"] = Number(requests.refused);
+    return counts;
+}
+
+} // namespace
+
+std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
+    Json::Value state(Json::objectValue);
+    state["pid"] = static_cast<Json::Int64>(pid);
+    state["deviceBytes"] = Number(snapshot.deviceBytes);
+    state["blockBytes"] = Number(kBlockBytes);
+    state["slots"] = Number(snapshot.slotBlocks.size());
+    state["bitmapSet"] = snapshot.bitmap != nullptr;
+    state["bitmapBits"] =
+        RunArray(snapshot.bitmap ? PinBitmapRuns(*snapshot.bitmap) : std::vector<BlockRun>());
+    state["pinned"] = RunArray(snapshot.pinned);
+    state["pinnedBlocks"] = Number(snapshot.pinnedBlocks);
+    state["cachedBlocks"] = Number(snapshot.cachedBlocks);
+    Json::Value &slotBlocks = state["slotBlocks"] = Json::Value(Json::arrayValue);
+    for (const uint64_t block : snapshot.slotBlocks)
+        slotBlocks.append(block == kNoBlock ? Json::Value(-1) : Number(block));
+    state["hits"] = Number(snapshot.counters.hits);
+    state["misses"] = Number(snapshot.counters.misses);
+    state["ssdReads"] = Number(snapshot.counters.ssdReads);
+    state["backingReads"] = Number(snapshot.counters.backingReads);
+    state["writes"] = Number(snapshot.counters.writes);
+    state["evictions"] = Number(snapshot.evictions);
+    state["ioctls"] = RequestCounts(snapshot.requests);
+    Json::Value &lastUnpin = state["lastUnpin"] = Json::Value(Json::arrayValue);
+    for (const SectorRange &range : snapshot.lastUnpin)
+        lastUnpin.append(Pair(range.startSector, range.sectorCount));
+
+    Json::StreamWriterBuilder writer;
+    writer["indentation"] = ""; // one line: some thousand slots are polled often
+    return Json::writeString(writer, state) + "\n";
+}

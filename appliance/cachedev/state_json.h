@@ -1,0 +1,10 @@
+// The state file of the cache device: a snapshot as JSON.
+#pragma once
+
+#include "cachedev/cache_device.h"
+
+#include <string>
+#include <sys/types.h>
+
+// The snapshot as one line of JSON with a line feed at its end; `pid` is the daemon's. Pure.
+std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid);

@@ -1,0 +1,85 @@
+#include "flash_cache/cache_config.h"
+
+#include <json/json.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <memory>
+
+namespace {
+
+constexpr char kDefaultPath[] = "/etc/veskflashcache.json";
+constexpr std::streamsize kMaxBytes = std::streamsize{1024} * 1024;
+constexpr int kMaxDepth =
+    16; // of nested values: the form needs three, the rest may be ignored members
+
+// The whole text of a file of a configuration's size. False: unreadable or larger.
+bool TextRead(const std::string &path, std::string &text) {
+    std::ifstream file(path, std::ios::binary);
+    text.resize(static_cast<size_t>(kMaxBytes) + 1);
+    file.read(text.data(), kMaxBytes + 1);
+    // The end of the file must come first, or the text is too long; a read error sets badbit.
+    if (!file.eof() || file.bad()) {
+        return false;
+    }
+    text.resize(static_cast<size_t>(file.gcount()));
+    return true;
+}
+
+bool JsonParse(const std::string &text, Json::Value &document) {
+    Json::CharReaderBuilder builder;
+    Json::CharReaderBuilder::strictMode(&builder.settings_);
+    builder["stackLimit"] = kMaxDepth;
+    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+    try {
+        return reader->parse(text.data(), text.data() + text.size(), &document, nullptr);
+    } catch (const Json::Exception &) {
+        return false; // nested too deeply
+    }
+}
+
+// A member's text. False: absent, no text, or one that does not survive as a C string.
+bool TextGet(const Json::Value &object, const char *name, std::string &text) {
+    const Json::Value &value = object[name];
+    if (!value.isString()) {
+        return false;
+    }
+    text = value.asString();
+    return !text.empty() && text.find('\0') == std::string::npos;
+}
+
+} // namespace
+
+std::string CacheConfigPath() {
+    const char *path = secure_getenv("VESK_FLASHCACHE_CONFIG");
+    return path == nullptr || *path == '\0' ? kDefaultPath : path;
+}
+
+bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &entries) {
+    entries.clear();
+    std::error_code error;
+    const std::filesystem::file_status status = std::filesystem::status(path, error);
+    if (status.type() == std::filesystem::file_type::not_found) {
+        return true;
+    }
+    // Opening a FIFO would wait for a writer.
+    std::string text;
+    Json::Value document;
+    if (!std::filesystem::is_regular_file(status) || !TextRead(path, text) ||
+        !JsonParse(text, document) || !document.isObject() || !document["caches"].isArray()) {
+        return false;
+    }
+    std::vector<CacheConfigEntry> caches;
+    for (const Json::Value &cache : document["caches"]) {
+        CacheConfigEntry entry;
+        if (!cache.isObject() || !TextGet(cache, "spaceUuid", entry.spaceUuid) ||
+            !TextGet(cache, "ssdPath", entry.ssdPath) ||
+            !TextGet(cache, "cachePath", entry.cachePath)) {
+            return false;
+        }
+        caches.push_back(std::move(entry));
+    }
+    entries.swap(caches);
+    return true;
+}

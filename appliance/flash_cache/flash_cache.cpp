@@ -1,0 +1,140 @@
+#include "vesk/flash_cache.h"
+
+#include "flash_cache/cache_config.h"
+#include "flash_cache/cache_device.h"
+
+#include <cstdlib>
+#include <cstring>
+#include <exception>
+#include <memory>
+
+namespace {
+
+constexpr int32_t kConfigBySpaceUuid = 2;
+constexpr int32_t kStatBySsdPath = 3;
+
+struct ConfigDeleter {
+    void operator()(VESKFlashCacheConfig *config) const { VESKFlashCacheConfigFree(config); }
+};
+
+template <typename Record> Record *RecordAllocate() {
+    return static_cast<Record *>(std::calloc(1, sizeof(Record)));
+}
+
+enum class Lookup { Found, NotFound, Failed };
+
+// Finds the first cache whose `field` has this text.
+Lookup CacheFind(std::string CacheConfigEntry::*field, const char *text, CacheConfigEntry &cache) {
+    std::vector<CacheConfigEntry> caches;
+    if (!CacheConfigRead(CacheConfigPath(), caches)) {
+        return Lookup::Failed;
+    }
+    for (CacheConfigEntry &candidate : caches) {
+        if (candidate.*field == text) {
+            cache = std::move(candidate);
+            return Lookup::Found;
+        }
+    }
+    return Lookup::NotFound;
+}
+
+int ConfigGet(const char *spaceUuid, VESKFlashCacheConfig **config) {
+    CacheConfigEntry cache;
+    const Lookup lookup = CacheFind(&CacheConfigEntry::spaceUuid, spaceUuid, cache);
+    if (lookup != Lookup::Found) {
+        return lookup == Lookup::NotFound ? 0 : -1;
+    }
+    std::unique_ptr<VESKFlashCacheConfig, ConfigDeleter> found(
+        RecordAllocate<VESKFlashCacheConfig>());
+    if (found == nullptr || (found->ssdPath = strdup(cache.ssdPath.c_str())) == nullptr) {
+        return -1;
+    }
+    *config = found.release();
+    return 1;
+}
+
+int StatGet(const char *ssdPath, VESKFlashCacheStat **stat) {
+    CacheConfigEntry cache;
+    const Lookup lookup = CacheFind(&CacheConfigEntry::ssdPath, ssdPath, cache);
+    if (lookup != Lookup::Found) {
+        return lookup == Lookup::NotFound ? 0 : -1;
+    }
+    const CacheDeviceState state = CacheDeviceAsk(cache.cachePath);
+    VESKFlashCacheStat *found = RecordAllocate<VESKFlashCacheStat>();
+    if (found == nullptr) {
+        return -1;
+    }
+    found->state = state.isUp ? 1 : 0;
+    found->supportPin = state.supportsPin ? 1 : 0;
+    *stat = found;
+    return 1;
+}
+
+int CachePathGet(const char *ssdPath, char *buffer, size_t size) {
+    CacheConfigEntry cache;
+    if (CacheFind(&CacheConfigEntry::ssdPath, ssdPath, cache) != Lookup::Found ||
+        cache.cachePath.size() >= size) {
+        return 0;
+    }
+    std::memcpy(buffer, cache.cachePath.c_str(), cache.cachePath.size() + 1);
+    return 1;
+}
+
+} // namespace
+
+extern "C" int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,
+                                          VESKFlashCacheConfig **config) {
+    if (config == nullptr) {
+        return -1;
+    }
+    *config = nullptr;
+    if (query == nullptr || query->kind != kConfigBySpaceUuid || query->spaceUuid == nullptr) {
+        return -1;
+    }
+    try {
+        return ConfigGet(query->spaceUuid, config);
+    } catch (const std::exception &) {
+        return -1;
+    }
+}
+
+extern "C" void VESKFlashCacheConfigFree(VESKFlashCacheConfig *config) {
+    if (config != nullptr) {
+        std::free(config->ssdPath);
+        std::free(config);
+    }
+}
+
+extern "C" int VESKFlashCacheStatGet(const VESKFlashCacheStatQuery *query,
+                                     VESKFlashCacheStat **stat) {
+    if (stat == nullptr) {
+        return -1;
+    }
+    *stat = nullptr;
+    if (query == nullptr || query->kind != kStatBySsdPath || query->ssdPath == nullptr) {
+        return -1;
+    }
+    try {
+        return StatGet(query->ssdPath, stat);
+    } catch (const std::exception &) {
+        return -1;
+    }
+}
+
+extern "C" void VESKFlashCacheStatFree(VESKFlashCacheStat **stat) {
+    if (stat != nullptr) {
+        std::free(*stat);
+        *stat = nullptr;
+    }
+}
+
+extern "C" int VESKFlashcacheGetCachePath(const char *ssdPath, char *buffer, size_t size) {
+    if (ssdPath == nullptr || buffer == nullptr) {
+        return 0;
+    }
+    try {
+        return CachePathGet(ssdPath, buffer, size);
+    } catch (const std::exception &) {
+        return 0;
+    }
+}

@@ -1,0 +1,63 @@
+#include "storage_core/block_device.h"
+
+#include <blkid/blkid.h>
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
+
+#include <cstdlib>
+#include <memory>
+
+namespace {
+
+struct ProbeDeleter {
+    void operator()(blkid_struct_probe *probe) const { blkid_free_probe(probe); }
+};
+struct FreeDeleter {
+    void operator()(char *text) const { std::free(text); }
+};
+
+} // namespace
+
+std::string BlockDeviceOfMount(const MountEntry &mount) {
+    // A source such as "tank/data" or "none" must not be looked up in the current directory.
+    const bool isPath = !mount.source.empty() && mount.source.front() == '/';
+    const dev_t number = isPath ? BlockDeviceNumber(mount.source) : 0;
+    if (major(mount.device) == 0) {
+        // Any filesystem can be given a device path as its source ("mount -t tmpfs /dev/sda1 ..."),
+        // but of those without a device number only btrfs means it.
+        return mount.type == "btrfs" && number != 0 ? mount.source : std::string();
+    }
+    return number == mount.device ? mount.source : BlockDeviceByNumber(mount.device);
+}
+
+std::string BlockDeviceByNumber(dev_t device) {
+    const std::unique_ptr<char, FreeDeleter> name(blkid_devno_to_devname(device));
+    if (name == nullptr || BlockDeviceNumber(name.get()) != device) {
+        return {};
+    }
+    return name.get();
+}
+
+dev_t BlockDeviceNumber(const std::string &devicePath) {
+    struct stat status = {};
+    if (stat(devicePath.c_str(), &status) != 0 || !S_ISBLK(status.st_mode)) {
+        return 0;
+    }
+    return status.st_rdev;
+}
+
+std::string BlockDeviceProbe(const std::string &devicePath, const char *name) {
+    const std::unique_ptr<blkid_struct_probe, ProbeDeleter> probe(
+        blkid_new_probe_from_filename(devicePath.c_str()));
+    if (probe == nullptr || blkid_probe_enable_superblocks(probe.get(), 1) != 0 ||
+        blkid_probe_set_superblocks_flags(probe.get(), BLKID_SUBLKS_UUID | BLKID_SUBLKS_TYPE) !=
+            0 ||
+        blkid_do_safeprobe(probe.get()) != 0) {
+        return {};
+    }
+    const char *value = nullptr;
+    if (blkid_probe_lookup_value(probe.get(), name, &value, nullptr) != 0 || value == nullptr) {
+        return {};
+    }
+    return value;
+}

@@ -1,0 +1,30 @@
+// Block devices: their paths, and what a probe of their superblocks tells.
+//
+// Thread rule: no state; the functions are independent of each other.
+#ifndef VESK_STORAGE_CORE_BLOCK_DEVICE_H
+#define VESK_STORAGE_CORE_BLOCK_DEVICE_H
+
+#include "storage_core/mount_table.h"
+
+#include <sys/types.h>
+
+#include <string>
+
+// The path of the block device that a mounted filesystem sits on, or an empty text where it has
+// none. The mount's source is the path if it is a node of that very device; where it is not
+// ("/dev/root", a node missing from this namespace) the device number is looked up. Filesystems
+// without a block device number of their own have none, except btrfs, whose source is taken.
+std::string BlockDeviceOfMount(const MountEntry &mount);
+
+// The path of the block device with this number, or an empty text.
+std::string BlockDeviceByNumber(dev_t device);
+
+// The number of the block device with this path; 0: the path names no block device.
+dev_t BlockDeviceNumber(const std::string &devicePath);
+
+// One value of the superblock found on a block device, by libblkid's name for it ("UUID", "TYPE").
+// Empty: no such value, or the device cannot be read or carries signatures that contradict each
+// other.
+std::string BlockDeviceProbe(const std::string &devicePath, const char *name);
+
+#endif

@@ -1,0 +1,33 @@
+// Finding a directory's file by its inode number.
+//
+// Thread rule: no state; the functions are independent of each other.
+#ifndef VESK_STORAGE_CORE_DIRECTORY_ENTRY_H
+#define VESK_STORAGE_CORE_DIRECTORY_ENTRY_H
+
+#include "storage_core/unique_fd.h"
+
+#include <cstdint>
+#include <string>
+
+// A search through the entries of one directory. The number looked for may be only the low 32 bits
+// of the file's: the entry with exactly this number is the result, else the one file whose low 32
+// bits equal it. Two files that share these bits are no result, either could be meant.
+struct InodeSearch {
+    uint64_t wanted = 0;      // number looked for, in full or its low 32 bits
+    bool isExact = false;     // the candidate has just the wanted number: the search may end
+    bool isAmbiguous = false; // further files have the candidate's low 32 bits
+    uint64_t candidate = 0;   // number of the file found so far
+    std::string name;         // entry of that file; empty: none found yet
+};
+
+// Takes one entry into account.
+void InodeSearchOffer(InodeSearch &search, uint64_t inode, const char *name);
+
+// Whether the search found one file; `candidate` and `name` are then its number and its entry.
+bool InodeSearchFound(const InodeSearch &search);
+
+// Opens the regular file with this inode number (or these low 32 bits of it) in a directory, for
+// reading, without following a symbolic link. Not open: no such file, or a failure.
+UniqueFd DirectoryOpenFile(const std::string &directory, uint64_t inode);
+
+#endif

@@ -1,0 +1,72 @@
+#include "storage_core/file_extents.h"
+
+#include <linux/fs.h>
+#include <sys/ioctl.h>
+
+#include <cstdlib>
+#include <memory>
+#include <new>
+
+namespace {
+
+constexpr uint64_t kSectorBytes = 512;
+constexpr uint32_t kBatchExtents = 128; // extents per question; about 7 KiB
+
+constexpr uint32_t kFlagsWithoutPlace = FIEMAP_EXTENT_UNKNOWN | FIEMAP_EXTENT_DELALLOC |
+                                        FIEMAP_EXTENT_ENCODED | FIEMAP_EXTENT_NOT_ALIGNED |
+                                        FIEMAP_EXTENT_DATA_INLINE | FIEMAP_EXTENT_DATA_TAIL;
+
+struct FreeDeleter {
+    void operator()(fiemap *batch) const { std::free(batch); }
+};
+
+} // namespace
+
+bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry) {
+    if ((extent.fe_flags & kFlagsWithoutPlace) != 0 || extent.fe_length == 0 ||
+        (extent.fe_logical | extent.fe_physical | extent.fe_length) % kSectorBytes != 0) {
+        return false;
+    }
+    entry.fileStartSector = extent.fe_logical / kSectorBytes;
+    entry.numSectors = extent.fe_length / kSectorBytes;
+    entry.deviceStartSector = extent.fe_physical / kSectorBytes;
+    entry.flag = (extent.fe_flags & FIEMAP_EXTENT_UNWRITTEN) != 0 ? 1 : 0;
+    return true;
+}
+
+bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
+    const std::unique_ptr<fiemap, FreeDeleter> batch(static_cast<fiemap *>(
+        std::calloc(1, sizeof(fiemap) + kBatchExtents * sizeof(fiemap_extent))));
+    if (batch == nullptr) {
+        throw std::bad_alloc();
+    }
+    uint64_t start = 0;
+    while (true) {
+        batch->fm_start = start;
+        batch->fm_length = FIEMAP_MAX_OFFSET - start;
+        batch->fm_flags = 0;
+        batch->fm_mapped_extents = 0;
+        batch->fm_extent_count = kBatchExtents;
+        if (ioctl(fd, FS_IOC_FIEMAP, batch.get()) != 0) {
+            return false;
+        }
+        if (batch->fm_mapped_extents == 0) {
+            return true;
+        }
+        for (uint32_t i = 0; i < batch->fm_mapped_extents; ++i) {
+            FileMappingEntry entry = {};
+            if (FileExtentConvert(batch->fm_extents[i], entry)) {
+                entries.push_back(entry);
+            }
+        }
+        const fiemap_extent &last = batch->fm_extents[batch->fm_mapped_extents - 1];
+        if ((last.fe_flags & FIEMAP_EXTENT_LAST) != 0) {
+            return true;
+        }
+        // Extents that do not lead on would be asked for for ever.
+        if (last.fe_logical + last.fe_length <= start) {
+            return false;
+        }
+        start = last.fe_logical + last.fe_length;
+    }
+}

@@ -1,0 +1,22 @@
+// The extents of an open file, asked of the kernel by FIEMAP.
+//
+// Thread rule: no state; the functions are independent of each other.
+#ifndef VESK_STORAGE_CORE_FILE_EXTENTS_H
+#define VESK_STORAGE_CORE_FILE_EXTENTS_H
+
+#include "vesk/storage_core.h"
+
+#include <linux/fiemap.h>
+
+#include <vector>
+
+// Turns one extent into sectors. False: the extent has no place of whole sectors on the device (not
+// allocated yet, kept in the inode, packed or compressed) and `entry` is left alone.
+bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry);
+
+// Appends the extents of an open regular file to `entries`, in file order. Dirty data is not
+// written back first: what has no place on the device yet is left out. False: the kernel did not
+// answer; `entries` then holds what came before.
+bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries);
+
+#endif

@@ -1,0 +1,85 @@
+#include "storage_core/mount_table.h"
+
+#include <libmount/libmount.h>
+
+#include <memory>
+
+namespace {
+
+struct TableDeleter {
+    void operator()(libmnt_table *table) const { mnt_unref_table(table); }
+};
+struct IteratorDeleter {
+    void operator()(libmnt_iter *iterator) const { mnt_free_iter(iterator); }
+};
+
+std::string TextOrEmpty(const char *text) {
+    return text == nullptr ? "" : text;
+}
+
+MountEntry EntryMake(libmnt_fs *fs) {
+    MountEntry entry;
+    entry.id = mnt_fs_get_id(fs);
+    entry.parentId = mnt_fs_get_parent_id(fs);
+    entry.device = mnt_fs_get_devno(fs);
+    entry.root = TextOrEmpty(mnt_fs_get_root(fs));
+    entry.target = TextOrEmpty(mnt_fs_get_target(fs));
+    entry.type = TextOrEmpty(mnt_fs_get_fstype(fs));
+    entry.source = TextOrEmpty(mnt_fs_get_source(fs));
+    entry.options = TextOrEmpty(mnt_fs_get_fs_options(fs));
+    return entry;
+}
+
+bool IsAtOrBelow(const std::string &path, const std::string &directory) {
+    if (directory == "/") {
+        return !path.empty() && path.front() == '/';
+    }
+    return path.compare(0, directory.size(), directory) == 0 &&
+           (path.size() == directory.size() || path[directory.size()] == '/');
+}
+
+} // namespace
+
+bool MountTableRead(const char *path, std::vector<MountEntry> &entries) {
+    entries.clear();
+    const std::unique_ptr<libmnt_table, TableDeleter> table(mnt_new_table_from_file(path));
+    const std::unique_ptr<libmnt_iter, IteratorDeleter> iterator(mnt_new_iter(MNT_ITER_FORWARD));
+    if (table == nullptr || iterator == nullptr) {
+        return false;
+    }
+    libmnt_fs *fs = nullptr;
+    while (mnt_table_next_fs(table.get(), iterator.get(), &fs) == 0) {
+        entries.push_back(EntryMake(fs));
+    }
+    return true;
+}
+
+const MountEntry *MountFindByDevice(const std::vector<MountEntry> &entries, dev_t device) {
+    for (const MountEntry &entry : entries) {
+        if (entry.device == device && entry.type != "autofs") {
+            return &entry;
+        }
+    }
+    return nullptr;
+}
+
+const MountEntry *MountFindByPath(const std::vector<MountEntry> &entries, const std::string &path) {
+    const MountEntry *found = nullptr;
+    for (const MountEntry &entry : entries) {
+        if (!entry.target.empty() && IsAtOrBelow(path, entry.target) &&
+            (found == nullptr || entry.target.size() >= found->target.size())) {
+            found = &entry;
+        }
+    }
+    return found;
+}
+
+std::string MountOptionValue(const MountEntry &entry, const char *name) {
+    char *value = nullptr;
+    size_t length = 0;
+    if (mnt_optstr_get_option(entry.options.c_str(), name, &value, &length) != 0 ||
+        value == nullptr) {
+        return {};
+    }
+    return std::string(value, length);
+}

@@ -1,0 +1,28 @@
+// The choice of the storage spaces among the mounts.
+//
+// Thread rule: no state; the functions are independent of each other.
+#ifndef VESK_STORAGE_CORE_SPACE_LIST_H
+#define VESK_STORAGE_CORE_SPACE_LIST_H
+
+#include "storage_core/mount_table.h"
+
+#include <functional>
+#include <string>
+#include <vector>
+
+// One storage space. Both texts fit their fields of VESKSpaceInfo with the NUL.
+struct Space {
+    std::string devicePath;    // block device path
+    std::string referencePath; // mount path
+};
+
+// Gives the block device path of a mount, or an empty text; see BlockDeviceOfMount.
+using SpaceDeviceLookup = std::function<std::string(const MountEntry &)>;
+
+// The spaces in table order: every filesystem on a block device, each by its first mount that shows
+// the whole of it (btrfs: a whole subvolume), is not covered by another mount at the same path and
+// has paths that fit.
+std::vector<Space> SpaceListSelect(const std::vector<MountEntry> &mounts,
+                                   const SpaceDeviceLookup &deviceOf);
+
+#endif

@@ -1,0 +1,42 @@
+# Build-wide settings: language level, warnings, sanitizers and where the products go.
+
+set(VESK_APPLIANCE_PREFIX "" CACHE PATH
+    "Folder whose lib/ holds the appliance's own libraries; empty: build the stand-ins")
+option(VESK_WERROR "Treat warnings as errors" OFF)
+set(VESK_SANITIZE "" CACHE STRING "Sanitizers to compile with, for instance address,undefined or thread")
+option(VESK_COVERAGE "Instrument for gcov" OFF)
+
+if(NOT CMAKE_BUILD_TYPE AND NOT CMAKE_CONFIGURATION_TYPES)
+  set(CMAKE_BUILD_TYPE RelWithDebInfo CACHE STRING "Build type" FORCE)
+endif()
+
+set(CMAKE_CXX_STANDARD 17)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_EXPORT_COMPILE_COMMANDS ON)
+set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/bin)
+set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
+set(CMAKE_ARCHIVE_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+
+add_library(vesk_options INTERFACE)
+add_library(vesk::options ALIAS vesk_options)
+# GNU interfaces (O_DIRECT, process_vm_readv) and 64-bit file offsets on every platform.
+target_compile_definitions(vesk_options INTERFACE _GNU_SOURCE _FILE_OFFSET_BITS=64)
+target_compile_options(vesk_options INTERFACE
+  -Wall -Wextra -Wconversion -Wshadow -ffunction-sections -fdata-sections)
+# A run path that LD_LIBRARY_PATH overrides: an appliance puts its own libraries in place that way.
+target_link_options(vesk_options INTERFACE -Wl,--gc-sections -Wl,--enable-new-dtags -Wl,--as-needed)
+
+if(VESK_WERROR)
+  target_compile_options(vesk_options INTERFACE -Werror)
+endif()
+if(VESK_SANITIZE)
+  target_compile_options(vesk_options INTERFACE
+    -fsanitize=${VESK_SANITIZE} -fno-sanitize-recover=all -fno-omit-frame-pointer)
+  target_link_options(vesk_options INTERFACE -fsanitize=${VESK_SANITIZE})
+endif()
+if(VESK_COVERAGE)
+  target_compile_options(vesk_options INTERFACE --coverage -fprofile-update=atomic)
+  target_link_options(vesk_options INTERFACE --coverage)
+endif()

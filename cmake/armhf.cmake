@@ -1,0 +1,13 @@
+# Cross compilation for the 32-bit ARM target, against a sysroot of Debian's armhf packages.
+set(CMAKE_SYSTEM_NAME Linux)
+set(CMAKE_SYSTEM_PROCESSOR armv7l)
+set(VESK_ARM_SYSROOT ${CMAKE_CURRENT_LIST_DIR}/../build-armhf-sysroot CACHE PATH "armhf sysroot")
+set(CMAKE_CXX_COMPILER arm-linux-gnueabihf-g++)
+set(CMAKE_SYSROOT ${VESK_ARM_SYSROOT})
+set(CMAKE_CROSSCOMPILING_EMULATOR qemu-arm-static -L ${VESK_ARM_SYSROOT})
+set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)
+set(CMAKE_FIND_ROOT_PATH_MODE_LIBRARY ONLY)
+set(CMAKE_FIND_ROOT_PATH_MODE_INCLUDE ONLY)
+set(CMAKE_FIND_ROOT_PATH_MODE_PACKAGE ONLY)
+set(ENV{PKG_CONFIG_LIBDIR} ${VESK_ARM_SYSROOT}/usr/lib/arm-linux-gnueabihf/pkgconfig)
+set(ENV{PKG_CONFIG_SYSROOT_DIR} ${VESK_ARM_SYSROOT})

@@ -1,0 +1,72 @@
+#include "bitmap/bitmap_file.h"
+
+#include "cli/log.h"
+#include "platform/path.h"
+#include "platform/scoped_fd.h"
+
+#include <algorithm>
+#include <fcntl.h>
+#include <unistd.h>
+
+namespace {
+
+const int64_t chunkBytes = 4096;
+
+} // namespace
+
+int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
+    if (path == nullptr || bitmap == nullptr || bitmap->data == nullptr) {
+        LogError("Incorrect parameter");
+        return -1;
+    }
+    uint64_t fileBytes = 0;
+    if (FileGetSizeByte(path, &fileBytes) < 0) {
+        LogError("Get the size of file (%s) error", path);
+        return -1;
+    }
+    const ScopedFd file(open(path, O_RDONLY | O_CLOEXEC));
+    if (!file.IsOpen()) {
+        LogError("Can't open bitmap file (%s)\n", path);
+        return -1;
+    }
+    LogVerbose("Start read to memory, size = %d", static_cast<int>(bitmap->size));
+    // The file may have grown since its size was compared with the bitmap's.
+    auto remaining = static_cast<int64_t>(std::min<uint64_t>(fileBytes, bitmap->size));
+    int64_t offset = 0;
+    while (remaining >= 1) {
+        const int64_t bytes = std::min(remaining, chunkBytes);
+        LogDebug("Next read start = %d bytes=%d", static_cast<int>(offset),
+                 static_cast<int>(bytes));
+        const ssize_t result = read(file.Get(), bitmap->data + offset, static_cast<size_t>(bytes));
+        if (result == -1) {
+            LogError("Read bitmap file (%s) error\n", path);
+            return -1;
+        }
+        // No end-of-file test: bytes that are not there yet are asked for again.
+        offset += result;
+        remaining -= result;
+    }
+    LogVerbose("Read to memory finish");
+    return 0;
+}
+
+int BitmapWriteToFile(PinBitmap *bitmap, const char *path) {
+    LogVerbose("Bytes to write = %d", static_cast<int>(bitmap->size));
+    const ScopedFd file(open(path, O_RDWR | O_CREAT | O_CLOEXEC, 0644));
+    if (!file.IsOpen()) {
+        LogError("Can't open bitmap file (%s) \n", path);
+        return -1;
+    }
+    int64_t offset = 0;
+    while (offset < bitmap->size) {
+        const int64_t bytes = std::min<int64_t>(bitmap->size - offset, chunkBytes);
+        const ssize_t result = write(file.Get(), bitmap->data + offset, static_cast<size_t>(bytes));
+        if (result == -1) {
+            LogError("Write bitmap file (%s) error\n", path);
+            return -1;
+        }
+        offset += result;
+    }
+    LogVerbose("Write to bitmap file (%s) size (%d) Finish", path, static_cast<int>(bitmap->size));
+    return 0;
+}

@@ -1,0 +1,66 @@
+#include "bitmap/pin_bitmap.h"
+
+#include "cli/log.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <cstring>
+
+namespace {
+
+void ApplyMask(unsigned char *byte, unsigned mask, bool set) {
+    *byte = static_cast<unsigned char>(set ? *byte | mask : *byte & ~mask);
+}
+
+// Bits first to last inclusive; both inside the bitmap. Whole bytes in between are filled, so a
+// range over a 16 TiB device costs a memory fill.
+void ApplyBits(unsigned char *data, uint64_t first, uint64_t last, bool set) {
+    const size_t firstByte = static_cast<size_t>(first >> 3);
+    const size_t lastByte = static_cast<size_t>(last >> 3);
+    const unsigned firstMask = 0xFFU << (first & 7) & 0xFFU;
+    const unsigned lastMask = 0xFFU >> (7 - (last & 7));
+    if (firstByte == lastByte) {
+        ApplyMask(data + firstByte, firstMask & lastMask, set);
+        return;
+    }
+    ApplyMask(data + firstByte, firstMask, set);
+    memset(data + firstByte + 1, set ? 0xFF : 0, lastByte - firstByte - 1);
+    ApplyMask(data + lastByte, lastMask, set);
+}
+
+} // namespace
+
+void BitmapFree(PinBitmap *bitmap) {
+    if (bitmap == nullptr) {
+        LogError("Bitmap is already NULL");
+        return;
+    }
+    if (bitmap->data == nullptr) {
+        LogError("Warning: data is NULL for free");
+    } else {
+        free(bitmap->data);
+        bitmap->data = nullptr;
+    }
+    bitmap->size = 0;
+    free(bitmap);
+}
+
+int BitmapOperation(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors, int op) {
+    LogDebug("Disk start sector=%llu num sectors=%llu\n", LogU64(startSector), LogU64(numSectors));
+    const uint64_t bits = static_cast<uint64_t>(bitmap->size) * 8;
+    const uint64_t first = startSector >> bitmapSectorShift;
+    const uint64_t last = (startSector + numSectors - 1) >> bitmapSectorShift;
+    if (first > last || first >= bits) {
+        return 0;
+    }
+    ApplyBits(bitmap->data, first, std::min(last, bits - 1), op == 1);
+    return 0;
+}
+
+int BitmapSetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors) {
+    return BitmapOperation(bitmap, startSector, numSectors, 1);
+}
+
+int BitmapUnsetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors) {
+    return BitmapOperation(bitmap, startSector, numSectors, 0);
+}

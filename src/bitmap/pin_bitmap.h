@@ -1,0 +1,36 @@
+// A volume's pin bitmap in memory: one bit for each block of 128 sectors (64 KiB) of the cache
+// device; a set bit means pinned.
+//
+// Bit b is bit (b mod 8) of byte (b div 8), bit 0 the least significant, and covers sectors 128*b
+// to 128*b + 127.
+//
+// Thread rule: no locking; a bitmap belongs to one thread at a time.
+#ifndef BITMAP_PIN_BITMAP_H
+#define BITMAP_PIN_BITMAP_H
+
+#include <cstdint>
+
+// Also the descriptor that the cache driver reads (8 bytes on the 32-bit target): field order
+// counts.
+struct PinBitmap {
+    unsigned char *data; // malloc'd, owned by the record
+    uint32_t size;       // bytes of data
+};
+
+const unsigned bitmapSectorShift = 7; // sectors to blocks: 128 sectors of 512 bytes
+const unsigned bitmapByteShift = 16;  // bytes to blocks: 64 KiB
+const unsigned bitmapSizeShift = 19;  // device bytes to bitmap bytes: 8 blocks a byte, rounded down
+
+// Frees the bytes and the record (both malloc'd). A null record or null bytes are an error message.
+void BitmapFree(PinBitmap *bitmap);
+
+// Sets (op 1) or clears (any other op) the bit of every block that the sector range touches,
+// rounding outwards to whole blocks. The last block is that of sector startSector + numSectors - 1,
+// in 64-bit arithmetic that wraps; so a range of no sectors touches nothing where startSector is a
+// multiple of 128, except at 0, where it wraps to everything, and startSector's own block
+// elsewhere. Bits past the bitmap's end are ignored. Always 0.
+int BitmapOperation(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors, int op);
+int BitmapSetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors);
+int BitmapUnsetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors);
+
+#endif

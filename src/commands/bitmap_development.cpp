@@ -1,0 +1,96 @@
+#include "commands/bitmap_development.h"
+
+#include "bitmap/bitmap_file.h"
+#include "bitmap/space_bitmap.h"
+#include "cli/log.h"
+#include "driver/bitmap_control.h"
+#include "platform/malloc_text.h"
+#include "platform/space.h"
+#include "platform/space_bitmap_path.h"
+#include "platform/space_cache.h"
+
+namespace {
+
+const int opUnset = 0;
+const int opSet = 1;
+
+} // namespace
+
+int ModifyBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors, int op) {
+    const MallocText uuid(SpaceGetUUID(mountPath));
+    if (!uuid) {
+        LogError("Can't get space uuid");
+        return -1;
+    }
+    const MallocText cachePath(SpaceGetCachePath(uuid.get()));
+    if (!cachePath) {
+        LogError("Can't get cache path");
+        return -1;
+    }
+    const MallocText bitmapPath(SpaceGetBitmapPath(uuid.get()));
+    if (!bitmapPath) {
+        LogError("Can't get bitmap path");
+        return -1;
+    }
+    PinBitmap *loaded = nullptr;
+    bool sizeChanged = false;
+    const int loadResult = BitmapAllocateAndInitialize(uuid.get(), &loaded, &sizeChanged);
+    const BitmapHolder bitmap(loaded);
+    if (loadResult < 0) {
+        LogError("Allocate bitmap failed");
+        return -1;
+    }
+    switch (op) {
+    case opSet:
+        if (BitmapSetRange(bitmap.get(), startSector, numSectors) != 0) {
+            LogError("Can't get bitmap to file");
+            return -1;
+        }
+        break;
+    case opUnset:
+        if (BitmapUnsetRange(bitmap.get(), startSector, numSectors) != 0) {
+            LogError("Can't unset bitmap to file");
+            return -1;
+        }
+        break;
+    default: LogError("Unknown bitmap op = %d", op); return -1;
+    }
+    if (BitmapWriteToFile(bitmap.get(), bitmapPath.get()) < 0) {
+        LogError("Write bitmap failed");
+        return -1;
+    }
+    if (BitmapSendToDriver(bitmap.get(), cachePath.get()) < 0) {
+        LogError("Can't send bitmap to driver");
+        return -1;
+    }
+    return 0;
+}
+
+int SetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
+    if (ModifyBitmap(mountPath, startSector, numSectors, opSet) != 0) {
+        LogError("Set bitmap failed");
+        return -1;
+    }
+    return 0;
+}
+
+int UnsetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
+    if (ModifyBitmap(mountPath, startSector, numSectors, opUnset) != 0) {
+        LogError("Set bitmap failed");
+        return -1;
+    }
+    return 0;
+}
+
+int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
+    const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
+    if (!cachePath) {
+        LogError("Get cache path from mount path (%s) failed", mountPath);
+        return -1;
+    }
+    if (BitmapGetNeededSizeByte(cachePath.get(), size) < 0) {
+        LogError("Get bitmap size for cache (%s) failed", cachePath.get());
+        return -1;
+    }
+    return 0;
+}

@@ -1,0 +1,115 @@
+#include "commands/inspection.h"
+
+#include "bitmap/bitmap_file.h"
+#include "bitmap/space_bitmap.h"
+#include "cli/log.h"
+#include "config/config_document.h"
+#include "driver/bitmap_control.h"
+#include "platform/malloc_text.h"
+#include "platform/path.h"
+#include "platform/relative_path.h"
+#include "platform/space.h"
+#include "platform/space_bitmap_path.h"
+#include "platform/space_cache.h"
+
+#include <string>
+
+int CheckBitmapSet(const char *mountPath) {
+    int result = 0;
+    MallocText cachePath;
+    if (!SpaceHasCacheAndSupportPin(mountPath)) {
+        LogVerbose("Volume (%s) doesn't support pin", mountPath);
+    } else if (cachePath.reset(SpaceGetCachePathByMountPath(mountPath)); !cachePath) {
+        LogError("Can't get cache path");
+    } else {
+        int state = 0;
+        if (BitmapIsSet(cachePath.get(), &state) < 0) {
+            LogError("Can't get cache's bitmap status");
+        } else {
+            result = state;
+        }
+    }
+    LogVerbose("Bitmap set state = %d", result);
+    return result;
+}
+
+int SendBitmap(const char *mountPath) {
+    if (!SpaceHasCacheAndSupportPin(mountPath)) {
+        LogError("Volume (%s) doesn't support pin", mountPath);
+        return -1;
+    }
+    const MallocText uuid(SpaceGetUUID(mountPath));
+    if (!uuid) {
+        LogError("Can't get space uuid from reference path (%s)", mountPath);
+        return -1;
+    }
+    const MallocText cachePath(SpaceGetCachePath(uuid.get()));
+    if (!cachePath) {
+        LogError("Can't get cache path");
+        return -1;
+    }
+    int isSet = 0;
+    if (BitmapIsSet(cachePath.get(), &isSet) < 0) {
+        LogError("Can't get cache's bitmap status");
+        return -1;
+    }
+    if (isSet != 0) {
+        LogNotice("Bitmap is already set");
+        return 0;
+    }
+    const MallocText bitmapPath(SpaceGetBitmapPath(uuid.get()));
+    if (!bitmapPath) {
+        LogError("Can't get bitmap path");
+        return -1;
+    }
+    if (!PathExists(bitmapPath.get())) {
+        LogNotice("Bitmap file (%s) doesn't exist. No need to update to driver", bitmapPath.get());
+        return 0;
+    }
+    PinBitmap *loaded = nullptr;
+    bool sizeChanged = false;
+    const int loadResult = BitmapAllocateAndInitialize(uuid.get(), &loaded, &sizeChanged);
+    const BitmapHolder bitmap(loaded);
+    if (loadResult < 0) {
+        LogError("Allocate bitmap failed");
+        return -1;
+    }
+    if (sizeChanged && BitmapWriteToFile(bitmap.get(), bitmapPath.get()) < 0) {
+        LogError("Write bitmap failed");
+        return -1;
+    }
+    if (BitmapSendToDriver(bitmap.get(), cachePath.get()) < 0) {
+        LogError("Can't send bitmap to driver");
+        return -1;
+    }
+    return 0;
+}
+
+int CheckFileIsPin(const char *configPath, const char *filePath) {
+    if (!PathExists(configPath)) {
+        LogError("Can't find config file (%s)", configPath);
+        return checkPinError;
+    }
+    char mountPath[1024] = {};
+    if (FileGetTopDir(filePath, mountPath, sizeof(mountPath)) < 0) {
+        LogError("Can't get top directory of file (%s)", filePath);
+        return checkPinError;
+    }
+    LogVerbose("Mount path = %s", mountPath);
+    Json::Value root;
+    if (ConfigReadDocument(configPath, &root) < 0) {
+        LogError("Can't read data from config file (%s)", configPath);
+        return checkPinError;
+    }
+    const Json::Value &volumes = static_cast<const Json::Value &>(root)["volumes"];
+    if (!volumes.isMember(mountPath) || volumes[mountPath].isNull()) {
+        return checkPinNotPinned;
+    }
+    uint32_t inode = 0;
+    if (FileGetInodeNumber(filePath, &inode) < 0) {
+        LogError("Can't get inode number of file (%s)", filePath);
+        return checkPinError;
+    }
+    return volumes[mountPath]["files"].isMember(std::to_string(inode)) ? checkPinPinned
+                                                                       : checkPinNotPinned;
+}

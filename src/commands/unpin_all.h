@@ -1,0 +1,14 @@
+// Unpinning every block of a cache. Neither bitmap file nor configuration is changed.
+// Thread rule: for one-shot processes; no lock is taken.
+#ifndef COMMANDS_UNPIN_ALL_H
+#define COMMANDS_UNPIN_ALL_H
+
+struct ToolParameters;
+
+// By the volume's mount path or, without one, by the cache path. 0, or -1 after an error message.
+int UnpinAllBlocks(const ToolParameters *parameters);
+
+int UnpinAllBlocksByMouhtPath(const char *mountPath);
+int UnpinAllBlocksByCachePath(const char *cachePath);
+
+#endif

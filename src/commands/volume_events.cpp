@@ -1,0 +1,58 @@
+#include "commands/volume_events.h"
+
+#include "cli/log.h"
+#include "config/pinned_files.h"
+#include "platform/malloc_text.h"
+#include "platform/path.h"
+#include "platform/space_bitmap_path.h"
+#include "platform/space_cache.h"
+
+#include <unistd.h>
+
+int HandleSpaceMount(const char *configPath, const char *mountPath) {
+    if (SpaceHasCacheAndSupportPin(mountPath) == 1) {
+        return 0;
+    }
+    LogVerbose("Space (%s) doesn't support pin", mountPath);
+    if (ConfigRemovePinFileVolume(configPath, mountPath) != 0) {
+        LogError("Can't remove pin files in volume (%s)", mountPath);
+        return -1;
+    }
+    const MallocText bitmapPath(BitmapGetPathByReferencePath(mountPath));
+    if (!bitmapPath) {
+        LogError("Can't get volume (%s)'s bitmap path", mountPath);
+        return -1;
+    }
+    if (!PathExists(bitmapPath.get()) || !PathIsFile(bitmapPath.get())) {
+        return 0;
+    }
+    if (unlink(bitmapPath.get()) < 0) {
+        LogError("Can't delete bitmap file (%s)", bitmapPath.get());
+        return -1;
+    }
+    return 0;
+}
+
+int HandleSpaceUmount(const char *mountPath) {
+    if (!SpaceHasCacheAndSupportPin(mountPath)) {
+        LogNotice("Space (%s) doesn't support pin", mountPath);
+    }
+    return 0;
+}
+
+int DeleteBitmap(const char *mountPath) {
+    const MallocText bitmapPath(BitmapGetPathByReferencePath(mountPath));
+    if (!bitmapPath) {
+        LogError("Can't get bitmap path");
+        return -1;
+    }
+    if (!PathExists(bitmapPath.get())) {
+        LogVerbose("bitmap (%s) doesn't exist", bitmapPath.get());
+        return 0;
+    }
+    if (unlink(bitmapPath.get()) < 0) {
+        LogError("Can't delete bitmap (%s)", bitmapPath.get());
+        return -1;
+    }
+    return 0;
+}

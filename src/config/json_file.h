@@ -1,0 +1,20 @@
+// The two file primitives of the configuration: read a whole JSON document, write a whole JSON
+// document. Thread rule: no state; callers that change a document hold the service lock over the
+// cycle.
+#ifndef CONFIG_JSON_FILE_H
+#define CONFIG_JSON_FILE_H
+
+#include <json/value.h>
+#include <string>
+
+// 0, or -1 after an error message when the file cannot be opened or is not JSON (an empty one is
+// not);
+// `*root` may hold a part of the document then. Never throws.
+int ReadFileToJson(const std::string &path, Json::Value *root);
+
+// Replaces the file's content by the document in styled form. 0, or -1 after an error message when
+// the file cannot be opened. A document that can be opened but not written whole (a full disk)
+// leaves the old one in place and is not reported: 0.
+int WriteJsonToFile(const Json::Value &root, const char *path);
+
+#endif

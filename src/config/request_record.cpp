@@ -1,0 +1,14 @@
+#include "config/request_record.h"
+
+#include "config/request_type.h"
+
+#include <cstdio>
+
+void RequestToString(std::string *out, const RequestRecord *record) {
+    char text[1024];
+    const char *typeName = RequestTypeToString(record->type);
+    const int length = snprintf(text, sizeof(text), "Request type=%s mountPath=%s data=%s",
+                                typeName == nullptr ? "(null)" : typeName, record->mountPath,
+                                record->data);
+    out->assign(length < 0 ? "" : text);
+}

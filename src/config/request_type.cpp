@@ -1,0 +1,31 @@
+#include "config/request_type.h"
+
+#include "cli/log.h"
+
+namespace {
+
+// In value order. "removePendigSpace" stands so in every configuration file there is.
+const char *const requestTypeNames[] = {
+    "unknown",         "pinFiles",          "unpinFiles",      "ack",
+    "addPendingSpace", "removePendigSpace", "reloadPinBlocks",
+};
+const int requestTypeCount = sizeof(requestTypeNames) / sizeof(requestTypeNames[0]);
+
+} // namespace
+
+const char *RequestTypeToString(int type) {
+    if (type < 0 || type >= requestTypeCount) {
+        LogError("Convert request type to string errror");
+        return nullptr;
+    }
+    return requestTypeNames[type];
+}
+
+int StringToRequestType(const std::string &name) {
+    for (int type = 0; type < requestTypeCount; ++type) {
+        if (name == requestTypeNames[type]) {
+            return type;
+        }
+    }
+    return requestUnknown;
+}

@@ -1,0 +1,10 @@
+// One ioctl request on a cache device node. Thread rule: no state; callable from any thread.
+#ifndef DRIVER_DEVICE_IOCTL_H
+#define DRIVER_DEVICE_IOCTL_H
+
+// Opens the device for reading and writing, issues the request (with no third argument when `data`
+// is null) and closes it. `size` (bytes of `data`) is for the error message only. 0 when the
+// request returned 0 or more, else -1 after an error message.
+int DoIoctl(const char *devicePath, unsigned request, void *data, int size);
+
+#endif

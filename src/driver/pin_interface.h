@@ -1,0 +1,36 @@
+// The pin interface of the cache driver, byte for byte: ioctl request numbers and payload records.
+//
+// Numbers are fixed constants: the two requests that hand over a record carry no size and no
+// direction in their encoding although the driver follows the pointer.
+#ifndef DRIVER_PIN_INTERFACE_H
+#define DRIVER_PIN_INTERFACE_H
+
+#include <cstddef>
+#include <cstdint>
+
+const unsigned pinIoctlSetBitmap = 0x0000FECF;        // payload: PinBitmap, the bitmap descriptor
+const unsigned pinIoctlQueryBitmapSet = 0x8004FECF;   // payload: 32-bit int, filled by the driver
+const unsigned pinIoctlUnpinRanges = 0x0000FED0;      // payload: a whole range list
+const unsigned pinIoctlUnpinAll = 0x0000FED1;         // no payload
+const unsigned pinIoctlQueryAllUnpinned = 0x8004FED2; // payload: 32-bit int, filled by the driver
+
+// Size of the bitmap descriptor (bytes): a 32-bit address and a 32-bit length.
+const int pinBitmapDescriptorBytes = 8;
+
+// One sector range to release; 16 bytes, little-endian on the target.
+struct UnpinInfo {
+    alignas(8) uint64_t
+        startSector;     // 512-byte sectors, from the start of the volume's block device
+    uint64_t numSectors; // 512-byte sectors
+};
+static_assert(sizeof(UnpinInfo) == 16, "the driver reads 16-byte records");
+
+// The range list: filled from the front; an all-zero record ends it unless all records are used.
+const size_t unpinListRecords = 1024;
+const size_t unpinListBytes = 16384;
+struct UnpinList {
+    UnpinInfo ranges[unpinListRecords];
+};
+static_assert(sizeof(UnpinList) == unpinListBytes, "the driver copies 16384 bytes");
+
+#endif

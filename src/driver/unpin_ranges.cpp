@@ -1,0 +1,63 @@
+#include "driver/unpin_ranges.h"
+
+#include "cli/log.h"
+#include "driver/device_ioctl.h"
+#include "platform/malloc_text.h"
+#include "platform/space_cache.h"
+
+#include <sys/types.h>
+
+void DumpRanges(const UnpinInfo *ranges, size_t count) {
+    for (size_t i = 0; i < count; ++i) {
+        LogNotice("Unpin range [%zd] start sector = %llu num sectors = %llu",
+                  static_cast<ssize_t>(i), LogU64(ranges[i].startSector),
+                  LogU64(ranges[i].numSectors));
+    }
+}
+
+int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
+    LogTraceScope();
+    const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
+    if (!cachePath) {
+        LogError("Can't get cache path of volume (%s)", mountPath);
+        return -1;
+    }
+    UnpinList list{};
+    list.ranges[0] = {startSector, numSectors};
+    if (DoIoctl(cachePath.get(), pinIoctlUnpinRanges, &list, unpinListBytes) < 0) {
+        LogError("Send unpin inctl to driver failed");
+        return -1;
+    }
+    return 0;
+}
+
+int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &ranges) {
+    LogTraceScope();
+    LogVerbose("Pass range to driver start");
+    UnpinList list{}; // zeroed: records behind the last used one end the list
+    size_t count = 0;
+    for (size_t i = 0; i <= ranges.size(); ++i) {
+        const bool atEnd = i == ranges.size();
+        if (!atEnd && count < unpinListRecords) {
+            list.ranges[count++] = ranges[i];
+            continue;
+        }
+        if (count == 0) {
+            break;
+        }
+        // Sending a full list takes the turn of range i, which is itself not sent: drivers in the
+        // field have only ever seen lists cut this way.
+        if (LogLevel > 1) {
+            LogVerbose("Send unpin inctl to driver, size=%zd",
+                       static_cast<ssize_t>(unpinListBytes));
+            DumpRanges(list.ranges, count);
+        }
+        if (DoIoctl(cachePath, pinIoctlUnpinRanges, &list, unpinListBytes) < 0) {
+            LogError("Send unpin inctl to driver failed");
+            return -1;
+        }
+        list = UnpinList{};
+        count = 0;
+    }
+    return 0;
+}

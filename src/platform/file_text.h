@@ -1,0 +1,15 @@
+// Small text files: the message-queue key and the like. Thread rule: no state.
+#ifndef PLATFORM_FILE_TEXT_H
+#define PLATFORM_FILE_TEXT_H
+
+#include <string>
+
+// Creates or empties the file and writes the text, nothing added. 0, or -1 after an error message
+// when it cannot be opened or not every byte was written.
+int FileWriteString(const char *path, const char *text);
+
+// The first line of the file, with its line feed if it has one. 0, or -1 after an error message
+// when the file cannot be opened or is empty.
+int FileReadString(const char *path, std::string *text);
+
+#endif

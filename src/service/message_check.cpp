@@ -1,0 +1,18 @@
+#include "service/message_check.h"
+
+#include "cli/log.h"
+#include "config/request_type.h"
+
+int CheckNormalMsg(const RequestMessage *message) {
+    const RequestRecord &record = message->record;
+    if (record.mountPath[0] == '\0') {
+        LogError("Space UUID is not set");
+        return -1;
+    }
+    const bool needsFiles = record.type == requestPinFiles || record.type == requestUnpinFiles;
+    if (needsFiles && record.data[0] == '\0') {
+        LogError("Should provide file paths");
+        return -1;
+    }
+    return 0;
+}

@@ -1,0 +1,84 @@
+#include "service/receiver.h"
+
+#include "cli/log.h"
+#include "config/request_queue.h"
+#include "config/request_type.h"
+#include "service/message_check.h"
+#include "service/message_queue.h"
+#include "service/service_state.h"
+
+#include <cerrno>
+#include <cstring>
+#include <pthread.h>
+#include <sys/msg.h>
+
+int ServerMsgQueueId = -1;
+
+namespace {
+
+// Whoever may write to the queue fills the record. Before anyone reads it, what a short message
+// left of the one before is cleared and the texts end inside their fields.
+void CompleteRecord(RequestRecord *record, size_t received) {
+    memset(reinterpret_cast<char *>(record) + received, 0, sizeof(*record) - received);
+    record->mountPath[sizeof(record->mountPath) - 1] = '\0';
+    record->data[sizeof(record->data) - 1] = '\0';
+}
+
+} // namespace
+
+void GetRequests(const char *configPath) {
+    {
+        LogTraceScope();
+        RequestMessage message{}; // overwritten by each message
+        RequestRecord &record = message.record;
+        bool receiving = true;
+        ServerMsgQueueId = MsgQueueGet(messageKeyFile);
+        if (ServerMsgQueueId == -1) {
+            LogError("Create server messsage queue by file (%s) failed", messageKeyFile);
+            receiving = false;
+        } else {
+            LogVerbose("Get server messsage queue id = %d", ServerMsgQueueId);
+        }
+        while (receiving) {
+            const ssize_t received =
+                msgrcv(ServerMsgQueueId, &message, requestMessageBytes, requestMessageType, 0);
+            if (received < 0) {
+                LogError("Receive messaged failed: %s", strerror(errno));
+                break;
+            }
+            CompleteRecord(&record, static_cast<size_t>(received));
+            LogVerbose("Get a new message. Request type = %s", RequestTypeToString(record.type));
+
+            if (record.type == requestAddPendingSpace) {
+                if (ServiceIsPendingSpace(record.mountPath)) {
+                    LogVerbose("Space (%s) is already in pending list", record.mountPath);
+                } else if (ServiceAddPendingSpaceAtomic(record.mountPath) < 0) {
+                    LogError("Add spend space error");
+                    break;
+                }
+                continue;
+            }
+            if (record.type == requestRemovePendigSpace) {
+                if (!ServiceIsPendingSpace(record.mountPath)) {
+                    LogNotice("Space (%s) is not in pending list. Could be a new space",
+                              record.mountPath);
+                } else if (ServiceRemovePendingSpaceAtomic(record.mountPath) < 0) {
+                    LogError("Remove pending space error");
+                    break;
+                }
+                continue;
+            }
+            if (CheckNormalMsg(&message) < 0) {
+                LogError("Get wrong message format");
+                break;
+            }
+            if (ConfigAddRequest(configPath, &record) < 0) {
+                LogError("Can't add request to config (%s)", configPath);
+                break;
+            }
+            LogVerbose("Signal a new request is added");
+            ServiceSignalRequest();
+        }
+    }
+    pthread_exit(nullptr);
+}

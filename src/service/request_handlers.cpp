@@ -1,0 +1,128 @@
+#include "service/request_handlers.h"
+
+#include "bitmap/bitmap_file.h"
+#include "bitmap/file_marking.h"
+#include "bitmap/space_bitmap.h"
+#include "cli/log.h"
+#include "config/request_type.h"
+#include "driver/bitmap_control.h"
+#include "driver/unpin_ranges.h"
+#include "platform/malloc_text.h"
+#include "platform/space.h"
+#include "platform/space_bitmap_path.h"
+#include "platform/space_cache.h"
+#include "warming/reload_blocks.h"
+#include "warming/warm_files.h"
+
+#include <string>
+
+namespace {
+
+bool IsHandledType(int type) {
+    return type == requestPinFiles || type == requestUnpinFiles || type == requestReloadPinBlocks;
+}
+
+std::string FullPath(const char *mountPath, const FileInfo &file) {
+    return std::string(mountPath) + "/" + file.szRelativePath;
+}
+
+} // namespace
+
+int HandleRequest(const RequestRecord *record) {
+    int result = handleFailed;
+    PinBitmap *bitmap = nullptr;
+    bool sizeChanged = false;
+    MallocText uuid;
+    MallocText cachePath;
+    MallocText bitmapPath;
+    std::vector<FileInfo> files;
+
+    if (!IsHandledType(record->type)) {
+        LogError("Get unhandle request (%s)", RequestTypeToString(record->type));
+    } else if (uuid.reset(SpaceGetUUID(record->mountPath)); !uuid) {
+        LogError("Can't get space uuid");
+    } else if (cachePath.reset(SpaceGetCachePath(uuid.get())); !cachePath) {
+        LogError("Can't get cache path");
+    } else if (bitmapPath.reset(SpaceGetBitmapPath(uuid.get())); !bitmapPath) {
+        LogError("Can't get bitmap path");
+    } else if (BitmapAllocateAndInitialize(uuid.get(), &bitmap, &sizeChanged) < 0) {
+        LogError("Allocate bitmap failed");
+    } else if (record->type == requestReloadPinBlocks) {
+        result = ReloadPinBlocksToCache(bitmap, cachePath.get(), record->mountPath);
+    } else if (RequestDataGetFileInfos(record->data, &files) < 0) {
+        LogError("Can't parse file inodes from request's data (%s)", record->data);
+    } else if (record->type == requestPinFiles) {
+        result =
+            HandlePinRequest(files, bitmap, record->mountPath, cachePath.get(), bitmapPath.get());
+    } else {
+        result =
+            HandleUnpinRequest(files, bitmap, record->mountPath, cachePath.get(), bitmapPath.get());
+    }
+
+    if (result == handleFailed) {
+        LogError("Handle request failed");
+    } else if (result == handleInterrupted) {
+        LogVerbose("Get Interruped");
+    } else {
+        result = handleDone;
+    }
+    // Also where there is none: its message then tells that the request ended before the bitmap was
+    // loaded.
+    BitmapFree(bitmap);
+    return result;
+}
+
+int HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap, const char *mountPath,
+                     const char *cachePath, const char *bitmapPath) {
+    std::vector<FileToWarm> filesToWarm;
+    for (const FileInfo &file : files) {
+        if (file.szRelativePath[0] == '\0') {
+            LogError("Info's relative path should not be NULL");
+            return handleFailed;
+        }
+        const std::string path = FullPath(mountPath, file);
+        FileMappingTable table;
+        if (BitmapAddFile(bitmap, mountPath, path, static_cast<uint32_t>(file.inodeNum), &table) <
+            0) {
+            LogError("Can't add file (%s) inode (%lu) to bitmap", path.c_str(), file.inodeNum);
+            return handleFailed;
+        }
+        filesToWarm.push_back({path, table});
+    }
+    if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
+        LogError("Write bitmap failed");
+        return handleFailed;
+    }
+    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
+        LogError("Can't send bitmap to driver");
+        return handleFailed;
+    }
+    return ReadFilesToCache(mountPath, filesToWarm);
+}
+
+int HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap, const char *mountPath,
+                       const char *cachePath, const char *bitmapPath) {
+    std::vector<UnpinInfo> infos;
+    for (const FileInfo &file : files) {
+        if (UnsetBitmapAndAppendUnpinInfos(cachePath, bitmap, mountPath, FullPath(mountPath, file),
+                                           static_cast<uint32_t>(file.inodeNum), &infos) < 0) {
+            LogError("Unset bitmap and append unpin infos failed");
+            return handleFailed;
+        }
+    }
+    if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
+        LogError("Write bitmap failed");
+        return handleFailed;
+    }
+    // The bitmap goes first: were the ranges released before it, a read in between could pin them
+    // again by the old one.
+    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
+        LogError("Can't send bitmap to driver");
+        return handleFailed;
+    }
+    if (SendUnpinInfoToDriver(cachePath, infos) < 0) {
+        LogError("Can't send unpin information to driver");
+        return handleFailed;
+    }
+    return handleDone;
+}

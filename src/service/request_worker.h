@@ -1,0 +1,22 @@
+// The worker: takes one request at a time from the configuration file, has it carried out and
+// records the outcome.
+//
+// Thread rule: runs on a thread of its own; takes the service lock only inside the configuration
+// operations, never while a request is carried out.
+#ifndef SERVICE_REQUEST_WORKER_H
+#define SERVICE_REQUEST_WORKER_H
+
+#include "config/request_record.h"
+
+#include <string>
+
+// The thread's start routine; `options` is the ToolParameters record, of which the configuration
+// path is used. Ends the thread when the next request cannot be chosen.
+void *DoRequests(void *options);
+
+// Carries out a taken request: 0 done and recorded (or left in the file when recording failed), 1
+// failed and dropped, 2 interrupted and left in the queue.
+int HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
+                                 const std::string &num);
+
+#endif

@@ -1,0 +1,85 @@
+#include "service/signal_handler.h"
+
+#include "cli/log.h"
+
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <pthread.h>
+#include <sys/time.h>
+#include <unistd.h>
+
+namespace {
+
+const int endingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
+const suseconds_t outputGraceMicroseconds = 500000;
+
+sigset_t EndingSignalSet() {
+    sigset_t set;
+    sigemptyset(&set);
+    for (const int signalNumber : endingSignals) {
+        sigaddset(&set, signalNumber);
+    }
+    return set;
+}
+
+void EndNow(int /*signalNumber*/) {
+    _exit(0);
+}
+
+// Whatever the orderly end waits for (a full pipe behind standard output), it waits no longer than
+// this.
+void LimitEnd() {
+    itimerval limit{};
+    limit.it_value.tv_usec = outputGraceMicroseconds;
+    sigset_t alarmSet;
+    sigemptyset(&alarmSet);
+    sigaddset(&alarmSet, SIGALRM);
+    signal(SIGALRM, EndNow);
+    pthread_sigmask(SIG_UNBLOCK, &alarmSet, nullptr);
+    setitimer(ITIMER_REAL, &limit, nullptr);
+}
+
+void *WaitForSignals(void * /*argument*/) {
+    const sigset_t set = EndingSignalSet();
+    int signalNumber = 0;
+    while (sigwait(&set, &signalNumber) != 0) {
+    }
+    SignalHandler(signalNumber);
+}
+
+// False when there is no thread to be had: then the handler runs on the thread that is interrupted.
+bool StartWaiter() {
+    pthread_t waiter{};
+    if (pthread_create(&waiter, nullptr, WaitForSignals, nullptr) != 0) {
+        return false;
+    }
+    pthread_detach(waiter);
+    return true;
+}
+
+} // namespace
+
+int SetSignalHandler() {
+    // Blocked before the handlers are there, so that no signal finds a handler but no waiter.
+    const sigset_t set = EndingSignalSet();
+    pthread_sigmask(SIG_BLOCK, &set, nullptr);
+    for (const int signalNumber : endingSignals) {
+        if (signal(signalNumber, SignalHandler) == SIG_ERR) {
+            LogError("Can't set handler");
+            pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
+            return -1;
+        }
+    }
+    if (!StartWaiter()) {
+        pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
+    }
+    return 0;
+}
+
+void SignalHandler(int signalNumber) {
+    LimitEnd();
+    LogVerbose("Get signal = %d", signalNumber);
+    fflush(stdout);
+    quick_exit(0);
+}

@@ -1,0 +1,19 @@
+// Ending the service: SIGINT, SIGTERM and SIGQUIT end the process at once with status 0, whatever
+// its threads are doing.
+//
+// The three signals are blocked in every thread and taken by a thread that does nothing else, so
+// that the end never starts inside another thread's malloc or printf. No destructor runs, buffered
+// standard output is written, and half a second later the process ends even if that output finds no
+// reader.
+#ifndef SERVICE_SIGNAL_HANDLER_H
+#define SERVICE_SIGNAL_HANDLER_H
+
+// Installs the handler and starts the thread that waits for the signals; to be called before any
+// other thread is started, which inherits the blocked signals. 0, or -1 after an error message;
+// then handlers already installed stay.
+int SetSignalHandler();
+
+// Ends the process.
+[[noreturn]] void SignalHandler(int signalNumber);
+
+#endif

@@ -1,0 +1,32 @@
+#include "service/start_service.h"
+
+#include "cli/log.h"
+#include "cli/tool_parameters.h"
+#include "service/receiver.h"
+#include "service/request_worker.h"
+#include "service/service_state.h"
+#include "service/signal_handler.h"
+
+#include <cerrno>
+#include <cstring>
+#include <pthread.h>
+
+int StartService(const ToolParameters *parameters) {
+    LogTraceEntry();
+    if (SetSignalHandler() < 0) {
+        LogError("Can't get signal handler");
+        LogTraceExit();
+        return -1;
+    }
+    if (ServiceStateInitialize() != 0) {
+        LogError("Initialize mutex failed");
+        return -1;
+    }
+    pthread_t worker{};
+    if (pthread_create(&worker, nullptr, DoRequests, const_cast<ToolParameters *>(parameters)) !=
+        0) {
+        LogError("Can't create thread: %s", strerror(errno));
+        return -1;
+    }
+    GetRequests(parameters->configPath);
+}

@@ -1,0 +1,13 @@
+// The pin service: shared state, signal handling, the worker on a thread of its own and the
+// receiver on the calling one.
+#ifndef SERVICE_START_SERVICE_H
+#define SERVICE_START_SERVICE_H
+
+struct ToolParameters;
+
+// Runs the service. `parameters` must outlive the process's threads. -1 after an error message when
+// it cannot start; otherwise it does not return: the receiver ends the calling thread, a signal the
+// process.
+int StartService(const ToolParameters *parameters);
+
+#endif

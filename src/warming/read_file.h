@@ -1,0 +1,13 @@
+// Warming one file by its path, from its start. Kept beside the extent reader; no command uses it.
+//
+// Thread rule: one caller at a time (verbose lines use the static time text).
+#ifndef WARMING_READ_FILE_H
+#define WARMING_READ_FILE_H
+
+#include <cstdint>
+
+// Reads the file up to and including `lastSector` (512-byte sectors) or its end. A file that cannot
+// be opened is taken to have gone: warmDone. warmFailed after an error message, or warmInterrupted.
+int FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector);
+
+#endif

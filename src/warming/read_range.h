@@ -1,0 +1,42 @@
+// Reading ranges of the cache device to nowhere: what is read through the device enters the cache.
+//
+// Descriptors are opened for direct I/O, so the buffer is aligned and one buffer serves a whole
+// operation.
+//
+// Thread rule: no state; a buffer belongs to one call at a time.
+#ifndef WARMING_READ_RANGE_H
+#define WARMING_READ_RANGE_H
+
+#include "platform/malloc_text.h"
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+
+// Results of the warming operations.
+const int warmDone = 0;
+const int warmFailed = 1;      // after an error message
+const int warmInterrupted = 2; // the volume is pending
+
+const size_t warmBufferBytes = 65536;
+const size_t warmBufferAlignment = 4096;
+const unsigned sectorByteShift = 9; // sectors to bytes
+
+using WarmBuffer = std::unique_ptr<char, FreeDeleter>;
+
+// An aligned buffer of warmBufferBytes, or null when memory runs out.
+WarmBuffer WarmBufferAllocate();
+
+struct BlockRange {
+    uint64_t startBit; // 64 KiB blocks, from the start of the device
+    uint64_t numBits;  // 64 KiB blocks
+};
+
+// Reads the low 32 bits of `count` (bytes) from `offset` (bytes), `bufferSize` bytes at a time. 0,
+// or -1 after an error message; the end of the device is an error.
+int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t bufferSize);
+
+// The same for a range of blocks.
+int ReadFdToNullByRange(int fd, const BlockRange &range, char *buffer, size_t bufferSize);
+
+#endif

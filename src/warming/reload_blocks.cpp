@@ -1,0 +1,89 @@
+#include "warming/reload_blocks.h"
+
+#include "cli/log.h"
+#include "platform/scoped_fd.h"
+#include "service/service_state.h"
+#include "warming/read_range.h"
+
+#include <algorithm>
+#include <cstring>
+#include <fcntl.h>
+
+namespace {
+
+// How many bytes from `data` on are zero, looking at no more than `size` and stopping a long
+// stretch after 4 KiB, so that the caller looks up now and then.
+size_t CountClearBytes(const unsigned char *data, size_t size) {
+    const size_t stretch = std::min<size_t>(size, 4096);
+    size_t count = 0;
+    uint64_t word = 0;
+    while (count + sizeof(word) <= stretch) {
+        memcpy(&word, data + count, sizeof(word));
+        if (word != 0) {
+            break;
+        }
+        count += sizeof(word);
+    }
+    while (count < stretch && data[count] == 0) {
+        ++count;
+    }
+    return count;
+}
+
+} // namespace
+
+int ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
+                           const char *mountPath) {
+    const WarmBuffer buffer = WarmBufferAllocate();
+    if (!buffer) {
+        LogError("Can't allocate memory\n");
+        return warmFailed;
+    }
+    const ScopedFd device(open(cacheDevicePath, O_RDONLY | O_DIRECT | O_CLOEXEC));
+    if (!device.IsOpen()) {
+        LogError("Can't open file (%s)", cacheDevicePath);
+        return warmFailed;
+    }
+    LogVerbose("Start to read blocks");
+
+    const uint64_t bits = static_cast<uint64_t>(bitmap->size) * 8;
+    bool seen = false;
+    BlockRange run{0, 0};
+    uint64_t bit = 0;
+    while (bit < bits) {
+        const unsigned char *byte = bitmap->data + (bit >> 3);
+        const bool atByte = (bit & 7) == 0;
+        if (((*byte >> (bit & 7)) & 1) != 0) {
+            seen = true;
+            if (run.numBits == 0) {
+                run.startBit = bit;
+            }
+            const unsigned taken = atByte && *byte == 0xFF ? 8 : 1;
+            run.numBits += taken;
+            bit += taken;
+        } else {
+            if (run.numBits > 0 &&
+                ReadFdToNullByRange(device.Get(), run, buffer.get(), warmBufferBytes) < 0) {
+                LogError("Read range to cache failed");
+                return warmFailed;
+            }
+            run.numBits = 0;
+            const size_t left = static_cast<size_t>((bits - bit) >> 3);
+            const size_t clearBytes = atByte ? CountClearBytes(byte, left) : 0;
+            bit += clearBytes > 0 ? clearBytes * 8 : 1;
+        }
+        if (ServiceIsPendingSpace(mountPath)) {
+            LogVerbose("Interrupted due to space is pending");
+            return warmInterrupted;
+        }
+    }
+    if (run.numBits > 0 &&
+        ReadFdToNullByRange(device.Get(), run, buffer.get(), warmBufferBytes) < 0) {
+        LogError("Read range to cache failed");
+        return warmFailed;
+    }
+    if (!seen) {
+        LogVerbose("No pin blocks, no need to reload");
+    }
+    return warmDone;
+}

@@ -1,0 +1,15 @@
+// Warming after a mount: every block whose bit is set in the volume's pin bitmap is read through
+// the cache device; neighbouring blocks in one go.
+//
+// Thread rule: called on the worker's thread, without the service lock. Gives way after each bit
+// when the volume is pending (a stretch of clear bytes counts as one).
+#ifndef WARMING_RELOAD_BLOCKS_H
+#define WARMING_RELOAD_BLOCKS_H
+
+#include "bitmap/pin_bitmap.h"
+
+// warmDone, warmFailed after an error message, or warmInterrupted.
+int ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
+                           const char *mountPath);
+
+#endif

@@ -1,0 +1,77 @@
+#include "warming/warm_files.h"
+
+#include "cli/log.h"
+#include "platform/malloc_text.h"
+#include "platform/scoped_fd.h"
+#include "platform/space_cache.h"
+#include "service/service_state.h"
+#include "warming/read_range.h"
+
+#include <fcntl.h>
+
+namespace {
+
+const uint32_t flagUninitialized = 1;
+
+} // namespace
+
+int ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files) {
+    const WarmBuffer buffer = WarmBufferAllocate();
+    if (!buffer) {
+        LogError("Can't allocate memory\n");
+        return warmFailed;
+    }
+    const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
+    if (!cachePath) {
+        LogError("Cant' get cache path from volume (%s)", mountPath);
+        return warmFailed;
+    }
+    const ScopedFd device(open(cachePath.get(), O_RDONLY | O_DIRECT | O_CLOEXEC));
+    if (!device.IsOpen()) {
+        LogError("Can't open file (%s)", cachePath.get());
+        return warmFailed;
+    }
+    for (const FileToWarm &file : files) {
+        if (ServiceIsPendingSpace(mountPath)) {
+            LogVerbose("Space is pending, Interrupted");
+            return warmInterrupted;
+        }
+        const int result = ReadMappingRangesToCache(mountPath, device.Get(), file.table,
+                                                    buffer.get(), warmBufferBytes);
+        if (result == warmFailed) {
+            LogError("Can't read file (%s) to cache", file.path.c_str());
+            return warmFailed;
+        }
+        if (result == warmInterrupted) {
+            LogVerbose("Interrupted");
+            return warmInterrupted;
+        }
+    }
+    return warmDone;
+}
+
+int ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
+                             char *buffer, size_t bufferSize) {
+    LogVerbose("Mapping entry size = %zu", table.entries.size());
+    for (const FileMappingEntry &entry : table.entries) {
+        const unsigned long long start = entry.deviceStartSector;
+        const unsigned long long sectors = entry.numSectors;
+        if (ServiceIsPendingSpace(mountPath)) {
+            LogVerbose("Space is pending, Interrupted");
+            return warmInterrupted;
+        }
+        if (entry.flag == flagUninitialized) {
+            LogVerbose("Skip uninitialized range (disk start sector = %llu num sectors = %llu)",
+                       start, sectors);
+            continue;
+        }
+        LogVerbose("Read to null (disk start sector = %llu num sectors = %llu)", start, sectors);
+        if (ReadFdToNull(fd, start << sectorByteShift, sectors << sectorByteShift, buffer,
+                         bufferSize) < 0) {
+            LogError("Read fd to null failed (disk start sector = %llu num sectors = %llu)", start,
+                     sectors);
+            return warmFailed;
+        }
+    }
+    return warmDone;
+}

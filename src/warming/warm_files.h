@@ -1,0 +1,27 @@
+// Warming after a pin request: every written extent of every pinned file is read through the cache
+// device.
+//
+// Thread rule: called on the worker's thread, without the service lock. Gives way before each file
+// and each extent when the volume is pending.
+#ifndef WARMING_WARM_FILES_H
+#define WARMING_WARM_FILES_H
+
+#include "vesk/storage_core.h"
+
+#include <cstddef>
+#include <string>
+#include <vector>
+
+struct FileToWarm {
+    std::string path;       // full path, for messages
+    FileMappingTable table; // extents on the volume's block device
+};
+
+// warmDone, warmFailed after an error message, or warmInterrupted.
+int ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files);
+
+// The same for one file's extents, from the open cache device.
+int ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
+                             char *buffer, size_t bufferSize);
+
+#endif

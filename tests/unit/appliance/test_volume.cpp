@@ -1,0 +1,167 @@
+#include "test_volume.h"
+
+#include <gtest/gtest.h>
+
+#include <fcntl.h>
+#include <sched.h>
+#include <sys/mount.h>
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+
+namespace {
+
+std::string WorldMake() {
+    if (geteuid() != 0) {
+        return "needs root";
+    }
+    if (unshare(CLONE_NEWNS) != 0) {
+        return std::string("needs a private mount namespace: ") + std::strerror(errno);
+    }
+    if (mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
+        mount("none", kWorldPath, "tmpfs", 0, nullptr) != 0) {
+        return std::string("needs to mount: ") + std::strerror(errno);
+    }
+    return {};
+}
+
+std::string LoopDeviceOf(const std::string &mountPath) {
+    struct stat status = {};
+    if (stat(mountPath.c_str(), &status) != 0) {
+        return {};
+    }
+    // btrfs has no number here, but its source is the loop device, too.
+    std::string output;
+    CommandRun("findmnt -n -o SOURCE --mountpoint '" + mountPath + "'", output);
+    return output.substr(0, output.find('\n'));
+}
+
+std::string FolderMake() {
+    std::string path = testing::TempDir() + "vesk-appliance-XXXXXX";
+    if (mkdtemp(path.data()) == nullptr) {
+        ADD_FAILURE() << "mkdtemp: " << std::strerror(errno);
+    }
+    return path;
+}
+
+} // namespace
+
+std::string PrivateWorldEnter() {
+    static const std::string reason = WorldMake();
+    return reason;
+}
+
+int CommandRun(const std::string &command, std::string &output) {
+    output.clear();
+    FILE *pipe = popen((command + " 2>&1").c_str(), "re");
+    if (pipe == nullptr) {
+        return -1;
+    }
+    std::array<char, 4096> buffer = {};
+    while (size_t count = fread(buffer.data(), 1, buffer.size(), pipe)) {
+        output.append(buffer.data(), count);
+    }
+    const int status = pclose(pipe);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+TestVolume::TestVolume(const std::string &name, const std::string &mkfs, uint64_t imageBytes)
+    : skipReason(PrivateWorldEnter()), mountPath(std::string(kWorldPath) + "/" + name),
+      imagePath(mountPath + ".image") {
+    if (!skipReason.empty()) {
+        return;
+    }
+    if (access("/dev/loop-control", F_OK) != 0) {
+        skipReason = "needs loop devices";
+        return;
+    }
+    std::filesystem::create_directory(mountPath);
+    std::ofstream(imagePath).flush();
+    std::filesystem::resize_file(imagePath, imageBytes);
+    // The loop device of "-o loop" goes with the mount.
+    const std::string commands =
+        mkfs + " '" + imagePath + "' && mount -n -o loop '" + imagePath + "' '" + mountPath + "'";
+    std::string output;
+    if (CommandRun(commands, output) != 0) {
+        skipReason = "no loop-mounted filesystem here (" + commands + "): " + output;
+        return;
+    }
+    device = LoopDeviceOf(mountPath);
+}
+
+TestVolume::~TestVolume() {
+    Unmount();
+    std::error_code ignored;
+    std::filesystem::remove(imagePath, ignored);
+}
+
+void TestVolume::Unmount() {
+    if (!device.empty()) {
+        EXPECT_EQ(umount2(mountPath.c_str(), 0), 0) << std::strerror(errno);
+        device.clear();
+    }
+}
+
+TestFile::TestFile(const std::string &filePath)
+    : path(filePath), fd(open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600)) {
+    EXPECT_GE(fd, 0) << path << ": " << std::strerror(errno);
+}
+
+TestFile::~TestFile() {
+    if (fd >= 0) {
+        close(fd);
+    }
+}
+
+void TestFile::Write(uint64_t offset, uint64_t length) {
+    const std::vector<char> pattern = TestPattern(offset, length);
+    EXPECT_EQ(pwrite(fd, pattern.data(), pattern.size(), static_cast<off_t>(offset)),
+              static_cast<ssize_t>(length));
+}
+
+void TestFile::Fallocate(int mode, uint64_t offset, uint64_t length) {
+    EXPECT_EQ(fallocate(fd, mode, static_cast<off_t>(offset), static_cast<off_t>(length)), 0)
+        << std::strerror(errno);
+}
+
+void TestFile::Sync() {
+    EXPECT_EQ(fsync(fd), 0) << std::strerror(errno);
+}
+
+uint64_t TestFile::Inode() const {
+    struct stat status = {};
+    EXPECT_EQ(fstat(fd, &status), 0);
+    return status.st_ino;
+}
+
+std::vector<char> TestPattern(uint64_t offset, uint64_t length) {
+    std::vector<char> pattern(static_cast<size_t>(length));
+    for (uint64_t i = 0; i < length; ++i) {
+        const uint64_t place = offset + i;
+        pattern[static_cast<size_t>(i)] = static_cast<char>(place ^ (place >> 9) ^ (place >> 17));
+    }
+    return pattern;
+}
+
+TestFolder::TestFolder() : path(FolderMake()) {}
+
+TestFolder::~TestFolder() {
+    std::error_code ignored;
+    std::filesystem::remove_all(path, ignored);
+}
+
+std::string TestFolder::FileMake(const std::string &name, const std::string &text) const {
+    std::string filePath = path + "/" + name;
+    std::ofstream file(filePath, std::ios::binary);
+    file << text;
+    EXPECT_TRUE(file.flush().good()) << filePath;
+    return filePath;
+}

@@ -1,0 +1,92 @@
+// Real filesystems for tests: a private place to mount them, and loop-mounted images.
+//
+// Everything lies on a tmpfs on /mnt that only the test's own process sees; the kernel takes it
+// away, loop devices included, when the process ends in whatever way.
+//
+// Thread rule: to be used by the test's main thread.
+#ifndef VESK_TESTS_APPLIANCE_TEST_VOLUME_H
+#define VESK_TESTS_APPLIANCE_TEST_VOLUME_H
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+// Where private filesystems are mounted.
+constexpr char kWorldPath[] = "/mnt";
+
+// Puts the process into a mount namespace of its own with a tmpfs on /mnt; once is enough for a
+// process, further calls change nothing. Returns why it is not possible here; empty: done.
+std::string PrivateWorldEnter();
+
+// Runs a shell command. Returns its exit status, -1 when it did not end by itself, and what it
+// wrote to both outputs.
+int CommandRun(const std::string &command, std::string &output);
+
+// A filesystem in a sparse image that is mounted through a loop device at /mnt/<name>, unmounted by
+// the destructor.
+class TestVolume {
+public:
+    // `mkfs` is the formatting command without the image's path.
+    TestVolume(const std::string &name, const std::string &mkfs, uint64_t imageBytes);
+    TestVolume(const TestVolume &) = delete;
+    TestVolume &operator=(const TestVolume &) = delete;
+    ~TestVolume();
+
+    void Unmount();
+
+    std::string skipReason; // why there is no volume; empty: it is mounted
+    std::string mountPath;
+    std::string imagePath;
+    std::string device; // path of the loop device
+};
+
+// One shared volume of each kind for the tests of one suite, made when first asked for.
+constexpr uint64_t kMegabyte = 1024 * 1024;
+constexpr char kExt4Uuid[] = "5a1e4f00-0000-4000-8000-0000000000e4";
+constexpr char kXfsUuid[] = "5a1e4f00-0000-4000-8000-0000000000f5";
+constexpr char kMakeExt4[] = "mke2fs -q -t ext4 -b 4096 -U 5a1e4f00-0000-4000-8000-0000000000e4 -F";
+constexpr char kMakeXfs[] = "mkfs.xfs -q -m uuid=5a1e4f00-0000-4000-8000-0000000000f5";
+constexpr char kMakeBtrfs[] = "mkfs.btrfs -q";
+constexpr uint64_t kExt4Bytes = 64 * kMegabyte;
+constexpr uint64_t kXfsBytes = 320 * kMegabyte;
+constexpr uint64_t kBtrfsBytes = 160 * kMegabyte;
+
+// A file that a test writes. Every failure is a test failure.
+class TestFile {
+public:
+    // Creates the file, empty.
+    explicit TestFile(const std::string &path);
+    TestFile(const TestFile &) = delete;
+    TestFile &operator=(const TestFile &) = delete;
+    ~TestFile();
+
+    // Writes bytes of a pattern that differs from place to place.
+    void Write(uint64_t offset, uint64_t length);
+    void Fallocate(int mode, uint64_t offset, uint64_t length);
+    void Sync();
+    uint64_t Inode() const;
+
+    const std::string path;
+    const int fd;
+};
+
+// The pattern that TestFile::Write puts at this place of a file.
+std::vector<char> TestPattern(uint64_t offset, uint64_t length);
+
+// An empty folder that is removed with all that is in it.
+class TestFolder {
+public:
+    TestFolder();
+    TestFolder(const TestFolder &) = delete;
+    TestFolder &operator=(const TestFolder &) = delete;
+    ~TestFolder();
+
+    // Writes a file of this name and returns its path.
+    std::string FileMake(const std::string &name, const std::string &text) const;
+
+    const std::string path;
+};
+
+#endif
