@@ -91,7 +91,7 @@ TEST_F(BlockDevice, RelativeSourceIsNoPath) {
 
 TEST_F(BlockDevice, ProbeTellsTypeAndUuid) {
     EXPECT_EQ(BlockDeviceProbe(volume->device, "TYPE"), "ext4");
-    EXPECT_EQ(BlockDeviceProbe(volume->device, "UUID"), kExt4Uuid);
+    EXPECT_EQ(BlockDeviceProbe(volume->device, "UUID"), volume->uuid);
     EXPECT_EQ(BlockDeviceProbe(volume->device, "NO_SUCH_VALUE"), "");
     EXPECT_EQ(BlockDeviceProbe("/nonexistent", "UUID"), "");
     EXPECT_EQ(BlockDeviceProbe("", "UUID"), "");

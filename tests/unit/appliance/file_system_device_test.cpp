@@ -144,7 +144,7 @@ TEST_F(FileSystem, CreateOnUnmountedDevices) {
         uint64_t bytes;
         bool isUsable;
     } kinds[] = {{"unmounted-xfs", kMakeXfs, kXfsBytes, true},
-                 {"unmounted-ext2", "mke2fs -q -t ext2 -F", kExt4Bytes, true},
+                 {"unmounted-ext2", "mke2fs -q -t ext2 -F -U %UUID%", kExt4Bytes, true},
                  {"unmounted-btrfs", kMakeBtrfs, kBtrfsBytes, false}};
     for (const auto &kind : kinds) {
         TestVolume volume(kind.name, kind.mkfs, kind.bytes);

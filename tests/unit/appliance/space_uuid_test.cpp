@@ -29,8 +29,8 @@ TEST(VESKSpaceUUIDGet, IsTheFilesystems) {
             GTEST_SKIP() << volume->skipReason;
         }
     }
-    EXPECT_EQ(UuidOf(ext4.device), kExt4Uuid);
-    EXPECT_EQ(UuidOf(xfs.device), kXfsUuid);
+    EXPECT_EQ(UuidOf(ext4.device), ext4.uuid);
+    EXPECT_EQ(UuidOf(xfs.device), xfs.uuid);
 }
 
 TEST(VESKSpaceUUIDGet, NullWithoutAFilesystem) {

@@ -3,19 +3,22 @@
 #include <gtest/gtest.h>
 
 #include <fcntl.h>
+#include <linux/loop.h>
 #include <sched.h>
+#include <sys/ioctl.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
-#include <sys/sysmacros.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <array>
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <regex>
 
 namespace {
 
@@ -33,15 +36,28 @@ std::string WorldMake() {
     return {};
 }
 
-std::string LoopDeviceOf(const std::string &mountPath) {
-    struct stat status = {};
-    if (stat(mountPath.c_str(), &status) != 0) {
-        return {};
-    }
-    // btrfs has no number here, but its source is the loop device, too.
+// Why loop devices cannot be used; empty: they can.
+std::string LoopProbe() {
+    const int control = open("/dev/loop-control", O_RDWR | O_CLOEXEC);
+    const int number = control < 0 ? -1 : ioctl(control, LOOP_CTL_GET_FREE);
+    close(control);
+    const std::string path = "/dev/loop" + std::to_string(number);
+    const int loop = number < 0 ? -1 : open(path.c_str(), O_RDWR | O_CLOEXEC);
+    close(loop);
+    return loop < 0 ? "needs loop devices" : "";
+}
+
+// btrfs does not show its device's number, but every filesystem shows what was mounted.
+std::string MountSource(const std::string &mountPath) {
     std::string output;
     CommandRun("findmnt -n -o SOURCE --mountpoint '" + mountPath + "'", output);
     return output.substr(0, output.find('\n'));
+}
+
+std::string UuidMake() {
+    std::string uuid;
+    std::ifstream("/proc/sys/kernel/random/uuid") >> uuid;
+    return uuid;
 }
 
 std::string FolderMake() {
@@ -74,27 +90,37 @@ int CommandRun(const std::string &command, std::string &output) {
 }
 
 TestVolume::TestVolume(const std::string &name, const std::string &mkfs, uint64_t imageBytes)
-    : skipReason(PrivateWorldEnter()), mountPath(std::string(kWorldPath) + "/" + name),
-      imagePath(mountPath + ".image") {
-    if (!skipReason.empty()) {
-        return;
+    : skipReason(PrivateWorldEnter()), uuid(UuidMake()),
+      mountPath(std::string(kWorldPath) + "/" + name), imagePath(mountPath + ".image") {
+    if (skipReason.empty()) {
+        skipReason = LoopProbe();
     }
-    if (access("/dev/loop-control", F_OK) != 0) {
-        skipReason = "needs loop devices";
+    if (!skipReason.empty()) {
         return;
     }
     std::filesystem::create_directory(mountPath);
     std::ofstream(imagePath).flush();
     std::filesystem::resize_file(imagePath, imageBytes);
-    // The loop device of "-o loop" goes with the mount.
-    const std::string commands =
-        mkfs + " '" + imagePath + "' && mount -n -o loop '" + imagePath + "' '" + mountPath + "'";
+    Mount(std::regex_replace(mkfs, std::regex("%UUID%"), uuid));
+}
+
+void TestVolume::Mount(const std::string &mkfs) {
+    constexpr int kNoSuchCommand = 127;
     std::string output;
-    if (CommandRun(commands, output) != 0) {
-        skipReason = "no loop-mounted filesystem here (" + commands + "): " + output;
+    const int formatted = CommandRun(mkfs + " '" + imagePath + "'", output);
+    if (formatted == kNoSuchCommand) {
+        skipReason = "needs " + mkfs.substr(0, mkfs.find(' '));
         return;
     }
-    device = LoopDeviceOf(mountPath);
+    EXPECT_EQ(formatted, 0) << mkfs << ": " << output;
+    // The loop device of "-o loop" goes with the mount.
+    if (CommandRun("mount -n -o loop '" + imagePath + "' '" + mountPath + "'", output) != 0) {
+        skipReason = "cannot mount: " + output;
+        EXPECT_NE(output.find("unknown filesystem type"), std::string::npos) << output;
+        return;
+    }
+    device = MountSource(mountPath);
+    EXPECT_EQ(device.compare(0, 9, "/dev/loop"), 0) << device;
 }
 
 TestVolume::~TestVolume() {

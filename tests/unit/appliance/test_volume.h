@@ -28,7 +28,9 @@ int CommandRun(const std::string &command, std::string &output);
 // the destructor.
 class TestVolume {
 public:
-    // `mkfs` is the formatting command without the image's path.
+    // `mkfs` is the formatting command without the image's path; "%UUID%" in it stands for a UUID
+    // of the volume's own. A machine without what this takes gives a reason to skip, anything else
+    // that goes wrong is a test failure.
     TestVolume(const std::string &name, const std::string &mkfs, uint64_t imageBytes);
     TestVolume(const TestVolume &) = delete;
     TestVolume &operator=(const TestVolume &) = delete;
@@ -37,18 +39,22 @@ public:
     void Unmount();
 
     std::string skipReason; // why there is no volume; empty: it is mounted
-    std::string mountPath;
-    std::string imagePath;
-    std::string device; // path of the loop device
+    const std::string uuid;
+    const std::string mountPath;
+    const std::string imagePath;
+    std::string device; // path of the loop device; empty: not mounted
+
+private:
+    void Mount(const std::string &mkfs);
 };
 
-// One shared volume of each kind for the tests of one suite, made when first asked for.
-constexpr uint64_t kMegabyte = 1024 * 1024;
-constexpr char kExt4Uuid[] = "5a1e4f00-0000-4000-8000-0000000000e4";
-constexpr char kXfsUuid[] = "5a1e4f00-0000-4000-8000-0000000000f5";
-constexpr char kMakeExt4[] = "mke2fs -q -t ext4 -b 4096 -U 5a1e4f00-0000-4000-8000-0000000000e4 -F";
-constexpr char kMakeXfs[] = "mkfs.xfs -q -m uuid=5a1e4f00-0000-4000-8000-0000000000f5";
-constexpr char kMakeBtrfs[] = "mkfs.btrfs -q";
+// Kinds of volumes: the formatting command and an image size that it takes. The UUIDs are no
+// constants: xfs refuses a second mount of the same one on the whole machine, and tests run side by
+// side.
+constexpr uint64_t kMegabyte = uint64_t{1} << 20;
+constexpr char kMakeExt4[] = "mke2fs -q -t ext4 -b 4096 -U %UUID% -F";
+constexpr char kMakeXfs[] = "mkfs.xfs -q -m uuid=%UUID%";
+constexpr char kMakeBtrfs[] = "mkfs.btrfs -q -U %UUID%";
 constexpr uint64_t kExt4Bytes = 64 * kMegabyte;
 constexpr uint64_t kXfsBytes = 320 * kMegabyte;
 constexpr uint64_t kBtrfsBytes = 160 * kMegabyte;

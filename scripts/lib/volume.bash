@@ -1,0 +1,63 @@
+# Volumes on emulated cache devices, for the demo and the system tests. To be sourced inside a private
+# world; needs BIN, the folder of the built programs.
+#
+# A volume N has its images in /tmp/volumeN, its cache device in /run/veskN/cachedev_N and is mounted at
+# /volumeN. Everything ends with the private world; nothing needs to be undone.
+
+export VESK_FLASHCACHE_CONFIG=/run/veskflashcache.json
+
+volume_device() { echo "/run/vesk$1/cachedev_$1"; }
+volume_state_file() { echo "/run/vesk$1/cachedev_$1.json"; }
+
+# volume_make N SIZE SSD_SIZE FSTYPE [veskcachedev option...]: sizes as truncate takes them.
+volume_make() {
+    local n=$1 size=$2 ssd_size=$3 fstype=$4 device loop
+    shift 4
+    device=$(volume_device "$n")
+    mkdir -p "/tmp/volume$n"
+    truncate -s "$size" "/tmp/volume$n/backing"
+    truncate -s "$ssd_size" "/tmp/volume$n/ssd"
+    "$BIN/veskcachedev" --device "$device" --backing "/tmp/volume$n/backing" \
+        --ssd "/tmp/volume$n/ssd" "$@"
+    loop=$(losetup --find --show "$device")
+    case "$fstype" in
+    ext*) "mkfs.$fstype" -q -b 4096 "$loop" ;;
+    xfs) mkfs.xfs -q "$loop" ;;
+    *) "mkfs.$fstype" -q "$loop" ;;
+    esac
+    mount "$loop" "/volume$n"
+    # Detaching a loop device in use only makes it go with its last user: no exit path can forget it.
+    losetup --detach "$loop"
+    echo "$loop" >"/tmp/volume$n/loop"
+    volume_configure
+}
+
+volume_loop() { cat "/tmp/volume$1/loop"; }
+volume_uuid() { blkid -p -o value -s UUID "$(volume_loop "$1")"; }
+
+# Writes the cache configuration for all volumes made so far.
+volume_configure() {
+    local folder n separator=
+    {
+        printf '{"caches":['
+        for folder in /tmp/volume[0-9]; do
+            n=${folder#/tmp/volume}
+            [ -e "$folder/loop" ] || continue
+            printf '%s{"spaceUuid":"%s","ssdPath":"%s/ssd","cachePath":"%s"}' "$separator" \
+                "$(volume_uuid "$n")" "$folder" "$(volume_device "$n")"
+            separator=,
+        done
+        printf ']}\n'
+    } >"$VESK_FLASHCACHE_CONFIG"
+}
+
+# volume_state N MEMBER: one number or word of the cache device's state.
+volume_state() {
+    sed -n 's/.*"'"$2"'":\([0-9a-z]*\).*/\1/p' "$(volume_state_file "$1")"
+}
+
+# Forgets what the page cache holds, so that reads reach the cache device.
+drop_page_cache() {
+    sync
+    echo 3 >/proc/sys/vm/drop_caches
+}

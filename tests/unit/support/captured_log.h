@@ -1,0 +1,35 @@
+// What the tool logs and prints while an object of this class lives, line by line.
+//
+// Messages are sent to standard output, as with --stdout, and standard output is caught whole, so
+// that a test sees the exact final form. Level 1 unless said otherwise.
+#ifndef TESTS_SUPPORT_CAPTURED_LOG_H
+#define TESTS_SUPPORT_CAPTURED_LOG_H
+
+#include <string>
+#include <vector>
+
+class CapturedLog {
+public:
+    explicit CapturedLog(int level = 1);
+    ~CapturedLog();
+    CapturedLog(const CapturedLog &) = delete;
+    CapturedLog &operator=(const CapturedLog &) = delete;
+
+    // Everything so far. Lines are without their line feed; an empty line is kept.
+    std::string Text();
+    std::vector<std::string> Lines();
+
+    // The lines without the program name; at level 2 and above also with every line number as
+    // "[N]": "func() [N] : ***** text".
+    std::vector<std::string> Messages();
+
+    // Whether some line of Messages() is this one, and how many are.
+    bool Has(const std::string &message);
+    int Count(const std::string &message);
+
+private:
+    int savedStdout_;
+    int file_;
+};
+
+#endif

@@ -1,0 +1,196 @@
+#include "support/fake_libc.h"
+
+#include <atomic>
+#include <cerrno>
+#include <cstdarg>
+#include <cstddef>
+#include <dlfcn.h>
+#include <map>
+#include <mutex>
+#include <pthread.h>
+#include <sys/types.h>
+
+int FakeLibc::sleeps = 0;
+int FakeLibc::syncs = 0;
+std::function<void()> FakeLibc::onSleep;
+std::function<void()> FakeLibc::onSync;
+std::function<int(unsigned long, void *)> FakeLibc::onIoctl;
+
+namespace {
+
+struct Order {
+    int calls = 0;
+    int failAt = 0; // 0: never
+    bool onwards = false;
+    int error = 0;
+};
+
+std::mutex ordersMutex;
+std::map<std::string, Order> &Orders() {
+    static auto *orders = new std::map<std::string, Order>;
+    return *orders;
+}
+std::atomic<bool> anyOrder{false}; // spares the ordinary call the map
+
+// The errno with which this call fails, or 0.
+int FailureOf(const char *function) {
+    if (!anyOrder) {
+        return 0;
+    }
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    const auto found = Orders().find(function);
+    if (found == Orders().end()) {
+        return 0;
+    }
+    Order &order = found->second;
+    ++order.calls;
+    const bool fails = order.failAt != 0 &&
+                       (order.onwards ? order.calls >= order.failAt : order.calls == order.failAt);
+    return fails ? order.error : 0;
+}
+
+void SetOrder(const std::string &function, int error, int nth, bool onwards) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Order &order = Orders()[function];
+    order.failAt = order.calls + nth;
+    order.onwards = onwards;
+    order.error = error;
+    anyOrder = true;
+}
+
+template <typename Function> Function Real(const char *name) {
+    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+
+} // namespace
+
+void FakeLibc::Reset() {
+    sleeps = 0;
+    syncs = 0;
+    onSleep = nullptr;
+    onSync = nullptr;
+    onIoctl = nullptr;
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Orders().clear();
+    anyOrder = false;
+}
+
+void FakeLibc::Fail(const std::string &function, int error, int nth) {
+    SetOrder(function, error, nth, false);
+}
+
+void FakeLibc::FailFrom(const std::string &function, int error, int nth) {
+    SetOrder(function, error, nth, true);
+}
+
+int FakeLibc::Calls(const std::string &function) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    return Orders()[function].calls;
+}
+
+// Fails the call when ordered to, otherwise calls the real function.
+#define PASS_OR_FAIL(failure, name, type, ...)                                                     \
+    const int error = FailureOf(#name);                                                            \
+    if (error != 0) {                                                                              \
+        errno = error;                                                                             \
+        return failure;                                                                            \
+    }                                                                                              \
+    static const auto real = Real<type>(#name);                                                    \
+    return real(__VA_ARGS__)
+
+using sighandler = void (*)(int);
+struct msqid_ds;
+
+extern "C" {
+
+unsigned sleep(unsigned /*seconds*/) {
+    ++FakeLibc::sleeps;
+    if (FakeLibc::onSleep) {
+        FakeLibc::onSleep();
+    }
+    return 0;
+}
+
+void sync() noexcept {
+    ++FakeLibc::syncs;
+    if (FakeLibc::onSync) {
+        FakeLibc::onSync();
+    }
+}
+
+int ioctl(int fd, unsigned long request, ...) noexcept {
+    va_list arguments;
+    va_start(arguments, request);
+    void *argument = va_arg(arguments, void *);
+    va_end(arguments);
+    if (FakeLibc::onIoctl) {
+        return FakeLibc::onIoctl(request, argument);
+    }
+    PASS_OR_FAIL(-1, ioctl, int (*)(int, unsigned long, ...), fd, request, argument);
+}
+
+int msgctl(int id, int command, msqid_ds *data) noexcept {
+    PASS_OR_FAIL(-1, msgctl, int (*)(int, int, msqid_ds *), id, command, data);
+}
+
+int msgget(key_t key, int flags) noexcept {
+    PASS_OR_FAIL(-1, msgget, int (*)(key_t, int), key, flags);
+}
+
+int msgsnd(int id, const void *message, size_t size, int flags) {
+    PASS_OR_FAIL(-1, msgsnd, int (*)(int, const void *, size_t, int), id, message, size, flags);
+}
+
+key_t ftok(const char *path, int project) noexcept {
+    PASS_OR_FAIL(-1, ftok, key_t(*)(const char *, int), path, project);
+}
+
+ssize_t write(int fd, const void *data, size_t size) {
+    PASS_OR_FAIL(-1, write, ssize_t(*)(int, const void *, size_t), fd, data, size);
+}
+
+ssize_t read(int fd, void *data, size_t size) {
+    PASS_OR_FAIL(-1, read, ssize_t(*)(int, void *, size_t), fd, data, size);
+}
+
+off_t lseek64(int fd, off_t offset, int whence) noexcept {
+    PASS_OR_FAIL(-1, lseek, off_t(*)(int, off_t, int), fd, offset, whence);
+}
+
+int fsync(int fd) {
+    PASS_OR_FAIL(-1, fsync, int (*)(int), fd);
+}
+
+int renameat(int oldFolder, const char *oldName, int newFolder, const char *newName) noexcept {
+    const int error = FailureOf("rename");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    static const auto real = Real<int (*)(int, const char *, int, const char *)>("renameat");
+    return real(oldFolder, oldName, newFolder, newName);
+}
+
+int fchown(int fd, uid_t owner, gid_t group) noexcept {
+    PASS_OR_FAIL(-1, fchown, int (*)(int, uid_t, gid_t), fd, owner, group);
+}
+
+int pthread_mutex_init(pthread_mutex_t *mutex, const pthread_mutexattr_t *attributes) noexcept {
+    const int error = FailureOf("pthread_mutex_init");
+    if (error != 0) {
+        return error;
+    }
+    static const auto real =
+        Real<int (*)(pthread_mutex_t *, const pthread_mutexattr_t *)>("pthread_mutex_init");
+    return real(mutex, attributes);
+}
+
+sighandler signal(int number, sighandler handler) noexcept {
+    PASS_OR_FAIL(reinterpret_cast<sighandler>(-1), signal, sighandler(*)(int, sighandler), number,
+                 handler);
+}
+
+void *aligned_alloc(size_t alignment, size_t size) noexcept {
+    PASS_OR_FAIL(nullptr, aligned_alloc, void *(*)(size_t, size_t), alignment, size);
+}
+}

@@ -1,0 +1,36 @@
+// A few C library calls replaced for tests: time that does not pass, a sync that only counts, calls
+// that fail when told to, and ioctl requests that a test answers.
+//
+// The test program defines the functions itself, so the product's code runs unchanged. Everything
+// is as in production until a test asks for something else; Reset() in SetUp and TearDown.
+#ifndef TESTS_SUPPORT_FAKE_LIBC_H
+#define TESTS_SUPPORT_FAKE_LIBC_H
+
+#include <functional>
+#include <string>
+
+struct FakeLibc {
+    static void Reset();
+
+    // sleep() returns at once and calls onSleep; real: pass the time after all.
+    static int sleeps;
+    static std::function<void()> onSleep;
+
+    static int syncs; // sync() only counts
+    static std::function<void()> onSync;
+
+    // The n-th next call (1: the next) of this function fails with this errno (a function that
+    // returns its error returns it; aligned_alloc returns null). Known: ioctl, msgctl, msgget,
+    // msgsnd, write, read, lseek, fsync, rename, fchown, pthread_mutex_init, signal, aligned_alloc,
+    // ftok.
+    static void Fail(const std::string &function, int error, int nth = 1);
+    // The same for every call from the n-th on.
+    static void FailFrom(const std::string &function, int error, int nth = 1);
+    // How often the function was called since Reset().
+    static int Calls(const std::string &function);
+
+    // Answers every ioctl while it is set: (request, third argument) to the result; -1 with errno.
+    static std::function<int(unsigned long, void *)> onIoctl;
+};
+
+#endif

@@ -1,0 +1,25 @@
+// A private folder for one test, removed with everything in it.
+#ifndef TESTS_SUPPORT_TEMP_DIR_H
+#define TESTS_SUPPORT_TEMP_DIR_H
+
+#include <string>
+
+class TempDir {
+public:
+    TempDir();
+    ~TempDir();
+    TempDir(const TempDir &) = delete;
+    TempDir &operator=(const TempDir &) = delete;
+
+    const std::string &Path() const { return path_; }
+    std::string Path(const std::string &name) const { return path_ + "/" + name; }
+
+private:
+    std::string path_;
+};
+
+// Whole files, binary. ReadWhole of a missing file gives the empty text.
+void WriteWhole(const std::string &path, const std::string &content);
+std::string ReadWhole(const std::string &path);
+
+#endif
