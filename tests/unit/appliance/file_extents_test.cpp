@@ -13,7 +13,6 @@
 #include <map>
 #include <memory>
 #include <ostream>
-#include <regex>
 #include <sstream>
 
 bool operator==(const FileMappingEntry &a, const FileMappingEntry &b) {
@@ -53,17 +52,18 @@ TEST(FileExtentConvert, GivesSectors) {
 
 TEST(FileExtentConvert, KeepsWhatHasAPlace) {
     FileMappingEntry entry = {};
-    for (const uint32_t flag : {FIEMAP_EXTENT_LAST, FIEMAP_EXTENT_MERGED, FIEMAP_EXTENT_SHARED,
-                                FIEMAP_EXTENT_UNWRITTEN}) {
+    for (const uint32_t flag :
+         std::vector<uint32_t>{FIEMAP_EXTENT_LAST, FIEMAP_EXTENT_MERGED, FIEMAP_EXTENT_SHARED,
+                               FIEMAP_EXTENT_UNWRITTEN}) {
         EXPECT_TRUE(FileExtentConvert(Extent(0, 4096, 4096, flag), entry)) << flag;
     }
 }
 
 TEST(FileExtentConvert, LeavesOutWhatHasNoPlace) {
     const FileMappingEntry old = {1, 2, 3, 4};
-    for (const uint32_t flag :
-         {FIEMAP_EXTENT_UNKNOWN, FIEMAP_EXTENT_DELALLOC, FIEMAP_EXTENT_ENCODED,
-          FIEMAP_EXTENT_NOT_ALIGNED, FIEMAP_EXTENT_DATA_INLINE, FIEMAP_EXTENT_DATA_TAIL}) {
+    for (const uint32_t flag : std::vector<uint32_t>{
+             FIEMAP_EXTENT_UNKNOWN, FIEMAP_EXTENT_DELALLOC, FIEMAP_EXTENT_ENCODED,
+             FIEMAP_EXTENT_NOT_ALIGNED, FIEMAP_EXTENT_DATA_INLINE, FIEMAP_EXTENT_DATA_TAIL}) {
         FileMappingEntry entry = old;
         EXPECT_FALSE(FileExtentConvert(Extent(0, 4096, 4096, flag), entry)) << flag;
         EXPECT_EQ(entry, old);
@@ -114,23 +114,27 @@ protected:
         return entries;
     }
 
-    // The same extents as filefrag prints them. Its lines: number, first..last in the file,
-    // first..last on the device, length, the place expected where it is another, flags.
+    // The same extents as filefrag prints them.
     Entries Expected() const {
         std::string output;
         EXPECT_EQ(CommandRun("filefrag -v -b512 '" + file->path + "'", output), 0) << output;
-        const std::regex line(R"( *\d+: +(\d+)\.\. *\d+: +(\d+)\.\. *\d+: +(\d+):(.*))");
         Entries entries;
         std::istringstream lines(output);
-        for (std::string text; std::getline(lines, text);) {
-            std::smatch match;
-            if (!std::regex_match(text, match, line) ||
-                std::regex_search(match.str(4), std::regex("delalloc|unknown_loc|inline"))) {
-                continue;
+        for (std::string line; std::getline(lines, line);) {
+            const bool hasPlace = line.find("delalloc") == std::string::npos &&
+                                  line.find("unknown_loc") == std::string::npos &&
+                                  line.find("inline") == std::string::npos;
+            const uint32_t flag = line.find("unwritten") == std::string::npos ? 0 : 1;
+            // "number: first.. last: device first.. device last: length: ..."; titles are no
+            // numbers.
+            std::replace_if(
+                line.begin(), line.end(), [](char c) { return c == ':' || c == '.'; }, ' ');
+            std::istringstream fields(line);
+            uint64_t number = 0, first = 0, last = 0, deviceFirst = 0, deviceLast = 0, length = 0;
+            if (hasPlace &&
+                fields >> number >> first >> last >> deviceFirst >> deviceLast >> length) {
+                entries.push_back({first, length, deviceFirst, flag});
             }
-            entries.push_back({std::stoull(match.str(1)), std::stoull(match.str(3)),
-                               std::stoull(match.str(2)),
-                               match.str(4).find("unwritten") == std::string::npos ? 0U : 1U});
         }
         return entries;
     }

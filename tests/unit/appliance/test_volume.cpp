@@ -18,7 +18,6 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
-#include <regex>
 
 namespace {
 
@@ -101,7 +100,12 @@ TestVolume::TestVolume(const std::string &name, const std::string &mkfs, uint64_
     std::filesystem::create_directory(mountPath);
     std::ofstream(imagePath).flush();
     std::filesystem::resize_file(imagePath, imageBytes);
-    Mount(std::regex_replace(mkfs, std::regex("%UUID%"), uuid));
+    const std::string place = "%UUID%";
+    std::string command = mkfs;
+    if (const size_t at = command.find(place); at != std::string::npos) {
+        command.replace(at, place.size(), uuid);
+    }
+    Mount(command);
 }
 
 void TestVolume::Mount(const std::string &mkfs) {

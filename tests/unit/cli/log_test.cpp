@@ -1,24 +1,290 @@
 #include "cli/log.h"
 
+#include "cli/syslog_capture.h"
 #include "support/captured_log.h"
-#include "support/fake_appliance.h"
-#include "support/fake_libc.h"
 
-#include "platform/space_cache.h"
-
+#include <cerrno>
+#include <cstdio>
 #include <gtest/gtest.h>
-#include <unistd.h>
+#include <string>
+#include <syslog.h>
 
-TEST(Log, ErrorAtLevel1IsShort) {
-    CapturedLog log;
-    LogError("Invalid input");
-    EXPECT_EQ(log.Text(), "tool: Invalid input\n");
+namespace {
+
+std::string Line(int line) {
+    return std::to_string(line);
 }
 
-TEST(Smoke, FakesAnswer) {
-    FakeApplianceOneVolume("/dev/c");
-    EXPECT_EQ(SpaceHasCacheAndSupportPin("/volume1"), 1);
-    FakeLibc::Reset();
-    sleep(5);
-    EXPECT_EQ(FakeLibc::sleeps, 1);
+// One message of each class, each in a function that readers of the log would look for. The line of
+// the call is handed back.
+int ReportError() {
+    LogError("Invalid input %d", 7);
+    return __LINE__ - 1;
+}
+int ReportNotice() {
+    LogNotice("Send bitmap OK");
+    return __LINE__ - 1;
+}
+int ReportVerbose() {
+    LogVerbose("Get UUID = %s", "u");
+    return __LINE__ - 1;
+}
+int ReportDebug() {
+    LogDebug("Next read start = %d bytes=%d", 0, 1);
+    return __LINE__ - 1;
+}
+
+class LogToStdout : public ::testing::Test {};
+
+class LogToSystemLog : public ::testing::Test {
+protected:
+    void SetUp() override {
+        LogToSyslog = 1;
+        SyslogRecords().clear();
+    }
+    void TearDown() override {
+        LogToSyslog = 0;
+        LogLevel = 1;
+    }
+    // The one record since the last call.
+    static std::string Taken() {
+        EXPECT_EQ(SyslogRecords().size(), 1U);
+        const std::string text = SyslogRecords().empty() ? "" : SyslogRecords()[0].text;
+        SyslogRecords().clear();
+        return text;
+    }
+};
+
+} // namespace
+
+// Before any other test has changed them.
+TEST(LogSettings, BeginWithTheSystemLogAtLevel1AndNoProgramName) {
+    EXPECT_EXIT(
+        {
+            const bool initial = LogToSyslog == 1 && LogLevel == 1 && ProgramName == nullptr;
+            exit(initial ? 0 : 1);
+        },
+        ::testing::ExitedWithCode(0), "");
+}
+
+TEST_F(LogToStdout, ErrorAtLevel1HasTheProgramNameAndTheText) {
+    CapturedLog log;
+    ReportError();
+    EXPECT_EQ(log.Text(), "tool: Invalid input 7\n");
+}
+
+TEST_F(LogToStdout, NoticeAtLevel1HasTheProgramNameAndTheText) {
+    CapturedLog log;
+    ReportNotice();
+    EXPECT_EQ(log.Text(), "tool: Send bitmap OK\n");
+}
+
+TEST_F(LogToStdout, VerboseAndDebugAreNotWrittenAtLevel1) {
+    CapturedLog log;
+    ReportVerbose();
+    ReportDebug();
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(LogToStdout, LongErrorHasFunctionLineAndMarker) {
+    for (const int level : {2, 3}) {
+        CapturedLog log(level);
+        const std::string line = Line(ReportError());
+        EXPECT_EQ(log.Text(), "tool: ReportError() [" + line + "] : ***** Invalid input 7\n");
+    }
+}
+
+TEST_F(LogToStdout, LongNoticeHasFunctionAndLineButNoMarker) {
+    for (const int level : {2, 3}) {
+        CapturedLog log(level);
+        const std::string line = Line(ReportNotice());
+        EXPECT_EQ(log.Text(), "tool: ReportNotice() [" + line + "] : Send bitmap OK\n");
+    }
+}
+
+TEST_F(LogToStdout, VerboseHasNoBlankBeforeTheColon) {
+    for (const int level : {2, 3}) {
+        CapturedLog log(level);
+        const std::string line = Line(ReportVerbose());
+        EXPECT_EQ(log.Text(), "tool: ReportVerbose() [" + line + "]: Get UUID = u\n");
+    }
+}
+
+TEST_F(LogToStdout, DebugIsWrittenAtLevel3OnlyAndHasNoBlankBeforeTheColon) {
+    CapturedLog silent(2);
+    ReportDebug();
+    EXPECT_EQ(silent.Text(), "");
+
+    CapturedLog log(3);
+    const std::string line = Line(ReportDebug());
+    EXPECT_EQ(log.Text(), "tool: ReportDebug() [" + line + "]: Next read start = 0 bytes=1\n");
+}
+
+TEST_F(LogToStdout, TextThatEndsInALineFeedIsFollowedByAnEmptyLine) {
+    CapturedLog log;
+    LogError("Read bitmap file (%s) error\n", "f");
+    EXPECT_EQ(log.Text(), "tool: Read bitmap file (f) error\n\n");
+}
+
+TEST_F(LogToStdout, TextOfAnyLengthIsWrittenWhole) {
+    for (const size_t length : {1000U, 1023U, 1024U, 1025U, 100000U}) {
+        CapturedLog log;
+        const std::string text(length, 'x');
+        LogError("%s", text.c_str());
+        EXPECT_EQ(log.Text(), "tool: " + text + "\n");
+    }
+}
+
+TEST_F(LogToStdout, PercentSignsInArgumentsAreText) {
+    CapturedLog log;
+    LogError("File (%s) doesn't exist", "%s%n%d");
+    EXPECT_EQ(log.Text(), "tool: File (%s%n%d) doesn't exist\n");
+}
+
+TEST_F(LogToStdout, NullTextIsWrittenAsThePrintFunctionsDo) {
+    CapturedLog log;
+    const char *volatile none = nullptr;
+    LogError("Get UUID = %s", none);
+    EXPECT_EQ(log.Text(), "tool: Get UUID = (null)\n");
+}
+
+TEST_F(LogToStdout, TraceIsWrittenInTheNoticeFormAtLevel2) {
+    CapturedLog log(2);
+    const int line = __LINE__ + 1;
+    LogTraceEntry();
+    LogTraceExit();
+    EXPECT_EQ(log.Text(), "tool: TestBody() [" + Line(line) + "] : +++++\n" +
+                              "tool: TestBody() [" + Line(line + 1) + "] : -----\n");
+}
+
+TEST_F(LogToStdout, TraceOfAScopeEnclosesItsMessages) {
+    CapturedLog log(2);
+    {
+        LogTraceScope();
+        LogNotice("inside");
+    }
+    EXPECT_EQ(log.Messages(),
+              (std::vector<std::string>{"TestBody() [N] : +++++", "TestBody() [N] : inside",
+                                        "TestBody() [N] : -----"}));
+}
+
+TEST_F(LogToStdout, TraceIsNotWrittenAtLevel1) {
+    CapturedLog log;
+    LogTraceScope();
+    LogTraceEntry();
+    LogTraceExit();
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(LogToStdout, ArgumentsOfSilentMessagesAreNotEvaluated) {
+    CapturedLog log(1);
+    int evaluated = 0;
+    LogVerbose("%d", ++evaluated);
+    LogDebug("%d", ++evaluated);
+    EXPECT_EQ(evaluated, 0);
+}
+
+TEST_F(LogToStdout, ErrnoIsAsBefore) {
+    CapturedLog log(3);
+    errno = EXDEV;
+    LogError("%s", std::string(5000, 'x').c_str());
+    EXPECT_EQ(errno, EXDEV);
+}
+
+TEST_F(LogToSystemLog, NothingGoesToStandardOutput) {
+    CapturedLog output;
+    LogToSyslog = 1;
+    ReportError();
+    EXPECT_EQ(output.Text(), "");
+    EXPECT_EQ(SyslogRecords().size(), 1U);
+}
+
+TEST_F(LogToSystemLog, Level1HasSourceFileLineAndText) {
+    const std::string error = Line(ReportError());
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + error + " Invalid input 7");
+    const std::string notice = Line(ReportNotice());
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + notice + " Send bitmap OK");
+    ReportVerbose();
+    ReportDebug();
+    EXPECT_TRUE(SyslogRecords().empty());
+}
+
+TEST_F(LogToSystemLog, LongErrorHasTheLineTwiceAndTheMarker) {
+    LogLevel = 2;
+    const std::string line = Line(ReportError());
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + line + " ReportError() [" + line +
+                           "] : ***** Invalid input 7");
+}
+
+TEST_F(LogToSystemLog, LongNoticeVerboseAndDebugHaveOneForm) {
+    LogLevel = 3;
+    const std::string notice = Line(ReportNotice());
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + notice + " ReportNotice() [" + notice +
+                           "] : Send bitmap OK");
+    const std::string verbose = Line(ReportVerbose());
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + verbose + " ReportVerbose() [" + verbose +
+                           "] : Get UUID = u");
+    const std::string debug = Line(ReportDebug());
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + debug + " ReportDebug() [" + debug +
+                           "] : Next read start = 0 bytes=1");
+}
+
+TEST_F(LogToSystemLog, DebugIsNotWrittenAtLevel2) {
+    LogLevel = 2;
+    ReportDebug();
+    EXPECT_TRUE(SyslogRecords().empty());
+}
+
+TEST_F(LogToSystemLog, TraceHasTheLongForm) {
+    LogLevel = 2;
+    const std::string entry = Line(__LINE__ + 1);
+    LogTraceEntry();
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + entry + " TestBody() [" + entry + "] : +++++");
+    const std::string leave = Line(__LINE__ + 1);
+    LogTraceExit();
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + leave + " TestBody() [" + leave + "] : -----");
+}
+
+TEST_F(LogToSystemLog, EveryClassHasErrorPriorityAndNoFacility) {
+    LogLevel = 3;
+    ReportError();
+    ReportNotice();
+    ReportVerbose();
+    ReportDebug();
+    ASSERT_EQ(SyslogRecords().size(), 4U);
+    for (const SyslogRecord &record : SyslogRecords()) {
+        EXPECT_EQ(record.priority, 3);
+    }
+}
+
+TEST_F(LogToSystemLog, LineFeedAtTheEndIsKept) {
+    const std::string line = Line(__LINE__ + 1);
+    LogError("Can't open bitmap file (%s) \n", "f");
+    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + line + " Can't open bitmap file (f) \n");
+}
+
+TEST(LogU64, GivesTheWholeRange) {
+    EXPECT_EQ(LogU64(0), 0ULL);
+    EXPECT_EQ(LogU64(UINT64_MAX), 18446744073709551615ULL);
+}
+
+TEST(GetTimeString, RepeatsTheWholeSubSecondPartInMicroseconds) {
+    long seconds = 0;
+    long milliseconds = 0;
+    long microseconds = 0;
+    const std::string text = GetTimeString();
+    ASSERT_EQ(
+        sscanf(text.c_str(), "sec=%ld msec=%ld usec=%ld", &seconds, &milliseconds, &microseconds),
+        3);
+    EXPECT_GT(seconds, 0);
+    EXPECT_EQ(milliseconds, microseconds / 1000);
+    EXPECT_LT(microseconds, 1000000);
+    char again[512];
+    snprintf(again, sizeof(again), "sec=%ld msec=%ld usec=%ld", seconds, milliseconds,
+             microseconds);
+    EXPECT_EQ(text, again);
+}
+
+TEST(GetTimeString, OverwritesOneBuffer) {
+    EXPECT_EQ(GetTimeString(), GetTimeString());
 }

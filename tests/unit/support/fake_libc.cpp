@@ -1,13 +1,16 @@
 #include "support/fake_libc.h"
 
+#include <algorithm>
 #include <atomic>
 #include <cerrno>
 #include <cstdarg>
 #include <cstddef>
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <map>
 #include <mutex>
 #include <pthread.h>
+#include <sys/stat.h>
 #include <sys/types.h>
 
 int FakeLibc::sleeps = 0;
@@ -15,6 +18,7 @@ int FakeLibc::syncs = 0;
 std::function<void()> FakeLibc::onSleep;
 std::function<void()> FakeLibc::onSync;
 std::function<int(unsigned long, void *)> FakeLibc::onIoctl;
+std::function<void(int, long long, size_t)> FakeLibc::onRead;
 
 namespace {
 
@@ -23,6 +27,8 @@ struct Order {
     int failAt = 0; // 0: never
     bool onwards = false;
     int error = 0;
+    int limitAt = 0; // 0: never
+    size_t limit = 0;
 };
 
 std::mutex ordersMutex;
@@ -49,6 +55,16 @@ int FailureOf(const char *function) {
     return fails ? order.error : 0;
 }
 
+// How many of these bytes the call that FailureOf() has just counted may move.
+size_t Limited(const char *function, size_t size) {
+    if (!anyOrder) {
+        return size;
+    }
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    const Order &order = Orders()[function];
+    return order.limitAt != 0 && order.calls == order.limitAt ? std::min(order.limit, size) : size;
+}
+
 void SetOrder(const std::string &function, int error, int nth, bool onwards) {
     const std::lock_guard<std::mutex> lock(ordersMutex);
     Order &order = Orders()[function];
@@ -70,6 +86,7 @@ void FakeLibc::Reset() {
     onSleep = nullptr;
     onSync = nullptr;
     onIoctl = nullptr;
+    onRead = nullptr;
     const std::lock_guard<std::mutex> lock(ordersMutex);
     Orders().clear();
     anyOrder = false;
@@ -81,6 +98,20 @@ void FakeLibc::Fail(const std::string &function, int error, int nth) {
 
 void FakeLibc::FailFrom(const std::string &function, int error, int nth) {
     SetOrder(function, error, nth, true);
+}
+
+void FakeLibc::Limit(const std::string &function, size_t bytes, int nth) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Order &order = Orders()[function];
+    order.limitAt = order.calls + nth;
+    order.limit = bytes;
+    anyOrder = true;
+}
+
+void FakeLibc::Count(const std::string &function) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Orders()[function];
+    anyOrder = true;
 }
 
 int FakeLibc::Calls(const std::string &function) {
@@ -146,15 +177,30 @@ key_t ftok(const char *path, int project) noexcept {
 }
 
 ssize_t write(int fd, const void *data, size_t size) {
-    PASS_OR_FAIL(-1, write, ssize_t(*)(int, const void *, size_t), fd, data, size);
+    PASS_OR_FAIL(-1, write, ssize_t(*)(int, const void *, size_t), fd, data,
+                 Limited("write", size));
 }
 
 ssize_t read(int fd, void *data, size_t size) {
-    PASS_OR_FAIL(-1, read, ssize_t(*)(int, void *, size_t), fd, data, size);
+    if (FakeLibc::onRead) {
+        static const auto realSeek = Real<off_t (*)(int, off_t, int)>("lseek64");
+        FakeLibc::onRead(fd, realSeek(fd, 0, SEEK_CUR), size);
+    }
+    PASS_OR_FAIL(-1, read, ssize_t(*)(int, void *, size_t), fd, data, Limited("read", size));
 }
 
 off_t lseek64(int fd, off_t offset, int whence) noexcept {
     PASS_OR_FAIL(-1, lseek, off_t(*)(int, off_t, int), fd, offset, whence);
+}
+
+// Under whatever name the platform's 64-bit variant has; the real answer comes by another call.
+int stat(const char *path, struct stat *status) noexcept {
+    const int error = FailureOf("stat");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    return fstatat(AT_FDCWD, path, status, 0);
 }
 
 int fsync(int fd) {

@@ -6,6 +6,7 @@
 #ifndef TESTS_SUPPORT_FAKE_LIBC_H
 #define TESTS_SUPPORT_FAKE_LIBC_H
 
+#include <cstddef>
 #include <functional>
 #include <string>
 
@@ -22,15 +23,23 @@ struct FakeLibc {
     // The n-th next call (1: the next) of this function fails with this errno (a function that
     // returns its error returns it; aligned_alloc returns null). Known: ioctl, msgctl, msgget,
     // msgsnd, write, read, lseek, fsync, rename, fchown, pthread_mutex_init, signal, aligned_alloc,
-    // ftok.
+    // ftok, stat.
     static void Fail(const std::string &function, int error, int nth = 1);
     // The same for every call from the n-th on.
     static void FailFrom(const std::string &function, int error, int nth = 1);
+    // The n-th next read or write moves at most this many bytes; 0: none, and no failure either.
+    static void Limit(const std::string &function, size_t bytes, int nth = 1);
+    // Counts the function's calls from now on; ordering a failure or a limit does so, too.
+    static void Count(const std::string &function);
     // How often the function was called since Reset().
     static int Calls(const std::string &function);
 
     // Answers every ioctl while it is set: (request, third argument) to the result; -1 with errno.
     static std::function<int(unsigned long, void *)> onIoctl;
+
+    // Told of every read before it happens: descriptor, its position (bytes; -1 where there is
+    // none), bytes asked for.
+    static std::function<void(int, long long, size_t)> onRead;
 };
 
 #endif
