@@ -11,4 +11,15 @@ function(vesk_module name)
   target_include_directories(${name} PUBLIC ${PROJECT_SOURCE_DIR}/src)
   target_link_libraries(${name} PUBLIC vesk::options ${ARG_DEPENDS})
   target_link_libraries(veskcachepin PUBLIC ${name})
+
+  file(RELATIVE_PATH folder ${PROJECT_SOURCE_DIR}/src ${CMAKE_CURRENT_SOURCE_DIR})
+  list(TRANSFORM ARG_SOURCES PREPEND ${folder}/)
+  set_property(GLOBAL APPEND_STRING PROPERTY VESK_MODULES
+               "${name}: ${ARG_SOURCES}: ${ARG_DEPENDS}\n")
+endfunction()
+
+# Writes the module graph, a line each "name: sources: dependencies", for scripts/lint.
+function(vesk_write_modules file)
+  get_property(modules GLOBAL PROPERTY VESK_MODULES)
+  file(WRITE ${file} "${modules}")
 endfunction()

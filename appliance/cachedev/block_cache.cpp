@@ -1,23 +1,27 @@
 #include "cachedev/block_cache.h"
 
+#include <utility>
+
 namespace {
 
-void MakeEvictable(BlockCache &cache, uint32_t slot) {
-    // lastUse is unique: every use takes a new value of the clock.
-    cache.evictable.emplace_hint(cache.evictable.end(), cache.slots[slot].lastUse, slot);
+void MakeEvictable(BlockCache &cache, uint32_t number) {
+    CacheSlot &slot = cache.slots[number];
+    slot.useNode.key() = slot.lastUse;
+    cache.evictable.insert(cache.evictable.end(), std::move(slot.useNode));
 }
 
-void UnpinSlotOf(BlockCache &cache, uint64_t block) {
-    const uint32_t slot = cache.slotOfBlock.at(block);
-    cache.slots[slot].pinned = false;
-    if (!cache.slots[slot].inUse)
-        MakeEvictable(cache, slot);
+// Takes the pin off a slot; the caller takes the block out of pinnedBlocks.
+void ClearPin(BlockCache &cache, uint32_t number) {
+    cache.slots[number].pinned = false;
+    if (!cache.slots[number].inUse)
+        MakeEvictable(cache, number);
 }
 
+// Takes the block out of a slot that is in use or no longer evictable.
 void Forget(BlockCache &cache, CacheSlot &slot) {
     if (slot.pinned)
-        cache.pinnedBlocks.erase(slot.block);
-    cache.slotOfBlock.erase(slot.block);
+        slot.pinNode = cache.pinnedBlocks.extract(slot.block);
+    slot.indexNode = cache.slotOfBlock.extract(slot.block);
     slot.block = kNoBlock;
     slot.pinned = false;
 }
@@ -28,11 +32,16 @@ void BlockCacheInit(BlockCache &cache, uint32_t slotCount) {
     cache = BlockCache();
     cache.slots.resize(slotCount);
     cache.slotOfBlock.reserve(slotCount);
-    // Handed out from the back, so an empty cache fills in slot order and a sequential scan gets
-    // neighbouring slots, which are written with one call.
     cache.freeSlots.reserve(slotCount);
-    for (uint32_t slot = slotCount; slot > 0; --slot)
-        cache.freeSlots.push_back(slot - 1);
+    // Handed out from the back, so an empty cache fills in slot order and a sequential scan gets
+    // neighbouring slots, which take part in one transfer.
+    for (uint32_t number = slotCount; number-- > 0;) {
+        CacheSlot &slot = cache.slots[number];
+        slot.useNode = cache.evictable.extract(cache.evictable.emplace(0, number).first);
+        slot.indexNode = cache.slotOfBlock.extract(cache.slotOfBlock.emplace(0, number).first);
+        slot.pinNode = cache.pinnedBlocks.extract(cache.pinnedBlocks.insert(0).first);
+        cache.freeSlots.push_back(number);
+    }
 }
 
 uint32_t BlockCacheFind(const BlockCache &cache, uint64_t block) {
@@ -43,7 +52,7 @@ uint32_t BlockCacheFind(const BlockCache &cache, uint64_t block) {
 void BlockCacheUse(BlockCache &cache, uint32_t slot) {
     CacheSlot &used = cache.slots[slot];
     if (!used.pinned)
-        cache.evictable.erase(used.lastUse);
+        used.useNode = cache.evictable.extract(used.lastUse);
     used.inUse = true;
     used.lastUse = ++cache.useClock;
 }
@@ -55,7 +64,7 @@ uint32_t BlockCacheTake(BlockCache &cache) {
         cache.freeSlots.pop_back();
     } else if (!cache.evictable.empty()) {
         slot = cache.evictable.begin()->second;
-        cache.evictable.erase(cache.evictable.begin());
+        cache.slots[slot].useNode = cache.evictable.extract(cache.evictable.begin());
         Forget(cache, cache.slots[slot]);
         ++cache.evictions;
     } else {
@@ -71,18 +80,24 @@ bool BlockCacheMayTakeLater(const BlockCache &cache) {
 }
 
 void BlockCacheStore(BlockCache &cache, uint32_t slot, uint64_t block) {
-    cache.slots[slot].block = block;
-    cache.slotOfBlock.emplace(block, slot);
+    CacheSlot &stored = cache.slots[slot];
+    stored.block = block;
+    stored.indexNode.key() = block;
+    cache.slotOfBlock.insert(std::move(stored.indexNode));
 }
 
-void BlockCacheRelease(BlockCache &cache, uint32_t slot, bool pin) {
-    CacheSlot &used = cache.slots[slot];
-    used.inUse = false;
-    if (pin && !used.pinned) {
-        used.pinned = true;
-        cache.pinnedBlocks.insert(used.block);
-    }
-    if (!used.pinned)
+void BlockCachePin(BlockCache &cache, uint32_t slot) {
+    CacheSlot &pinned = cache.slots[slot];
+    if (pinned.pinned)
+        return;
+    pinned.pinned = true;
+    pinned.pinNode.value() = pinned.block;
+    cache.pinnedBlocks.insert(std::move(pinned.pinNode));
+}
+
+void BlockCacheRelease(BlockCache &cache, uint32_t slot) {
+    cache.slots[slot].inUse = false;
+    if (!cache.slots[slot].pinned)
         MakeEvictable(cache, slot);
 }
 
@@ -94,18 +109,15 @@ void BlockCacheDrop(BlockCache &cache, uint32_t slot) {
 }
 
 void BlockCacheUnpin(BlockCache &cache, const BlockRun &run) {
-    const auto first = cache.pinnedBlocks.lower_bound(run.first);
     const auto end = cache.pinnedBlocks.lower_bound(run.first + run.count);
-    for (auto block = first; block != end; ++block)
-        UnpinSlotOf(cache, *block);
-    cache.pinnedBlocks.erase(first, end);
+    for (auto block = cache.pinnedBlocks.lower_bound(run.first); block != end;) {
+        const uint32_t slot = cache.slotOfBlock.find(*block)->second;
+        ClearPin(cache, slot);
+        cache.slots[slot].pinNode = cache.pinnedBlocks.extract(block++);
+    }
 }
 
-void BlockCacheUnpinAll(BlockCache &cache) {
-    for (const uint64_t block : cache.pinnedBlocks)
-        UnpinSlotOf(cache, block);
-    cache.pinnedBlocks.clear();
-}
+void BlockCacheUnpinAll(BlockCache &cache) { BlockCacheUnpin(cache, {0, UINT64_MAX}); }
 
 std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache) {
     std::vector<BlockRun> runs;

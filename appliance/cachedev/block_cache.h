@@ -24,24 +24,34 @@ struct BlockRun {
     uint64_t count; // blocks
 };
 
+using UseOrder = std::map<uint64_t, uint32_t>;             // last use -> slot number
+using BlockIndex = std::unordered_map<uint64_t, uint32_t>; // block number -> slot number
+using BlockSet = std::set<uint64_t>;                       // block numbers
+
 struct CacheSlot {
     uint64_t block = kNoBlock; // block whose bytes the slot holds; kNoBlock: none
-    uint64_t lastUse = 0;      // value of BlockCache::useClock at the last use
+    uint64_t lastUse = 0;      // value of BlockCache::useClock at the last use, unique
     bool inUse = false;        // a request works on the slot's bytes
     bool pinned = false;
+    // The slot's nodes for the containers below, while they are not in there. They are made once, so
+    // that no change of the cache's state allocates memory or can fail.
+    UseOrder::node_type useNode;
+    BlockIndex::node_type indexNode;
+    BlockSet::node_type pinNode;
 };
 
 struct BlockCache {
     std::vector<CacheSlot> slots;
-    std::unordered_map<uint64_t, uint32_t> slotOfBlock; // block number -> slot number
-    std::map<uint64_t, uint32_t> evictable;             // lastUse -> slot number, oldest first
-    std::vector<uint32_t> freeSlots;                    // slot numbers; the last one is handed out
-    std::set<uint64_t> pinnedBlocks;                    // block numbers
-    uint64_t useClock = 0;                              // counts uses
-    uint64_t evictions = 0;                             // blocks that gave way to another block
+    BlockIndex slotOfBlock;          // the cached blocks
+    UseOrder evictable;              // the evictable slots, least recently used first
+    BlockSet pinnedBlocks;           // the pinned blocks
+    std::vector<uint32_t> freeSlots; // slot numbers; the last one is handed out
+    uint64_t useClock = 0;           // counts uses
+    uint64_t evictions = 0;          // blocks that gave way to another block
 };
 
-// Makes `cache` an empty cache of `slotCount` slots (1 .. kNoSlot - 1).
+// Makes `cache` an empty cache of `slotCount` slots (1 .. kNoSlot - 1). May throw std::bad_alloc; none
+// of the functions below that change the cache throws.
 void BlockCacheInit(BlockCache &cache, uint32_t slotCount);
 
 // The slot that holds `block`, or kNoSlot.
@@ -60,11 +70,14 @@ uint32_t BlockCacheTake(BlockCache &cache);
 // slots; false: every slot is pinned.
 bool BlockCacheMayTakeLater(const BlockCache &cache);
 
-// Records that a taken slot now holds `block`, which must not be cached elsewhere.
+// Records that a taken slot, still in use, now holds `block`, which must not be cached elsewhere.
 void BlockCacheStore(BlockCache &cache, uint32_t slot, uint64_t block);
 
-// Ends the use of a slot that holds a block. `pin` pins it; false leaves its pin as it is.
-void BlockCacheRelease(BlockCache &cache, uint32_t slot, bool pin);
+// Pins the block of a slot that is in use.
+void BlockCachePin(BlockCache &cache, uint32_t slot);
+
+// Ends the use of a slot that holds a block.
+void BlockCacheRelease(BlockCache &cache, uint32_t slot);
 
 // Ends the use of a slot whose bytes cannot be trusted: its block (if any) is no longer cached nor
 // pinned and the slot is free.

@@ -7,6 +7,7 @@
 #include <cstring>
 #include <fcntl.h>
 #include <sys/file.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -76,11 +77,33 @@ bool IsSameImage(const struct stat &one, const struct stat &other) {
     return one.st_dev == other.st_dev && one.st_ino == other.st_ino;
 }
 
+int MapSlots(CacheImages &images, std::string &error) {
+    const uint64_t bytes = images.slots * kBlockBytes;
+    void *start = MAP_FAILED;
+    errno = EFBIG;
+    if (bytes <= PTRDIFF_MAX)
+        start = mmap(nullptr, static_cast<size_t>(bytes), PROT_READ | PROT_WRITE, MAP_SHARED,
+                     images.ssd.fd, 0);
+    if (start == MAP_FAILED) {
+        error = "cannot map the SSD image (" + std::to_string(bytes) +
+                " bytes) into memory: " + strerror(errno);
+        return -1;
+    }
+    images.slotMap.start = start;
+    images.slotMap.bytes = static_cast<size_t>(bytes);
+    return 0;
+}
+
 } // namespace
 
 ImageFile::~ImageFile() {
     if (fd >= 0)
         close(fd);
+}
+
+SlotMap::~SlotMap() {
+    if (start != nullptr)
+        munmap(start, bytes);
 }
 
 int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, CacheImages &images,
@@ -109,7 +132,7 @@ int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, 
     }
     images.slots =
         static_cast<uint32_t>(std::min<uint64_t>(ssdBytes / kBlockBytes, UINT32_MAX - 1));
-    return 0;
+    return MapSlots(images, error);
 }
 
 int CacheImagesReadBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
@@ -128,17 +151,13 @@ int CacheImagesWriteSsd(const CacheImages &images, uint64_t offset, const ImageP
     return TransferAll(pwritev, images.ssd.fd, offset, pieces);
 }
 
-ImagePieces ImagePiecesSlice(const ImagePieces &pieces, size_t start, size_t length) {
-    ImagePieces slice = pieces;
-    for (int i = 0; i < slice.count; ++i) {
-        struct iovec &part = slice.parts[i];
-        const size_t skipped = std::min(start, part.iov_len);
-        part.iov_base = static_cast<char *>(part.iov_base) + skipped;
-        part.iov_len = std::min(part.iov_len - skipped, length);
-        start -= skipped;
-        length -= part.iov_len;
-    }
-    return slice;
+void ImagePiecesAdd(ImagePieces &pieces, void *start, size_t bytes) {
+    pieces.parts[pieces.count++] = {start, bytes};
+}
+
+void *CacheImagesSlotAddress(const CacheImages &images, uint32_t slot, size_t within) {
+    return static_cast<char *>(images.slotMap.start) +
+           static_cast<size_t>(slot * kBlockBytes + within);
 }
 
 int CacheImagesSyncBacking(const CacheImages &images) {

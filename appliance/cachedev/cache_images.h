@@ -4,6 +4,11 @@
 // byte n * kBlockBytes. Nothing here knows which block is in which slot, and nothing is locked:
 // any number of threads may call these functions, and the caller sees to it that nobody reads what
 // somebody else is writing.
+//
+// The slots are mapped into memory as well, so that the kernel can move a block from the backing
+// image into its slot, and from there to the reader, without a copy in between. The program itself
+// never touches mapped memory but has system calls do it: should the SSD image be cut short or its
+// disk be full, that is an error result (-EFAULT) instead of a SIGBUS.
 #pragma once
 
 #include <cstddef>
@@ -20,17 +25,29 @@ struct ImageFile {
     ImageFile &operator=(const ImageFile &) = delete;
 };
 
+// The mapped slots; unmapped with the record.
+struct SlotMap {
+    void *start = nullptr; // null: not mapped
+    size_t bytes = 0;
+    SlotMap() = default;
+    ~SlotMap();
+    SlotMap(const SlotMap &) = delete;
+    SlotMap &operator=(const SlotMap &) = delete;
+};
+
 struct CacheImages {
     ImageFile backing;
     ImageFile ssd;
+    SlotMap slotMap;
     uint64_t deviceBytes = 0; // size of the backing image, a multiple of 512
     uint32_t slots = 0;       // whole cache blocks in the SSD image
 };
 
-// Memory pieces whose bytes follow each other in an image. 1 .. 3 pieces.
+// Memory pieces whose bytes follow each other in an image.
+constexpr int kMostPieces = 18;
 struct ImagePieces {
-    struct iovec parts[3]; // lengths in bytes, may be 0
-    int count;
+    struct iovec parts[kMostPieces]; // lengths in bytes, may be 0
+    int count = 0;                   // pieces, at most kMostPieces
 };
 
 // Opens both images for reading and writing. Regular files, which are locked against a second cache
@@ -44,8 +61,12 @@ int CacheImagesWriteBacking(const CacheImages &images, uint64_t offset, const Im
 int CacheImagesReadSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);
 int CacheImagesWriteSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);
 
-// The `length` bytes from byte `start` on of the memory that `pieces` describe.
-ImagePieces ImagePiecesSlice(const ImagePieces &pieces, size_t start, size_t length);
+// Appends a piece.
+void ImagePiecesAdd(ImagePieces &pieces, void *start, size_t bytes);
+
+// Where the byte at `within` (below kBlockBytes) of a slot is mapped. Only to be handed to system
+// calls.
+void *CacheImagesSlotAddress(const CacheImages &images, uint32_t slot, size_t within);
 
 // Makes what was written to the backing image durable. 0 or a negative errno.
 int CacheImagesSyncBacking(const CacheImages &images);

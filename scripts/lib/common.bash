@@ -40,17 +40,25 @@ install_packages() {
     rm -f "$log"
 }
 
-# build_preset PRESET [cmake option...]: configures and builds into build-PRESET, one copy at a time.
-build_preset() {
-    local preset=$1 log
+# with_build_folder PRESET COMMAND...: runs the command in TREE, one copy of the scripts at a time for
+# each build folder; what it prints is kept and shown only when it fails.
+with_build_folder() {
+    local folder=$TREE/build-$1
     shift
-    mkdir -p "$TREE/build-$preset"
-    log=$TREE/build-$preset/build.log
+    mkdir -p "$folder"
     (
         flock 8
-        cd "$TREE" && cmake --preset "$preset" "$@" && cmake --build --preset "$preset"
-    ) 8>"$TREE/build-$preset/.lock" >"$log" 2>&1 || {
-        tail -n 60 "$log" >&2
-        die "the build failed; the whole output is in $log"
-    }
+        cd "$TREE"
+        "$@" >"$folder/last.log" 2>&1 || {
+            tail -n 60 "$folder/last.log" >&2
+            die "\"$*\" failed; the whole output is in $folder/last.log"
+        }
+    ) 8>"$folder/.lock"
+}
+
+# configure_preset PRESET, build_preset PRESET: into build-PRESET.
+configure_preset() { with_build_folder "$1" cmake --preset "$1"; }
+build_preset() {
+    configure_preset "$1"
+    with_build_folder "$1" cmake --build --preset "$1"
 }

@@ -60,7 +60,9 @@ std::string UuidMake() {
 }
 
 std::string FolderMake() {
-    std::string path = testing::TempDir() + "vesk-appliance-XXXXXX";
+    const std::string place =
+        PrivateWorldEnter().empty() ? std::string(kWorldPath) + "/" : testing::TempDir();
+    std::string path = place + "vesk-appliance-XXXXXX";
     if (mkdtemp(path.data()) == nullptr) {
         ADD_FAILURE() << "mkdtemp: " << std::strerror(errno);
     }

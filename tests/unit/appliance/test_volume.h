@@ -81,7 +81,8 @@ public:
 // The pattern that TestFile::Write puts at this place of a file.
 std::vector<char> TestPattern(uint64_t offset, uint64_t length);
 
-// An empty folder that is removed with all that is in it.
+// An empty folder that is removed with all that is in it; in the private world where there can be
+// one.
 class TestFolder {
 public:
     TestFolder();

@@ -11,6 +11,11 @@
 
 namespace {
 
+// Taken before any test runs.
+const int initialLogToSyslog = LogToSyslog;
+const int initialLogLevel = LogLevel;
+const char *const initialProgramName = ProgramName;
+
 std::string Line(int line) {
     return std::to_string(line);
 }
@@ -57,14 +62,10 @@ protected:
 
 } // namespace
 
-// Before any other test has changed them.
 TEST(LogSettings, BeginWithTheSystemLogAtLevel1AndNoProgramName) {
-    EXPECT_EXIT(
-        {
-            const bool initial = LogToSyslog == 1 && LogLevel == 1 && ProgramName == nullptr;
-            exit(initial ? 0 : 1);
-        },
-        ::testing::ExitedWithCode(0), "");
+    EXPECT_EQ(initialLogToSyslog, 1);
+    EXPECT_EQ(initialLogLevel, 1);
+    EXPECT_EQ(initialProgramName, nullptr);
 }
 
 TEST_F(LogToStdout, ErrorAtLevel1HasTheProgramNameAndTheText) {
