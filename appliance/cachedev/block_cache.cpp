@@ -117,7 +117,9 @@ void BlockCacheUnpin(BlockCache &cache, const BlockRun &run) {
     }
 }
 
-void BlockCacheUnpinAll(BlockCache &cache) { BlockCacheUnpin(cache, {0, UINT64_MAX}); }
+void BlockCacheUnpinAll(BlockCache &cache) {
+    BlockCacheUnpin(cache, {0, UINT64_MAX});
+}
 
 std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache) {
     std::vector<BlockRun> runs;

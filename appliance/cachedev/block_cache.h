@@ -33,8 +33,8 @@ struct CacheSlot {
     uint64_t lastUse = 0;      // value of BlockCache::useClock at the last use, unique
     bool inUse = false;        // a request works on the slot's bytes
     bool pinned = false;
-    // The slot's nodes for the containers below, while they are not in there. They are made once, so
-    // that no change of the cache's state allocates memory or can fail.
+    // The slot's nodes for the containers below, while they are not in there. They are made once,
+    // so that no change of the cache's state allocates memory or can fail.
     UseOrder::node_type useNode;
     BlockIndex::node_type indexNode;
     BlockSet::node_type pinNode;
@@ -50,8 +50,8 @@ struct BlockCache {
     uint64_t evictions = 0;          // blocks that gave way to another block
 };
 
-// Makes `cache` an empty cache of `slotCount` slots (1 .. kNoSlot - 1). May throw std::bad_alloc; none
-// of the functions below that change the cache throws.
+// Makes `cache` an empty cache of `slotCount` slots (1 .. kNoSlot - 1). May throw std::bad_alloc;
+// none of the functions below that change the cache throws.
 void BlockCacheInit(BlockCache &cache, uint32_t slotCount);
 
 // The slot that holds `block`, or kNoSlot.

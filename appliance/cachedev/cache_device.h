@@ -20,6 +20,7 @@
 #include <condition_variable>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <memory>
 #include <mutex>
@@ -92,11 +93,17 @@ struct CacheSnapshot {
 // Starts with an empty cache on `device.images`, which must be open. Before any other use.
 void CacheDeviceStart(CacheDevice &device);
 
+// Receives the data of a read, in pieces of memory whose bytes follow each other. Some may lie in
+// the mapped SSD image: pass them to system calls, see cache_images.h. They hold the data only
+// until the function returns. Must not throw, nor call the device again.
+using CacheReader = std::function<void(const ImagePieces &pieces)>;
+
 // Reads up to `size` bytes at `offset` through the cache: bytes read, fewer at the device's end, 0
-// past it, or a negative errno. A block that cannot be had from the SSD image is read from the
-// backing image instead and leaves the cache. A missed block stays uncached only while every slot
-// is pinned.
-int64_t CacheDeviceRead(CacheDevice &device, uint64_t offset, char *buffer, size_t size);
+// past it, or a negative errno. `deliver` is called once, when the result is above 0, with that
+// many bytes. A block that cannot be had from the SSD image is read from the backing image instead
+// and leaves the cache. A missed block stays uncached only while every slot is pinned.
+int64_t CacheDeviceRead(CacheDevice &device, uint64_t offset, size_t size,
+                        const CacheReader &deliver);
 
 // Writes up to `size` bytes at `offset` to the backing image and to the slots of cached blocks:
 // bytes written, fewer at the device's end, -ENOSPC past it, or another negative errno (the blocks

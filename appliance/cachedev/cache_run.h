@@ -43,8 +43,8 @@ CacheRun CacheRunTakeForWrite(CacheDevice &device, uint64_t first, uint64_t last
 // How many of the blocks `first` .. `last` are not cached now.
 uint64_t CacheRunCountMissing(CacheDevice &device, uint64_t first, uint64_t last);
 
-// The run's bytes have been moved: counts it, makes loaded blocks cached ones, pins those blocks of a
-// read whose bits are set, or takes the blocks out of the cache when the run is broken. The slots
+// The run's bytes have been moved: counts it, makes loaded blocks cached ones, pins those blocks of
+// a read whose bits are set, or takes the blocks out of the cache when the run is broken. The slots
 // stay in use. `error`: the result of the move, 0 or a negative errno.
 void CacheRunPublish(CacheDevice &device, CacheRun &run, int error);
 
@@ -52,7 +52,8 @@ void CacheRunPublish(CacheDevice &device, CacheRun &run, int error);
 void CacheRunRelease(CacheDevice &device, const CacheRun &run);
 
 // The end of the group of blocks that begins at block `index` of the run and whose slots are
-// neighbours: their bytes follow each other in the SSD image as on the device. That block has a slot.
+// neighbours: their bytes follow each other in the SSD image as on the device. That block has a
+// slot.
 size_t CacheRunGroupEnd(const CacheRun &run, size_t index);
 
 // Where block `index` of the run begins, in bytes on the device.

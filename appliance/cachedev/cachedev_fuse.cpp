@@ -4,197 +4,268 @@
 #include "cachedev/state_json.h"
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
-#include <cstring>
 #include <fcntl.h>
+#include <memory>
 #include <new>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <vector>
 
 namespace {
 
 // Not in every libfuse header: the caller has 4-byte pointers.
 constexpr unsigned kIoctlFrom32Bit = 1U << 3;
 
-// An open file; its address is the file handle.
-struct OpenFile {
-    bool isDevice;
-    std::string stateText; // of the state file, as it was at open
-};
+constexpr fuse_ino_t kRootInode = FUSE_ROOT_ID;
+constexpr fuse_ino_t kDeviceInode = 2;
+constexpr fuse_ino_t kStateInode = 3;
 
-ServedDevice &Served() {
-    return *static_cast<ServedDevice *>(fuse_get_context()->private_data);
+constexpr double kNameTimeout = 60;     // seconds; the names never change
+constexpr double kAttributeTimeout = 0; // seconds; the state file changes its length
+
+// What an open of the state file shows: the state at that moment. Its address is the file handle.
+using StateText = std::string;
+
+ServedDevice &Served(fuse_req_t request) {
+    return *static_cast<ServedDevice *>(fuse_req_userdata(request));
 }
 
-OpenFile *FileOf(const struct fuse_file_info *info) {
+const StateText *StateOf(const struct fuse_file_info *info) {
     // The handle is the address that Open stored there.
     // NOLINTNEXTLINE(performance-no-int-to-ptr)
-    return reinterpret_cast<OpenFile *>(static_cast<uintptr_t>(info->fh));
+    return reinterpret_cast<const StateText *>(static_cast<uintptr_t>(info->fh));
 }
 
-// Runs the body of a callback; what it throws becomes an error number.
-template <typename Body> int Guarded(Body body) {
+// Runs the body of a callback: it replies and returns 0, or does not reply and returns an errno,
+// which is then the reply. It may throw only before it replies.
+template <typename Body> void Guarded(fuse_req_t request, Body body) {
+    int error = EIO;
     try {
-        return body();
+        error = body();
     } catch (const std::bad_alloc &) {
-        return -ENOMEM;
+        error = ENOMEM;
     } catch (...) {
-        return -EIO;
+        error = EIO;
     }
+    if (error != 0)
+        fuse_reply_err(request, error);
 }
 
-std::string StateText(ServedDevice &served) {
+StateText CurrentState(ServedDevice &served) {
     return StateJsonText(CacheDeviceSnapshot(served.device), getpid());
 }
 
-void *Init(struct fuse_conn_info *connection, struct fuse_config *config) {
-    // Without this flag the kernel asks for a truncation apart from the open, which is refused;
-    // with it, it would take the device for empty from then on, whatever the answer.
-    connection->want &= ~static_cast<unsigned>(FUSE_CAP_ATOMIC_O_TRUNC);
-    config->nullpath_ok = 1;    // an open file is known by its handle
-    config->attr_timeout = 0;   // the state file changes its length
-    config->entry_timeout = 60; // seconds; the names never change
-    ServedDevice &served = Served();
-    if (served.onReady) {
-        Guarded([&served] {
-            served.onReady();
-            return 0;
-        });
+// The attributes of an inode; `info` is that of an open file or null.
+struct stat StatusOf(ServedDevice &served, fuse_ino_t inode, const struct fuse_file_info *info) {
+    struct stat status = {};
+    uint64_t bytes = 0;
+    if (inode == kDeviceInode) {
+        status.st_mode = S_IFREG | 0600;
+        bytes = served.device.images.deviceBytes;
+    } else if (inode == kStateInode) {
+        status.st_mode = S_IFREG | 0444;
+        bytes = info != nullptr ? StateOf(info)->size() : CurrentState(served).size();
+    } else {
+        status.st_mode = S_IFDIR | 0755;
     }
-    return &served;
-}
-
-void FillStatus(const ServedDevice &served, mode_t mode, uint64_t bytes, struct stat &status) {
-    status = {};
-    status.st_mode = mode;
-    status.st_nlink = S_ISDIR(mode) ? 2 : 1;
+    status.st_ino = inode;
+    status.st_nlink = inode == kRootInode ? 2 : 1;
     status.st_uid = geteuid();
     status.st_gid = getegid();
     status.st_size = static_cast<off_t>(bytes);
     status.st_blocks = static_cast<blkcnt_t>((bytes + kSectorBytes - 1) / kSectorBytes);
     status.st_blksize = static_cast<blksize_t>(kBlockBytes);
     status.st_atime = status.st_mtime = status.st_ctime = served.startTime;
+    return status;
 }
 
-int GetAttributes(const char *path, struct stat *status, struct fuse_file_info *info) {
-    return Guarded([=] {
-        ServedDevice &served = Served();
-        const OpenFile *file = info != nullptr ? FileOf(info) : nullptr;
-        if (file != nullptr ? file->isDevice : path != nullptr && served.devicePath == path)
-            FillStatus(served, S_IFREG | 0600, served.device.images.deviceBytes, *status);
-        else if (file != nullptr)
-            FillStatus(served, S_IFREG | 0444, file->stateText.size(), *status);
-        else if (path != nullptr && served.statePath == path)
-            FillStatus(served, S_IFREG | 0444, StateText(served).size(), *status);
-        else if (path == nullptr || strcmp(path, "/") == 0)
-            FillStatus(served, S_IFDIR | 0755, 0, *status);
+void Init(void *userData, struct fuse_conn_info *connection) {
+    // Without this flag the kernel asks for a truncation apart from the open, which is refused;
+    // with it, it would take the device for empty from then on, whatever the answer.
+    connection->want &= ~static_cast<unsigned>(FUSE_CAP_ATOMIC_O_TRUNC);
+    const auto &served = *static_cast<ServedDevice *>(userData);
+    if (served.onReady)
+        served.onReady();
+}
+
+void LookUp(fuse_req_t request, fuse_ino_t, const char *name) {
+    Guarded(request, [=] {
+        ServedDevice &served = Served(request);
+        struct fuse_entry_param entry = {};
+        if (served.deviceName == name)
+            entry.ino = kDeviceInode;
+        else if (served.stateName == name)
+            entry.ino = kStateInode;
         else
-            return -ENOENT;
+            return ENOENT;
+        entry.attr = StatusOf(served, entry.ino, nullptr);
+        entry.attr_timeout = kAttributeTimeout;
+        entry.entry_timeout = kNameTimeout;
+        fuse_reply_entry(request, &entry);
         return 0;
     });
 }
 
-int ReadFolder(const char *, void *buffer, fuse_fill_dir_t fill, off_t, struct fuse_file_info *,
-               enum fuse_readdir_flags) {
-    return Guarded([=] {
-        const ServedDevice &served = Served();
-        const char *const names[] = {".", "..", served.devicePath.c_str() + 1,
-                                     served.statePath.c_str() + 1};
-        for (const char *name : names)
-            fill(buffer, name, nullptr, 0, static_cast<fuse_fill_dir_flags>(0));
+void GetAttributes(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
+    Guarded(request, [=] {
+        const struct stat status = StatusOf(Served(request), inode, info);
+        fuse_reply_attr(request, &status, kAttributeTimeout);
         return 0;
     });
 }
 
-int Open(const char *path, struct fuse_file_info *info) {
-    return Guarded([=] {
-        ServedDevice &served = Served();
-        const bool isDevice = served.devicePath == path;
-        if (!isDevice && served.statePath != path)
-            return -ENOENT;
-        if (!isDevice && (info->flags & O_ACCMODE) != O_RDONLY)
-            return -EACCES;
-        auto file = std::make_unique<OpenFile>(OpenFile{isDevice, {}});
-        if (!isDevice)
-            file->stateText = StateText(served);
+// Like a block device the file keeps its size; nothing else can be set either.
+void SetAttributes(fuse_req_t request, fuse_ino_t inode, struct stat *wanted, int which,
+                   struct fuse_file_info *info) {
+    Guarded(request, [=] {
+        ServedDevice &served = Served(request);
+        if ((which & FUSE_SET_ATTR_SIZE) == 0)
+            return EPERM;
+        if (inode != kDeviceInode ||
+            static_cast<uint64_t>(wanted->st_size) != served.device.images.deviceBytes)
+            return EINVAL;
+        const struct stat status = StatusOf(served, inode, info);
+        fuse_reply_attr(request, &status, kAttributeTimeout);
+        return 0;
+    });
+}
+
+void ReadFolder(fuse_req_t request, fuse_ino_t, size_t size, off_t offset,
+                struct fuse_file_info *) {
+    Guarded(request, [=] {
+        const ServedDevice &served = Served(request);
+        struct Entry {
+            const char *name;
+            fuse_ino_t inode;
+            mode_t type;
+        };
+        const std::array<Entry, 4> entries = {{{".", kRootInode, S_IFDIR},
+                                               {"..", kRootInode, S_IFDIR},
+                                               {served.deviceName.c_str(), kDeviceInode, S_IFREG},
+                                               {served.stateName.c_str(), kStateInode, S_IFREG}}};
+        std::vector<char> buffer(size);
+        size_t used = 0;
+        for (auto index = static_cast<size_t>(offset); index < entries.size(); ++index) {
+            struct stat status = {};
+            status.st_ino = entries[index].inode;
+            status.st_mode = entries[index].type;
+            // An entry's offset is that of the one behind it.
+            const size_t needed =
+                fuse_add_direntry(request, buffer.data() + used, size - used, entries[index].name,
+                                  &status, static_cast<off_t>(index + 1));
+            if (needed > size - used)
+                break;
+            used += needed;
+        }
+        fuse_reply_buf(request, buffer.data(), used);
+        return 0;
+    });
+}
+
+void Open(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
+    Guarded(request, [=] {
+        std::unique_ptr<StateText> state;
+        if (inode == kStateInode) {
+            if ((info->flags & O_ACCMODE) != O_RDONLY)
+                return EACCES;
+            state = std::make_unique<StateText>(CurrentState(Served(request)));
+        }
         info->direct_io = 1; // every read of the device reaches the cache
         info->noflush = 1;   // nothing happens at close
-        info->fh = reinterpret_cast<uintptr_t>(file.release());
+        info->fh = reinterpret_cast<uintptr_t>(state.get());
+        // A caller that was interrupted does not close what it does not have.
+        if (fuse_reply_open(request, info) == 0)
+            static_cast<void>(state.release());
         return 0;
     });
 }
 
-int Release(const char *, struct fuse_file_info *info) {
-    delete FileOf(info);
-    return 0;
+void Release(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
+    if (inode == kStateInode)
+        delete StateOf(info);
+    fuse_reply_err(request, 0);
 }
 
-int Read(const char *, char *buffer, size_t size, off_t offset, struct fuse_file_info *info) {
-    return Guarded([=] {
-        const OpenFile &file = *FileOf(info);
-        const auto start = static_cast<uint64_t>(offset);
-        if (file.isDevice)
-            return static_cast<int>(CacheDeviceRead(Served().device, start, buffer, size));
-        if (start >= file.stateText.size())
-            return 0;
-        return static_cast<int>(file.stateText.copy(buffer, size, static_cast<size_t>(start)));
-    });
+void ReadState(fuse_req_t request, size_t size, off_t offset, const StateText &text) {
+    const size_t start =
+        static_cast<size_t>(std::min<uint64_t>(static_cast<uint64_t>(offset), text.size()));
+    fuse_reply_buf(request, text.data() + start, std::min(size, text.size() - start));
 }
 
-int Write(const char *, const char *buffer, size_t size, off_t offset,
+void Read(fuse_req_t request, fuse_ino_t inode, size_t size, off_t offset,
           struct fuse_file_info *info) {
-    return Guarded([=] {
-        if (!FileOf(info)->isDevice)
-            return -EBADF;
-        return static_cast<int>(
-            CacheDeviceWrite(Served().device, static_cast<uint64_t>(offset), buffer, size));
+    Guarded(request, [=] {
+        if (inode == kStateInode) {
+            ReadState(request, size, offset, *StateOf(info));
+            return 0;
+        }
+        const auto reply = [request](const ImagePieces &pieces) {
+            fuse_reply_iov(request, pieces.parts, pieces.count);
+        };
+        const int64_t result =
+            CacheDeviceRead(Served(request).device, static_cast<uint64_t>(offset), size, reply);
+        if (result == 0)
+            fuse_reply_buf(request, nullptr, 0);
+        return result < 0 ? static_cast<int>(-result) : 0;
     });
 }
 
-int Sync(const char *, int, struct fuse_file_info *info) {
-    return FileOf(info)->isDevice ? CacheImagesSyncBacking(Served().device.images) : 0;
+void Write(fuse_req_t request, fuse_ino_t inode, const char *buffer, size_t size, off_t offset,
+           struct fuse_file_info *) {
+    Guarded(request, [=] {
+        if (inode != kDeviceInode)
+            return EBADF;
+        const int64_t result =
+            CacheDeviceWrite(Served(request).device, static_cast<uint64_t>(offset), buffer, size);
+        if (result < 0)
+            return static_cast<int>(-result);
+        fuse_reply_write(request, static_cast<size_t>(result));
+        return 0;
+    });
 }
 
-// Like a block device the file keeps its size.
-int Truncate(const char *path, off_t size, struct fuse_file_info *info) {
-    const ServedDevice &served = Served();
-    const bool isDevice =
-        info != nullptr ? FileOf(info)->isDevice : path != nullptr && served.devicePath == path;
-    if (!isDevice)
-        return -EACCES;
-    return static_cast<uint64_t>(size) == served.device.images.deviceBytes ? 0 : -EINVAL;
+void Sync(fuse_req_t request, fuse_ino_t inode, int, struct fuse_file_info *) {
+    const int result =
+        inode == kDeviceInode ? CacheImagesSyncBacking(Served(request).device.images) : 0;
+    fuse_reply_err(request, -result);
 }
 
-int Ioctl(const char *, unsigned number, void *argument, struct fuse_file_info *info,
-          unsigned flags, void *data) {
-    return Guarded([=] {
-        const OpenFile *file = (flags & FUSE_IOCTL_DIR) != 0 ? nullptr : FileOf(info);
-        if (file == nullptr || !file->isDevice)
-            return -ENOTTY;
-        const bool is32bit =
-            sizeof(void *) == 4 || (flags & (FUSE_IOCTL_COMPAT | kIoctlFrom32Bit)) != 0;
-        PinRequest request = {};
-        request.number = number;
-        request.argument = reinterpret_cast<uintptr_t>(argument);
-        request.caller = {fuse_get_context()->pid, is32bit};
-        request.data = data;
-        return PinRequestHandle(Served().device, request);
+void Ioctl(fuse_req_t request, fuse_ino_t inode, unsigned number, void *argument,
+           struct fuse_file_info *, unsigned flags, const void *, size_t, size_t answerBytes) {
+    Guarded(request, [=] {
+        if (inode != kDeviceInode)
+            return ENOTTY;
+        std::array<unsigned char, 8> answer = {};
+        PinRequest pin = {};
+        pin.number = number;
+        pin.argument = reinterpret_cast<uintptr_t>(argument);
+        pin.caller = {fuse_req_ctx(request)->pid,
+                      sizeof(void *) == 4 || (flags & (FUSE_IOCTL_COMPAT | kIoctlFrom32Bit)) != 0};
+        pin.data = answer.data();
+        const int result = PinRequestHandle(Served(request).device, pin);
+        if (result != 0)
+            return -result;
+        fuse_reply_ioctl(request, 0, answer.data(), std::min(answerBytes, answer.size()));
+        return 0;
     });
 }
 
 } // namespace
 
-struct fuse_operations CachedevFuseOperations() {
-    struct fuse_operations operations = {};
+struct fuse_lowlevel_ops CachedevFuseOperations() {
+    struct fuse_lowlevel_ops operations = {};
     operations.init = Init;
+    operations.lookup = LookUp;
     operations.getattr = GetAttributes;
+    operations.setattr = SetAttributes;
     operations.readdir = ReadFolder;
     operations.open = Open;
     operations.release = Release;
     operations.read = Read;
     operations.write = Write;
     operations.fsync = Sync;
-    operations.truncate = Truncate;
     operations.ioctl = Ioctl;
     return operations;
 }

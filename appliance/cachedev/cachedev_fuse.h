@@ -1,8 +1,11 @@
-// The files that the cache device shows through FUSE, as callbacks of libfuse.
+// The files that the cache device shows through FUSE, as callbacks of libfuse's low-level
+// interface.
 //
-// The tree is one folder with two files: the device and, read-only, its state. The callbacks run in
-// libfuse's threads, several at once; all they share is the cache device, which is thread-safe, and
-// fields that are fixed before the first of them runs. No exception leaves them.
+// The tree is one folder with two files: the device and, read-only, its state. The low-level
+// interface is used because it lets a read answer while the cache slots that hold its data are
+// still reserved for it: no copy in between, and nobody overwrites them meanwhile. The callbacks
+// run in libfuse's threads, several at once; all they share is the cache device, which is
+// thread-safe, and fields that are fixed before the first of them runs. No exception leaves them.
 #pragma once
 
 #include "cachedev/cache_device.h"
@@ -13,15 +16,15 @@
 
 // FUSE 3.12 introduced the form of the loop configuration that is used here.
 #define FUSE_USE_VERSION 312
-#include <fuse.h>
+#include <fuse_lowlevel.h>
 
 struct ServedDevice {
     CacheDevice &device;
-    std::string devicePath;        // of the device file, from the mount point: "/cachedev_0"
-    std::string statePath;         // of the state file
+    std::string deviceName;        // file name of the device
+    std::string stateName;         // file name of the state
     time_t startTime;              // what both files show as their times
     std::function<void()> onReady; // called once, when the kernel has begun to send requests
 };
 
-// The callbacks; to be registered with a ServedDevice as private data, which must outlive them.
-struct fuse_operations CachedevFuseOperations();
+// The callbacks; to be registered with a ServedDevice as user data, which must outlive the session.
+struct fuse_lowlevel_ops CachedevFuseOperations();

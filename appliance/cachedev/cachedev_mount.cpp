@@ -11,11 +11,11 @@
 
 namespace {
 
-struct FuseDestroyer {
-    void operator()(struct fuse *fuse) const { fuse_destroy(fuse); }
+struct SessionDestroyer {
+    void operator()(struct fuse_session *session) const { fuse_session_destroy(session); }
 };
-struct FuseUnmounter {
-    void operator()(struct fuse *fuse) const { fuse_unmount(fuse); }
+struct SessionUnmounter {
+    void operator()(struct fuse_session *session) const { fuse_session_unmount(session); }
 };
 struct SignalRemover {
     void operator()(struct fuse_session *session) const { fuse_remove_signal_handlers(session); }
@@ -27,9 +27,9 @@ struct ArgumentFreer {
     void operator()(struct fuse_args *arguments) const { fuse_opt_free_args(arguments); }
 };
 
-using FusePtr = std::unique_ptr<struct fuse, FuseDestroyer>;
+using SessionPtr = std::unique_ptr<struct fuse_session, SessionDestroyer>;
 
-FusePtr MakeFuse(ServedDevice &served) {
+SessionPtr MakeSession(ServedDevice &served) {
     struct fuse_args arguments = FUSE_ARGS_INIT(0, nullptr);
     const std::unique_ptr<struct fuse_args, ArgumentFreer> freeArguments(&arguments);
     for (const char *argument :
@@ -37,8 +37,8 @@ FusePtr MakeFuse(ServedDevice &served) {
         if (fuse_opt_add_arg(&arguments, argument) != 0)
             return nullptr;
     }
-    const struct fuse_operations operations = CachedevFuseOperations();
-    return FusePtr(fuse_new(&arguments, &operations, sizeof operations, &served));
+    const struct fuse_lowlevel_ops operations = CachedevFuseOperations();
+    return SessionPtr(fuse_session_new(&arguments, &operations, sizeof operations, &served));
 }
 
 bool IsMountPoint(const std::string &folder) {
@@ -77,30 +77,31 @@ int CachedevPrepareFolder(const std::string &folder, std::string &error) {
 }
 
 int CachedevServe(ServedDevice &served, const std::string &folder) {
-    const FusePtr fuse = MakeFuse(served);
-    if (!fuse) {
+    const SessionPtr session = MakeSession(served);
+    if (!session) {
         fprintf(stderr, "veskcachedev: libfuse cannot be started\n");
         return -1;
     }
-    // libfuse names the cause itself: no /dev/fuse, no right to mount.
-    if (fuse_mount(fuse.get(), folder.c_str()) != 0) {
-        fprintf(stderr, "veskcachedev: cannot mount a FUSE filesystem on %s\n", folder.c_str());
-        return -1;
-    }
-    const std::unique_ptr<struct fuse, FuseUnmounter> unmount(fuse.get());
-    struct fuse_session *const session = fuse_get_session(fuse.get());
-    if (fuse_set_signal_handlers(session) != 0) {
+    if (fuse_set_signal_handlers(session.get()) != 0) {
         fprintf(stderr, "veskcachedev: cannot set the signal handlers\n");
         return -1;
     }
-    const std::unique_ptr<struct fuse_session, SignalRemover> removeHandlers(session);
+    const std::unique_ptr<struct fuse_session, SignalRemover> removeHandlers(session.get());
+    // libfuse names the cause itself: no /dev/fuse, no right to mount.
+    if (fuse_session_mount(session.get(), folder.c_str()) != 0) {
+        fprintf(stderr, "veskcachedev: cannot mount a FUSE filesystem on %s\n", folder.c_str());
+        return -1;
+    }
+    const std::unique_ptr<struct fuse_session, SessionUnmounter> unmount(session.get());
     const std::unique_ptr<struct fuse_loop_config, LoopConfigDestroyer> config(
         fuse_loop_cfg_create());
-    if (!config)
+    if (!config) {
+        fprintf(stderr, "veskcachedev: out of memory\n");
         return -1;
+    }
     // One descriptor per thread keeps the threads out of each other's queues.
     fuse_loop_cfg_set_clone_fd(config.get(), 1);
-    const int result = fuse_loop_mt(fuse.get(), config.get());
+    const int result = fuse_session_loop_mt(session.get(), config.get());
     if (result < 0) { // above 0: the signal that ended it
         fprintf(stderr, "veskcachedev: serving ended with an error: %s\n", strerror(-result));
         return -1;

@@ -154,8 +154,8 @@ TEST_F(LogToStdout, TraceIsWrittenInTheNoticeFormAtLevel2) {
     const int line = __LINE__ + 1;
     LogTraceEntry();
     LogTraceExit();
-    EXPECT_EQ(log.Text(), "tool: TestBody() [" + Line(line) + "] : +++++\n" +
-                              "tool: TestBody() [" + Line(line + 1) + "] : -----\n");
+    EXPECT_EQ(log.Text(), "tool: TestBody() [" + Line(line) + "] : +++++\n" + "tool: TestBody() [" +
+                              Line(line + 1) + "] : -----\n");
 }
 
 TEST_F(LogToStdout, TraceOfAScopeEnclosesItsMessages) {

@@ -1,89 +1,95 @@
-#include "cli/fake_commands.h"
-#include "cli/log.h"
-#include "cli/syslog_capture.h"
-#include "support/leak_checked_test.h"
+// What main does around every command: the program's name, the log level and the exit status.
+#include "cli/main_fixture.h"
 
-#include <functional>
-#include <gtest/gtest.h>
-#include <regex>
-#include <string>
-#include <sys/mman.h>
-#include <sys/wait.h>
-#include <unistd.h>
-#include <vector>
-
-extern "C" int ToolMain(int argc, char *argv[]); // the tool's main
+#include "cli/usage.h"
+#include "support/captured_log.h"
 
 namespace {
 
-struct Run {
-    int status = -1;       // exit status
-    std::string output;    // standard output, whole; line numbers as "[N]"
-    std::string systemLog; // one line for each record; line numbers as ":N " and "[N]"
-};
-
-std::string Content(int file) {
-    std::string text(static_cast<size_t>(lseek(file, 0, SEEK_END)), '\0');
-    const ssize_t got = pread(file, &text[0], text.size(), 0);
-    text.resize(got < 0 ? 0 : static_cast<size_t>(got));
-    text = std::regex_replace(text, std::regex("\\(\\) \\[[0-9]+\\]"), "() [N]");
-    return std::regex_replace(text, std::regex("\\.cpp:[0-9]+ "), ".cpp:N ");
+std::string UsageText() {
+    CapturedLog output;
+    Usage();
+    return output.Text();
 }
-
-// The run ends with the process, as in earnest: main keeps state for the whole of its process.
-[[noreturn]] void RunInChild(const std::vector<std::string> &arguments, int output, int systemLog) {
-    dup2(output, STDOUT_FILENO);
-    LogToSyslog = 1;
-    LogLevel = 1;
-    ProgramName = nullptr;
-    SyslogRecords().clear();
-    std::vector<std::string> words = arguments;
-    words.insert(words.begin(), "/usr/bin/tool");
-    std::vector<char *> argv;
-    for (std::string &word : words) {
-        argv.push_back(&word[0]);
-    }
-    argv.push_back(nullptr);
-    const int status = ToolMain(static_cast<int>(words.size()), argv.data());
-    for (const SyslogRecord &record : SyslogRecords()) {
-        dprintf(systemLog, "%s\n", record.text.c_str());
-    }
-    exit(status);
-}
-
-class MainTest : public LeakCheckedTest {
-protected:
-    void SetUp() override {
-        LeakCheckedTest::SetUp();
-        FakeCommands::result = 0;
-        FakeCommands::bitmapSize = 0;
-    }
-
-    static Run Tool(const std::vector<std::string> &arguments) {
-        const int output = memfd_create("output", 0);
-        const int systemLog = memfd_create("system-log", 0);
-        fflush(stdout);
-        const pid_t child = fork();
-        if (child == 0) {
-            RunInChild(arguments, output, systemLog);
-        }
-        Run run;
-        int status = 0;
-        waitpid(child, &status, 0);
-        run.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-        run.output = Content(output);
-        run.systemLog = Content(systemLog);
-        close(output);
-        close(systemLog);
-        return run;
-    }
-
-    // Runs the command with --stdout and with operations that give this result.
-    static Run ToolWith(int result, std::vector<std::string> arguments) {
-        FakeCommands::result = result;
-        arguments.insert(arguments.begin(), "--stdout");
-        return Tool(arguments);
-    }
-};
 
 } // namespace
+
+TEST_F(MainTest, WithoutOptionsSaysInvalidInputInTheSystemLogPrintsTheUsageAndSucceeds) {
+    const Outcome run = Tool({});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(run.output, UsageText());
+    EXPECT_EQ(run.systemLog, "veskcachepinfiletool.cpp:N Invalid input\n");
+}
+
+TEST_F(MainTest, WithStdoutSaysInvalidInputBehindTheProgramName) {
+    const Outcome run = Tool({"--stdout"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(run.output, "tool: Invalid input\n" + UsageText());
+    EXPECT_EQ(run.systemLog, "");
+}
+
+TEST_F(MainTest, VerboseErrorInTheSystemLogNamesMainAndHasTheMarker) {
+    const Outcome run = Tool({"--verbose"});
+    EXPECT_EQ(run.systemLog, "veskcachepinfiletool.cpp:N Verbose mode is enable\n"
+                             "veskcachepinfiletool.cpp:N main() [N] : +++++\n"
+                             "veskcachepinfiletool.cpp:N main() [N] : ***** Invalid input\n"
+                             "veskcachepinfiletool.cpp:N main() [N] : -----\n");
+    EXPECT_EQ(run.output, UsageText());
+}
+
+TEST_F(MainTest, VerboseErrorOnStandardOutputNamesMainAndHasTheMarker) {
+    const Outcome run = Tool({"--verbose", "--stdout"});
+    EXPECT_EQ(run.output, "tool: main() [N] : +++++\n"
+                          "tool: main() [N] : ***** Invalid input\n" +
+                              UsageText() + "tool: main() [N] : -----\n");
+}
+
+TEST_F(MainTest, DebugWinsOverVerbose) {
+    EXPECT_EQ(Tool({"--debug"}).logLevel, "3");
+    EXPECT_EQ(Tool({"--debug", "--verbose"}).logLevel, "3");
+    EXPECT_EQ(Tool({"--verbose", "--debug"}).logLevel, "3");
+    EXPECT_EQ(Tool({"--verbose"}).logLevel, "2");
+    EXPECT_EQ(Tool({}).logLevel, "1");
+}
+
+TEST_F(MainTest, VerboseNamesTheRunWithLongFormsAndATrace) {
+    const Outcome run = ToolWith(0, {"--verbose", "--send-bitmap", "--mount-path", "/volume1"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(run.output, "tool: Verbose mode is enable\n"
+                          "tool: main() [N] : +++++\n"
+                          "tool: main() [N] : Start to send bitmap for volume (/volume1)\n"
+                          "[SendBitmap /volume1]\n"
+                          "tool: main() [N] : Send bitmap OK\n"
+                          "tool: main() [N] : -----\n");
+}
+
+TEST_F(MainTest, MessagesWhileOptionsAreParsedAreShort) {
+    const Outcome run =
+        Tool({"--stdout", "--verbose", "--debug", "--check-pin", "/no/such", "--config-path", "c"});
+    EXPECT_EQ(run.status, 255);
+    EXPECT_EQ(run.output, "tool: Verbose mode is enable\ntool: Debug mode is enable\n"
+                          "tool: File (/no/such) doesn't exist\n" +
+                              UsageText());
+}
+
+TEST_F(MainTest, FailedParsePrintsTheUsageAndEndsWith255WithoutATrace) {
+    const Outcome run = Tool({"--verbose", "--send-bitmap"});
+    EXPECT_EQ(run.status, 255);
+    EXPECT_EQ(run.output, UsageText());
+    EXPECT_EQ(run.systemLog, "veskcachepinfiletool.cpp:N Verbose mode is enable\n"
+                             "veskcachepinfiletool.cpp:N Mount path must be set\n"
+                             "veskcachepinfiletool.cpp:N Check parameter failed\n");
+}
+
+TEST_F(MainTest, HelpPrintsTheUsageAndSucceeds) {
+    const Outcome run = Tool({"--help", "--send-bitmap"});
+    EXPECT_EQ(run.status, 0);
+    EXPECT_EQ(run.output, UsageText());
+}
+
+TEST_F(MainTest, ResultsGoToStandardOutputAlsoWhenMessagesGoToTheSystemLog) {
+    FakeCommands::result = 1;
+    const Outcome run = Tool({"--check-bitmap", "--mount-path", "/volume1"});
+    EXPECT_EQ(run.output, "[CheckBitmapSet /volume1]\nYes\n");
+    EXPECT_EQ(run.systemLog, "");
+}

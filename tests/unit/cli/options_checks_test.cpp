@@ -63,12 +63,11 @@ TEST_F(CheckParameterTest, LogsInItsOwnName) {
 }
 
 TEST(ToolCommandToString, NamesTheCommandsInOrder) {
-    const char *const names[] = {"invalid",      "pinFiles",        "unpinFiles",
-                                 "sendBitmap",   "startService",    "handleMount",
-                                 "handleUmount", "supportPin",      "checkBitmap",
-                                 "addPendingSpace", "removePendingSpace", "getUUID",
-                                 "deleteBitmap", "checkPin",        "reloadPinBlocks",
-                                 "unpinAllBlocks"};
+    const char *const names[] = {
+        "invalid",      "pinFiles",        "unpinFiles",         "sendBitmap",
+        "startService", "handleMount",     "handleUmount",       "supportPin",
+        "checkBitmap",  "addPendingSpace", "removePendingSpace", "getUUID",
+        "deleteBitmap", "checkPin",        "reloadPinBlocks",    "unpinAllBlocks"};
     for (int command = 0; command < 16; ++command) {
         EXPECT_STREQ(ToolCommandToString(command), names[command]);
     }

@@ -19,8 +19,7 @@ struct CommandCase {
     ToolCommand command;
 };
 
-class CommandOptionTest : public OptionsTest,
-                          public ::testing::WithParamInterface<CommandCase> {};
+class CommandOptionTest : public OptionsTest, public ::testing::WithParamInterface<CommandCase> {};
 
 const CommandCase commandCases[] = {
     {"pinFiles", Arguments{"--pin-files", "/"} + mount, commandPinFiles},
@@ -104,12 +103,10 @@ const MissingCase missingCases[] = {
     {"unpinRangeWithoutStart", Arguments{"--unpin-range"} + mount + count, noStart},
     {"unpinRangeWithoutCount", Arguments{"--unpin-range"} + mount + start, noCount},
     {"getBitmapSize", {"--get-bitmap-size-byte"}, noMount},
-    {"pinFilesThatAreMissing",
-     Arguments{"--pin-files", "/no/such"} + mount,
+    {"pinFilesThatAreMissing", Arguments{"--pin-files", "/no/such"} + mount,
      "tool: File (path /no/such) doesn't exist\n"
      "tool: Check file paths error\ntool: Check parameter failed\n"},
-    {"unpinFilesThatAreNone",
-     Arguments{"--unpin-files", ";"} + mount,
+    {"unpinFilesThatAreNone", Arguments{"--unpin-files", ";"} + mount,
      "tool: No availiable files in the file paths (;)\n"
      "tool: Check file paths error\ntool: Check parameter failed\n"},
     {"isAllUnpinOfNoSuchDevice",
@@ -118,11 +115,9 @@ const MissingCase missingCases[] = {
     {"unpinAllWithoutAnyPath",
      {"--unpin-all"},
      "tool: You must use --mount-path or --cache-path option!\n"},
-    {"unpinAllWithBothPaths",
-     Arguments{"--unpin-all", "--cache-path", "/"} + mount,
+    {"unpinAllWithBothPaths", Arguments{"--unpin-all", "--cache-path", "/"} + mount,
      "tool: Only one of --mount-path or --cache-path can be set!\n"},
-    {"checkPinOfNoSuchFile",
-     Arguments{"--check-pin", "/no/such"} + config,
+    {"checkPinOfNoSuchFile", Arguments{"--check-pin", "/no/such"} + config,
      "tool: File (/no/such) doesn't exist\n"},
     {"spaceUuidWithoutCache",
      {"--space-uuid", "uuid-9"},

@@ -221,8 +221,8 @@ TEST_F(OptionsTest, FailedCheckEndsTheParseAtOnce) {
 TEST_F(OptionsTest, LongFormNamesTheOperationAndItsFunction) {
     CapturedLog log(2);
     EXPECT_EQ(Parse({"--pin-files", "/"}), -1);
-    EXPECT_EQ(log.Messages(), (std::vector<std::string>{
-                                  "GetOptions() [N]: operation = pinFiles",
-                                  "CheckParameter() [N] : ***** Mount path must be set",
-                                  "GetOptions() [N] : ***** Check parameter failed"}));
+    EXPECT_EQ(log.Messages(),
+              (std::vector<std::string>{"GetOptions() [N]: operation = pinFiles",
+                                        "CheckParameter() [N] : ***** Mount path must be set",
+                                        "GetOptions() [N] : ***** Check parameter failed"}));
 }

@@ -1,0 +1,127 @@
+# What the system tests share. Loaded by every .bats file, which runs inside a private world; needs
+# BIN, the built programs' folder, and HELPERS, the folder of the tests' own programs.
+# shellcheck shell=bash
+
+# shellcheck source=../../scripts/lib/volume.bash
+. "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+# shellcheck source=lib/service.bash
+. "$BATS_TEST_DIRNAME/lib/service.bash"
+# shellcheck source=lib/blocks.bash
+. "$BATS_TEST_DIRNAME/lib/blocks.bash"
+# shellcheck source=lib/messages.bash
+. "$BATS_TEST_DIRNAME/lib/messages.bash"
+
+CONF=/run/pin/config.json
+KEY_FILE=/var/run/veskcachepinfile-msg-server.key
+
+tool() { "$BIN/veskcachepinfiletool" "$@"; }
+
+usage() { cat "$BATS_TEST_DIRNAME/usage.txt"; }
+
+# answers STATUS ARGUMENT...: runs the tool, which must end with STATUS, write to standard output
+# exactly what comes on standard input, and nothing to standard error. ":" at the start of a line
+# stands for the program's name.
+answers() {
+    expect_output "$1" /dev/null tool "${@:2}"
+}
+
+# The same with --stdout before the arguments: the messages are part of the output.
+says() {
+    expect_output "$1" /dev/null tool --stdout "${@:2}"
+}
+
+# The same with --stdout and --verbose or --debug; the numbers of source lines and addresses, which
+# any change of the sources moves, are written as N and ADDRESS.
+says_verbosely() {
+    expect_output "$1" mask_numbers tool --stdout "${@:2}"
+}
+
+mask_numbers() {
+    sed -E -e 's/^([a-z]+: [A-Za-z]+\(\) )\[[0-9]+\]/\1[N]/' -e 's/0x[0-9a-f]{8,}/ADDRESS/g'
+}
+
+# expect_output STATUS FILTER COMMAND...: see above; FILTER /dev/null leaves the output as it is.
+expect_output() {
+    local expected=$1 filter=$2 status=0 folder=$BATS_TEST_TMPDIR
+    shift 2
+    sed 's/^:/veskcachepinfiletool:/' >"$folder/expected"
+    "$@" >"$folder/output" 2>"$folder/errors" || status=$?
+    if [ "$filter" != /dev/null ]; then
+        "$filter" <"$folder/output" >"$folder/filtered"
+        mv "$folder/filtered" "$folder/output"
+    fi
+    if ! diff -u "$folder/expected" "$folder/output" || [ -s "$folder/errors" ] ||
+        [ "$status" -ne "$expected" ]; then
+        echo "status $status, expected $expected, of: $*"
+        echo "standard error:"
+        cat "$folder/errors"
+        return 1
+    fi
+}
+
+# same EXPECTED ACTUAL: two texts.
+same() {
+    [ "$1" = "$2" ] || {
+        diff -u <(printf '%s\n' "$1") <(printf '%s\n' "$2")
+        return 1
+    }
+}
+
+# refute COMMAND...: it must fail.
+refute() {
+    if "$@"; then
+        echo "succeeded, but must fail: $*"
+        return 1
+    fi
+}
+
+# wait_until COMMAND...: tries until it succeeds; gives up after WAIT_SECONDS (30).
+wait_until() {
+    local end=$((SECONDS + ${WAIT_SECONDS:-30}))
+    until "$@"; do
+        if [ "$SECONDS" -ge "$end" ]; then
+            echo "waited too long for: $*"
+            return 1
+        fi
+        sleep 0.02
+    done
+}
+
+# Milliseconds since some fixed moment.
+now_ms() { echo $(($(date +%s%N) / 1000000)); }
+
+# put_config JSON: makes it the configuration file's content.
+put_config() {
+    mkdir -p "${CONF%/*}"
+    printf '%s\n' "$1" >"$CONF"
+}
+
+# config JQ_FILTER: a value of the configuration file in compact form.
+config() { jq -c "$1" "$CONF"; }
+
+inode() { stat -c %i "$1"; }
+
+# map_cache UUID DEVICE: from now on this cache device is the one of the space.
+map_cache() {
+    printf '{"caches":[{"spaceUuid":"%s","ssdPath":"/tmp/some-ssd","cachePath":"%s"}]}\n' \
+        "$1" "$2" >"$VESK_FLASHCACHE_CONFIG"
+}
+
+# spare_device NAME SIZE [veskcachedev option...]: a cache device that no volume lies on, with 16 MiB
+# of cache; prints its path. With map_cache it takes the place of a volume's own.
+spare_device() {
+    local name=$1 size=$2
+    shift 2
+    mkdir -p "/tmp/$name"
+    truncate -s "$size" "/tmp/$name/backing"
+    truncate -s 16M "/tmp/$name/ssd"
+    "$BIN/veskcachedev" --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \
+        --ssd "/tmp/$name/ssd" "$@" 3>&-
+    echo "/run/$name/cachedev"
+}
+
+# make_volume: volume_make without the descriptor on which bats waits for every process to end.
+make_volume() { volume_make "$@" 3>&-; }
+
+# Every file's end of a test: no service is left over, and a failed test shows what it wrote.
+teardown() { end_service; }

@@ -1,0 +1,98 @@
+// Running the tool's main in a test: a process of its own for every run, with the operations behind
+// the commands replaced (fake_commands.h).
+#ifndef TESTS_CLI_MAIN_FIXTURE_H
+#define TESTS_CLI_MAIN_FIXTURE_H
+
+#include "cli/fake_commands.h"
+#include "cli/log.h"
+#include "cli/syslog_capture.h"
+#include "support/leak_checked_test.h"
+
+#include <cstdlib>
+#include <gtest/gtest.h>
+#include <regex>
+#include <string>
+#include <sys/mman.h>
+#include <sys/wait.h>
+#include <unistd.h>
+#include <vector>
+
+extern "C" int ToolMain(int argc, char *argv[]); // the tool's main
+
+struct Outcome {
+    int status = -1;       // exit status
+    std::string output;    // standard output, whole; line numbers as "[N]"
+    std::string systemLog; // one line for each record; line numbers as ":N " and "[N]"
+    std::string logLevel;  // as main leaves it
+};
+
+inline std::string Content(int file) {
+    std::string text(static_cast<size_t>(lseek(file, 0, SEEK_END)), '\0');
+    const ssize_t got = pread(file, &text[0], text.size(), 0);
+    text.resize(got < 0 ? 0 : static_cast<size_t>(got));
+    text = std::regex_replace(text, std::regex("\\(\\) \\[[0-9]+\\]"), "() [N]");
+    return std::regex_replace(text, std::regex("\\.cpp:[0-9]+ "), ".cpp:N ");
+}
+
+// The run ends with the process, as in earnest: main keeps state for the whole of its process.
+[[noreturn]] inline void RunInChild(const std::vector<std::string> &arguments, int output,
+                                    int systemLog, int logLevel) {
+    dup2(output, STDOUT_FILENO);
+    LogToSyslog = 1;
+    LogLevel = 1;
+    ProgramName = nullptr;
+    SyslogRecords().clear();
+    std::vector<std::string> words = arguments;
+    words.insert(words.begin(), "/usr/bin/tool");
+    std::vector<char *> argv;
+    for (std::string &word : words) {
+        argv.push_back(&word[0]);
+    }
+    argv.push_back(nullptr);
+    const int status = ToolMain(static_cast<int>(words.size()), argv.data());
+    for (const SyslogRecord &record : SyslogRecords()) {
+        dprintf(systemLog, "%s\n", record.text.c_str());
+    }
+    dprintf(logLevel, "%d", LogLevel);
+    exit(status);
+}
+
+class MainTest : public LeakCheckedTest {
+protected:
+    void SetUp() override {
+        LeakCheckedTest::SetUp();
+        FakeCommands::result = 0;
+        FakeCommands::bitmapSize = 0;
+    }
+
+    static Outcome Tool(const std::vector<std::string> &arguments) {
+        const int output = memfd_create("output", 0);
+        const int systemLog = memfd_create("system-log", 0);
+        const int logLevel = memfd_create("log-level", 0);
+        fflush(stdout);
+        const pid_t child = fork();
+        if (child == 0) {
+            RunInChild(arguments, output, systemLog, logLevel);
+        }
+        Outcome run;
+        int status = 0;
+        waitpid(child, &status, 0);
+        run.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        run.output = Content(output);
+        run.systemLog = Content(systemLog);
+        run.logLevel = Content(logLevel);
+        close(output);
+        close(systemLog);
+        close(logLevel);
+        return run;
+    }
+
+    // Runs the command with --stdout and with operations that give this result.
+    static Outcome ToolWith(int result, std::vector<std::string> arguments) {
+        FakeCommands::result = result;
+        arguments.insert(arguments.begin(), "--stdout");
+        return Tool(arguments);
+    }
+};
+
+#endif
