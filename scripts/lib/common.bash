@@ -32,7 +32,7 @@ install_packages() {
         apt-get -q update || true
         # shellcheck disable=SC2086
         apt-get -q install -y --no-install-recommends -o DPkg::Lock::Timeout=300 $missing
-    ) 9>/var/lock/veskcachepin-apt.lock >"$log" 2>&1 || {
+    ) 9</var/lib/apt/lists >"$log" 2>&1 || {
         tail -n 20 "$log" >&2
         rm -f "$log"
         die "the packages cannot be installed:$missing"

@@ -44,7 +44,7 @@ TEST_F(OptionsDeathTest, HelpPrintsTheUsageAndEndsWithStatus0) {
         CapturedLog log;
         EXPECT_EXIT(Parse({option}), success, "");
         const std::vector<std::string> lines = log.Lines();
-        ASSERT_EQ(lines.size(), 36U);
+        ASSERT_EQ(lines.size(), 37U);
         EXPECT_EQ(lines.front(), "Usage:");
         EXPECT_EQ(lines.back(), "\t\ttool --set-bitmap --mount-path mount_path --start-sector "
                                 "start_sector --num-sectors num_sectors");
@@ -56,7 +56,7 @@ TEST_F(OptionsDeathTest, OptionsBehindHelpAreNotLookedAt) {
     EXPECT_EXIT(Parse({"--verbose", "--help", "-d", "--check-pin", "/no/such"}), success, "");
     EXPECT_EQ(log.Lines().at(0), "tool: Verbose mode is enable");
     EXPECT_EQ(log.Lines().at(1), "Usage:");
-    EXPECT_EQ(log.Lines().size(), 37U);
+    EXPECT_EQ(log.Lines().size(), 38U);
 }
 
 TEST_F(OptionsDeathTest, HelpBehindAFailedCheckIsNotReached) {
