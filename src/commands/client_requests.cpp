@@ -33,7 +33,7 @@ bool IsFilesRequest(int requestType) {
 int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) {
     LogTraceScope();
     if (!IsFilesRequest(requestType) && requestType != requestReloadPinBlocks) {
-        LogError("Unhandle request type = %s", RequestTypeToString(requestType));
+        LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
         return -1;
     }
     if (!SpaceHasCacheAndSupportPin(parameters->mountPath)) {
@@ -64,7 +64,7 @@ int SetSpaceStateRequest(const char *mountPath, int requestType) {
         return -1;
     }
     if (requestType != requestAddPendingSpace && requestType != requestRemovePendigSpace) {
-        LogError("Unhandle request type = %s", RequestTypeToString(requestType));
+        LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
         return -1;
     }
     // The identifier is not taken from the call, which only makes sure that there is a queue: these

@@ -9,10 +9,13 @@
 
 namespace {
 
-// jsoncpp throws on a document nested deeper than it is willing to follow.
+// jsoncpp throws on a document nested deeper than it is willing to follow. What only a lenient
+// reader takes for JSON counts as damaged: other readers of the file would refuse it.
 bool ParseStream(std::istream &stream, Json::Value *root) {
     Json::CharReaderBuilder builder;
     builder["collectComments"] = true;
+    builder["allowTrailingCommas"] = false;
+    builder["skipBom"] = false;
     try {
         std::string errors;
         return Json::parseFromStream(builder, stream, root, &errors);

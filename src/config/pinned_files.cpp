@@ -54,7 +54,7 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
             files.removeMember(key);
             LogVerbose("Remove file (%s) from pin file list", info.szRelativePath);
             break;
-        default: LogError("Get unsupport type = %s", RequestTypeToString(record->type)); return -1;
+        default: LogError("Get unsupport type = %s", RequestTypeForLog(record->type)); return -1;
         }
     }
     if (files.empty()) {

@@ -6,9 +6,7 @@
 
 void RequestToString(std::string *out, const RequestRecord *record) {
     char text[1024];
-    const char *typeName = RequestTypeToString(record->type);
     const int length = snprintf(text, sizeof(text), "Request type=%s mountPath=%s data=%s",
-                                typeName == nullptr ? "(null)" : typeName, record->mountPath,
-                                record->data);
+                                RequestTypeForLog(record->type), record->mountPath, record->data);
     out->assign(length < 0 ? "" : text);
 }

@@ -21,6 +21,11 @@ const char *RequestTypeToString(int type) {
     return requestTypeNames[type];
 }
 
+const char *RequestTypeForLog(int type) {
+    const char *name = RequestTypeToString(type);
+    return name == nullptr ? "(null)" : name;
+}
+
 int StringToRequestType(const std::string &name) {
     for (int type = 0; type < requestTypeCount; ++type) {
         if (name == requestTypeNames[type]) {

@@ -19,6 +19,9 @@ enum RequestType : int32_t {
 // The type's name; null after an error message for a value outside 0 to 6.
 const char *RequestTypeToString(int type);
 
+// The same for log lines: "(null)" where there is no name, so that no null is ever printed.
+const char *RequestTypeForLog(int type);
+
 // The first type of this name, compared exactly; requestUnknown when there is none.
 int StringToRequestType(const std::string &name);
 

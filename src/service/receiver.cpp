@@ -6,6 +6,7 @@
 #include "service/message_check.h"
 #include "service/message_queue.h"
 #include "service/service_state.h"
+#include "service/signal_handler.h"
 
 #include <cerrno>
 #include <cstring>
@@ -47,7 +48,7 @@ void GetRequests(const char *configPath) {
                 break;
             }
             CompleteRecord(&record, static_cast<size_t>(received));
-            LogVerbose("Get a new message. Request type = %s", RequestTypeToString(record.type));
+            LogVerbose("Get a new message. Request type = %s", RequestTypeForLog(record.type));
 
             if (record.type == requestAddPendingSpace) {
                 if (ServiceIsPendingSpace(record.mountPath)) {
@@ -80,5 +81,6 @@ void GetRequests(const char *configPath) {
             ServiceSignalRequest();
         }
     }
+    ServiceThreadEnds();
     pthread_exit(nullptr);
 }

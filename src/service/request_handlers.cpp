@@ -38,7 +38,7 @@ int HandleRequest(const RequestRecord *record) {
     std::vector<FileInfo> files;
 
     if (!IsHandledType(record->type)) {
-        LogError("Get unhandle request (%s)", RequestTypeToString(record->type));
+        LogError("Get unhandle request (%s)", RequestTypeForLog(record->type));
     } else if (uuid.reset(SpaceGetUUID(record->mountPath)); !uuid) {
         LogError("Can't get space uuid");
     } else if (cachePath.reset(SpaceGetCachePath(uuid.get())); !cachePath) {

@@ -7,6 +7,7 @@
 #include "config/request_queue.h"
 #include "config/request_type.h"
 #include "service/request_handlers.h"
+#include "service/signal_handler.h"
 
 #include <pthread.h>
 #include <unistd.h>
@@ -43,12 +44,13 @@ void *DoRequests(void *options) {
         }
         LogError("Get request error");
     }
+    ServiceThreadEnds();
     pthread_exit(nullptr);
 }
 
 int HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
                                  const std::string &num) {
-    const char *typeName = RequestTypeToString(record->type);
+    const char *typeName = RequestTypeForLog(record->type);
     LogVerbose("Handle request (num = %s)", num.c_str());
     switch (HandleRequest(record)) {
     case handleDone:

@@ -2,6 +2,7 @@
 
 #include "cli/log.h"
 
+#include <atomic>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -13,6 +14,8 @@ namespace {
 
 const int endingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
 const suseconds_t outputGraceMicroseconds = 500000;
+
+std::atomic<int> serviceThreads{0};
 
 sigset_t EndingSignalSet() {
     sigset_t set;
@@ -38,6 +41,11 @@ void LimitEnd() {
     signal(SIGALRM, EndNow);
     pthread_sigmask(SIG_UNBLOCK, &alarmSet, nullptr);
     setitimer(ITIMER_REAL, &limit, nullptr);
+}
+
+[[noreturn]] void EndProcess() {
+    fflush(stdout);
+    quick_exit(0);
 }
 
 void *WaitForSignals(void * /*argument*/) {
@@ -80,6 +88,15 @@ int SetSignalHandler() {
 void SignalHandler(int signalNumber) {
     LimitEnd();
     LogVerbose("Get signal = %d", signalNumber);
-    fflush(stdout);
-    quick_exit(0);
+    EndProcess();
+}
+
+void SetServiceThreads(int count) {
+    serviceThreads = count;
+}
+
+void ServiceThreadEnds() {
+    if (--serviceThreads == 0) {
+        EndProcess();
+    }
 }

@@ -16,4 +16,10 @@ int SetSignalHandler();
 // Ends the process.
 [[noreturn]] void SignalHandler(int signalNumber);
 
+// The thread that waits for the signals must not keep a process alive that has nothing left to do:
+// each of the service's own threads says when it ends, and with the last of them the process ends
+// with status 0, as it would without that thread. To be set before they are started.
+void SetServiceThreads(int count);
+void ServiceThreadEnds();
+
 #endif

@@ -22,6 +22,7 @@ int StartService(const ToolParameters *parameters) {
         LogError("Initialize mutex failed");
         return -1;
     }
+    SetServiceThreads(2);
     pthread_t worker{};
     if (pthread_create(&worker, nullptr, DoRequests, const_cast<ToolParameters *>(parameters)) !=
         0) {

@@ -83,7 +83,7 @@ TEST(SpaceListSelect, BtrfsSubvolumeCountsOnce) {
 TEST(SpaceListSelect, AutomountAddsNone) {
     EXPECT_EQ(SpacesOf("29 27 0:50 / /volume1 rw - autofs /dev/vdb rw,fd=29\n"
                        "30 29 254:1 / /volume1 rw - ext4 /dev/vdb rw\n"
-                       "31 27 0:51 / /idle rw - autofs systemd-1 rw,fd=30\n"),
+                       "31 27 0:51 / /idle rw - autofs /dev/vdc rw,fd=30\n"),
               Texts{"/dev/vdb /volume1"});
 }
 

@@ -1,6 +1,7 @@
 #include "config/config_fixture.h"
 
 #include "service/service_state.h"
+#include "support/private_mounts.h"
 
 #include <chrono>
 #include <cstdio>
@@ -12,6 +13,13 @@
 #include <sys/stat.h>
 #include <thread>
 #include <unistd.h>
+
+namespace {
+
+// A private /tmp in memory, where making a file durable costs nothing.
+const bool privateMounts = UsePrivateMounts();
+
+} // namespace
 
 const char exampleDocument[] = R"({
    "nextRequestNum" : 3,
@@ -74,6 +82,10 @@ void ConfigTest::SetUp() {
 void ConfigTest::TearDown() {
     EXPECT_TRUE(ServiceLockIsFree());
     LeakCheckedTest::TearDown();
+}
+
+void ConfigTest::ExpectStored(const std::string &document) const {
+    EXPECT_EQ(Stored(), ParseDocument(document).toStyledString());
 }
 
 std::string ConfigTest::CreateFile(const std::string &relativePath) const {

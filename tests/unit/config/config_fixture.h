@@ -35,6 +35,8 @@ protected:
     void Store(const std::string &text) const { WriteWhole(path_, text); }
     std::string Stored() const { return ReadWhole(path_); }
     Json::Value StoredDocument() const { return ParseDocument(Stored()); }
+    // Whether the file holds this document in the library's styled form.
+    void ExpectStored(const std::string &document) const;
 
     // Creates a file below the volume's top directory; its inode number in decimal.
     std::string CreateFile(const std::string &relativePath) const;

@@ -63,8 +63,8 @@ TEST_F(FileInodeListTest, AListThatDoesNotFitIsRefused) {
     EXPECT_EQ(list_, entry);
     CapturedLog log;
     EXPECT_EQ(MakeList(volume_ + "/a", entry.size()), -1);
-    EXPECT_EQ(log.Messages(),
-              Messages{"File inode list doesn't fit in " + std::to_string(entry.size()) + " bytes"});
+    EXPECT_EQ(log.Messages(), Messages{"File inode list doesn't fit in " +
+                                       std::to_string(entry.size()) + " bytes"});
     EXPECT_EQ(MakeList(volume_ + "/a;" + volume_ + "/a", 2 * entry.size() + 2), 0);
     EXPECT_EQ(MakeList(volume_ + "/a;" + volume_ + "/a", 2 * entry.size() + 1), -1);
 }

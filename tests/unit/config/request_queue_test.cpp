@@ -14,7 +14,7 @@ TEST_F(RequestQueueTest, TheFirstRequestCreatesTheFileWithNumber0) {
     CapturedLog log;
     EXPECT_EQ(AddReload(), 0);
     EXPECT_EQ(log.Messages(), Messages{});
-    EXPECT_EQ(Stored(), R"({
+    ExpectStored(R"({
    "nextRequestNum" : 1,
    "requestQueue" : [ "0" ],
    "requests" : {
@@ -24,8 +24,7 @@ TEST_F(RequestQueueTest, TheFirstRequestCreatesTheFileWithNumber0) {
          "type" : "reloadPinBlocks"
       }
    }
-}
-)");
+})");
 }
 
 TEST_F(RequestQueueTest, AnEmptyObjectAndNullMembersCountAsAMissingFile) {
@@ -44,8 +43,7 @@ TEST_F(RequestQueueTest, APinRequestStoresItsFileInodeList) {
     Store(exampleDocument);
     const std::string a = CreateFile("share/a");
     const std::string b = CreateFile("b");
-    EXPECT_EQ(
-        Add(MakeRecord(requestPinFiles, volume_, volume_ + "/share/a;" + volume_ + "/b")), 0);
+    EXPECT_EQ(Add(MakeRecord(requestPinFiles, volume_, volume_ + "/share/a;" + volume_ + "/b")), 0);
     Json::Value expected = ParseDocument(exampleDocument);
     expected["nextRequestNum"] = 4;
     expected["requestQueue"].append("3");
@@ -99,7 +97,8 @@ TEST_F(RequestQueueTest, ACounterThatIsANumberInAnotherGuiseIsTakenAsAnInteger) 
 }
 
 TEST_F(RequestQueueTest, ANumberThatIsQueuedAlreadyIsAcceptedAgain) {
-    Store(R"({"nextRequestNum" : 1, "requestQueue" : ["1"], "requests" : {"1" : {"type" : "ack"}}})");
+    Store(
+        R"({"nextRequestNum" : 1, "requestQueue" : ["1"], "requests" : {"1" : {"type" : "ack"}}})");
     CapturedLog log;
     EXPECT_EQ(AddReload(), 0);
     EXPECT_EQ(log.Messages(), Messages{});
@@ -182,152 +181,4 @@ TEST_F(RequestQueueTest, AtLevel2FailuresNameTheirFunctions) {
               Messages{"JsonAddRequest() [N] : ***** Get relative paths failed"});
     EXPECT_EQ(MessagesOf(log, "ConfigAddRequest"),
               Messages{"ConfigAddRequest() [N] : ***** Can't add request to json"});
-}
-
-TEST_F(RequestQueueTest, RemovingTakesQueueEntryAndRequest) {
-    Json::Value root = ParseDocument(exampleDocument);
-    CapturedLog log(2);
-    EXPECT_EQ(JsonRemoveRequest(root, "1"), 0);
-    EXPECT_EQ(log.Messages(), Messages{"JsonRemoveRequest() [N]: Remove request num = 1"});
-    Json::Value expected = ParseDocument(exampleDocument);
-    expected["requestQueue"] = ParseDocument(R"(["2"])");
-    expected["requests"].removeMember("1");
-    EXPECT_EQ(root, expected);
-}
-
-TEST_F(RequestQueueTest, RemovingWithoutAQueueFails) {
-    for (const char *text : {"{}", R"({"requestQueue" : null, "requests" : {"1" : {}}})"}) {
-        Json::Value root = ParseDocument(text);
-        CapturedLog log;
-        EXPECT_EQ(JsonRemoveRequest(root, "1"), -1);
-        EXPECT_EQ(log.Messages(), Messages{"Can't read request queue"});
-    }
-}
-
-TEST_F(RequestQueueTest, RemovingANumberThatIsNotOrTwiceInTheQueueFails) {
-    Json::Value root = ParseDocument(R"({"requestQueue" : ["1", "1"], "requests" : {"1" : {}}})");
-    CapturedLog log;
-    EXPECT_EQ(JsonRemoveRequest(root, "1"), -1);
-    EXPECT_EQ(JsonRemoveRequest(root, "7"), -1);
-    EXPECT_EQ(log.Messages(), (Messages{
-                                  "Remove string error, count =2",
-                                  "Can't remove request num (1) from request queue",
-                                  "Remove string error, count =0",
-                                  "Can't remove request num (7) from request queue",
-                              }));
-    EXPECT_EQ(root["requestQueue"], ParseDocument(R"(["1", "1"])"));
-}
-
-TEST_F(RequestQueueTest, RemovingANumberWithoutARequestFailsAfterTheQueueEntryWent) {
-    Json::Value root = ParseDocument(R"({"requestQueue" : ["1", "2"], "requests" : {"2" : {}}})");
-    CapturedLog log;
-    EXPECT_EQ(JsonRemoveRequest(root, "1"), -1);
-    EXPECT_EQ(log.Messages(), Messages{"Can't find request number (1) in config"});
-    EXPECT_EQ(root["requestQueue"], ParseDocument(R"(["2"])"));
-}
-
-TEST_F(RequestQueueTest, RemovingANullRequestFails) {
-    Json::Value root = ParseDocument(R"({"requestQueue" : ["1"], "requests" : {"1" : null}})");
-    CapturedLog log(2);
-    EXPECT_EQ(JsonRemoveRequest(root, "1"), -1);
-    EXPECT_EQ(log.Messages(),
-              (Messages{
-                  "JsonRemoveRequest() [N]: Remove request num = 1",
-                  "JsonRemoveRequest() [N] : ***** Remove request (1) from requests failed",
-              }));
-}
-
-TEST_F(RequestQueueTest, CountingGivesTheDocumentAndTheQueuesLength) {
-    Json::Value root;
-    int count = -1;
-    Store(exampleDocument);
-    EXPECT_EQ(ConfigGetJsonAndNumRequest(path_.c_str(), &root, &count), 0);
-    EXPECT_EQ(count, 2);
-    EXPECT_EQ(root, ParseDocument(exampleDocument));
-    Store("{}");
-    EXPECT_EQ(ConfigGetJsonAndNumRequest(path_.c_str(), &root, &count), 0);
-    EXPECT_EQ(count, 0);
-    Store("[]");
-    EXPECT_EQ(ConfigGetJsonAndNumRequest(path_.c_str(), &root, &count), -1);
-}
-
-TEST_F(RequestQueueTest, DroppingARequestRewritesTheFile) {
-    Store(exampleDocument);
-    CapturedLog log;
-    EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "2"), 0);
-    EXPECT_EQ(log.Messages(), Messages{});
-    EXPECT_EQ(Stored(), R"({
-   "nextRequestNum" : 3,
-   "requestQueue" : [ "1" ],
-   "requests" : {
-      "1" : {
-         "data" : "share/b.bin#5678",
-         "mountPath" : "/volume1",
-         "type" : "pinFiles"
-      }
-   },
-   "volumes" : {
-      "/volume1" : {
-         "files" : {
-            "1234" : "share/a.txt"
-         }
-      }
-   }
-}
-)");
-}
-
-TEST_F(RequestQueueTest, DroppingTheLastRequestLeavesANullQueueThatTakesTheNext) {
-    Store(R"({"nextRequestNum" : 5, "requestQueue" : ["4"], "requests" : {"4" : {}}})");
-    ASSERT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "4"), 0);
-    EXPECT_EQ(StoredDocument(),
-              ParseDocument(R"({"nextRequestNum" : 5, "requestQueue" : null, "requests" : {}})"));
-    EXPECT_EQ(AddReload(), 0);
-    EXPECT_EQ(StoredDocument()["requestQueue"], ParseDocument(R"(["5"])"));
-}
-
-TEST_F(RequestQueueTest, DroppingWithoutAFileFails) {
-    CapturedLog log(2);
-    EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "1"), -1);
-    EXPECT_EQ(log.Messages(), Messages{"ConfigDropErrorRequest() [N] : ***** Can't find config file (" +
-                                       path_ + ")"});
-}
-
-TEST_F(RequestQueueTest, DroppingFromADamagedFileFails) {
-    Store("{");
-    CapturedLog log;
-    EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "1"), -1);
-    EXPECT_EQ(log.Messages(), (Messages{
-                                  "Prase file " + path_ + " error",
-                                  "Can't read data from config file (" + path_ + ")",
-                              }));
-    EXPECT_EQ(Stored(), "{");
-}
-
-TEST_F(RequestQueueTest, DroppingAnUnknownRequestFailsAndWritesNothing) {
-    Store(exampleDocument);
-    CapturedLog log;
-    EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "7"), -1);
-    EXPECT_EQ(log.Messages(), (Messages{
-                                  "Remove string error, count =0",
-                                  "Can't remove request num (7) from request queue",
-                                  "Can't remove request",
-                              }));
-    EXPECT_EQ(Stored(), exampleDocument);
-}
-
-TEST_F(RequestQueueTest, DroppingFromAFileThatCannotBeWrittenFails) {
-    Store(exampleDocument);
-    chmod(folder_.Path().c_str(), 0755);
-    chmod(path_.c_str(), 0444);
-    CapturedLog log;
-    {
-        const OrdinaryUser user;
-        EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "1"), -1);
-    }
-    EXPECT_EQ(log.Messages(), (Messages{
-                                  "Can't open config file (" + path_ + ")",
-                                  "Write json data to config (" + path_ + ") failed",
-                              }));
-    EXPECT_EQ(Stored(), exampleDocument);
 }

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <gtest/gtest.h>
 #include <regex>
 #include <sys/mman.h>
 #include <unistd.h>
@@ -19,11 +20,14 @@ CapturedLog::CapturedLog(int level) {
 }
 
 CapturedLog::~CapturedLog() {
+    // What a failed expectation had to say was caught, too.
+    const std::string unseen = ::testing::Test::HasFailure() ? Text() : "";
     fflush(stdout);
     dup2(savedStdout_, STDOUT_FILENO);
     close(savedStdout_);
     close(file_);
     LogLevel = 1;
+    fputs(unseen.c_str(), stdout);
 }
 
 std::string CapturedLog::Text() {

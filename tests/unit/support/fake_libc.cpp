@@ -18,6 +18,7 @@ int FakeLibc::syncs = 0;
 std::function<void()> FakeLibc::onSleep;
 std::function<void()> FakeLibc::onSync;
 std::function<int(unsigned long, void *)> FakeLibc::onIoctl;
+std::function<void(struct stat *)> FakeLibc::onStat;
 std::function<void(int, long long, size_t)> FakeLibc::onRead;
 
 namespace {
@@ -86,6 +87,7 @@ void FakeLibc::Reset() {
     onSleep = nullptr;
     onSync = nullptr;
     onIoctl = nullptr;
+    onStat = nullptr;
     onRead = nullptr;
     const std::lock_guard<std::mutex> lock(ordersMutex);
     Orders().clear();
@@ -200,7 +202,11 @@ int stat(const char *path, struct stat *status) noexcept {
         errno = error;
         return -1;
     }
-    return fstatat(AT_FDCWD, path, status, 0);
+    const int result = fstatat(AT_FDCWD, path, status, 0);
+    if (result == 0 && FakeLibc::onStat) {
+        FakeLibc::onStat(status);
+    }
+    return result;
 }
 
 int fsync(int fd) {

@@ -10,6 +10,8 @@
 #include <functional>
 #include <string>
 
+struct stat;
+
 struct FakeLibc {
     static void Reset();
 
@@ -33,6 +35,9 @@ struct FakeLibc {
     static void Count(const std::string &function);
     // How often the function was called since Reset().
     static int Calls(const std::string &function);
+
+    // Changes what stat() has found while it is set.
+    static std::function<void(struct stat *)> onStat;
 
     // Answers every ioctl while it is set: (request, third argument) to the result; -1 with errno.
     static std::function<int(unsigned long, void *)> onIoctl;

@@ -14,9 +14,8 @@ inline std::vector<std::string> MessagesOf(CapturedLog &log, const std::string &
     const std::string prefix = function + "() [N]";
     const std::vector<std::string> all = log.Messages();
     std::vector<std::string> messages;
-    std::copy_if(
-        all.begin(), all.end(), std::back_inserter(messages),
-        [&prefix](const std::string &message) { return message.rfind(prefix, 0) == 0; });
+    std::copy_if(all.begin(), all.end(), std::back_inserter(messages),
+                 [&prefix](const std::string &message) { return message.rfind(prefix, 0) == 0; });
     return messages;
 }
 

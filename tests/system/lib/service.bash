@@ -1,0 +1,86 @@
+# The pin service of a test: started, watched through its files, ended by its process id. What it
+# writes is buffered and complete only once it has ended.
+# shellcheck shell=bash
+
+SERVICE_LOG=/run/pin/service.log
+
+# start_service [OPTION...]: with --stdout; leaves the process id in SERVICE_PID. Ready for requests
+# and signals when it returns.
+start_service() {
+    mkdir -p "${CONF%/*}"
+    tool --start-service --config-path "$CONF" --stdout "$@" >"$SERVICE_LOG" 2>&1 3>&- &
+    SERVICE_PID=$!
+    wait_until service_is_ready
+}
+
+# It handles SIGTERM and its queue is there.
+service_is_ready() {
+    local caught
+    caught=$(sed -n 's/^SigCgt:\t//p' "/proc/$SERVICE_PID/status") || return 1
+    [ -n "$caught" ] && ((0x$caught & 0x4000)) && [ -s "$KEY_FILE" ]
+}
+
+# stop_service [SIGNAL]: it must end with status 0.
+stop_service() {
+    local status=0
+    kill -s "${1:-TERM}" "$SERVICE_PID"
+    wait "$SERVICE_PID" || status=$?
+    SERVICE_PID=
+    [ "$status" -eq 0 ] || {
+        echo "the service ended with status $status"
+        return 1
+    }
+}
+
+# Ends what a failed test left running, and shows what it wrote.
+end_service() {
+    if [ -n "${SERVICE_PID:-}" ]; then
+        kill -s TERM "$SERVICE_PID" 2>/dev/null || true
+        sleep 0.1
+        kill -s KILL "$SERVICE_PID" 2>/dev/null || true
+        wait "$SERVICE_PID" 2>/dev/null || true
+        SERVICE_PID=
+    fi
+    # Shown by bats where the test has failed.
+    [ ! -e "$SERVICE_LOG" ] || tail -n 40 "$SERVICE_LOG"
+    rm -f "$SERVICE_LOG"
+}
+
+# The service is to be stopped, having written exactly the lines of standard input, ":" as in
+# answers; without the line of its start.
+service_said() {
+    stop_service
+    sed 's/^:/veskcachepinfiletool:/' >"$BATS_TEST_TMPDIR/expected"
+    sed '1{/: Service starts (Build time: 2018-06-08-15:24)$/d}' "$SERVICE_LOG" |
+        diff -u "$BATS_TEST_TMPDIR/expected" -
+}
+
+# The number that the next request will get.
+next_number() { jq -r '.nextRequestNum // 0' "$CONF" 2>/dev/null || echo 0; }
+
+# Request NUMBER is in the configuration file / is not in it any more.
+request_is_stored() {
+    jq -e --argjson n "$1" '.nextRequestNum > $n' "$CONF" >/dev/null 2>&1
+}
+request_is_done() {
+    jq -e --argjson n "$1" '.nextRequestNum > $n and
+        (.requestQueue | index($n | tostring) | not)' "$CONF" >/dev/null 2>&1
+}
+queue_is_empty() { jq -e '.requestQueue | length == 0' "$CONF" >/dev/null 2>&1; }
+
+# join FILE...: the form of the files argument.
+join() {
+    local IFS=';'
+    echo "$*"
+}
+
+# pin N FILE... / unpin N FILE... / reload N: one request on volume N, waits until it is done.
+pin() { request_and_wait --pin-files "$(join "${@:2}")" --mount-path "/volume$1"; }
+unpin() { request_and_wait --unpin-files "$(join "${@:2}")" --mount-path "/volume$1"; }
+reload() { request_and_wait --reload-blocks --mount-path "/volume$1"; }
+request_and_wait() {
+    local number
+    number=$(next_number)
+    tool "$@"
+    wait_until request_is_done "$number"
+}

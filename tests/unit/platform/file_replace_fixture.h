@@ -1,0 +1,78 @@
+// A folder with one file that holds `old`, to be replaced by `fresh`.
+#ifndef TESTS_PLATFORM_FILE_REPLACE_FIXTURE_H
+#define TESTS_PLATFORM_FILE_REPLACE_FIXTURE_H
+
+#include "platform/file_replace.h"
+#include "support/leak_checked_test.h"
+#include "support/temp_dir.h"
+
+#include <algorithm>
+#include <functional>
+#include <string>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+#include <vector>
+
+const uid_t nobody = 65534;
+
+class FileReplaceTest : public LeakCheckedTest {
+protected:
+    void SetUp() override {
+        LeakCheckedTest::SetUp();
+        savedMask_ = umask(022);
+        WriteWhole(path, old);
+    }
+    void TearDown() override {
+        umask(savedMask_);
+        LeakCheckedTest::TearDown();
+    }
+
+    // The folder's names, sorted: a temporary file left behind would be among them.
+    std::vector<std::string> Names() const {
+        std::vector<std::string> names;
+        for (const auto &entry : std::filesystem::directory_iterator(folder.Path())) {
+            names.push_back(entry.path().filename());
+        }
+        std::sort(names.begin(), names.end());
+        return names;
+    }
+    static struct stat Status(const std::string &file) {
+        struct stat status {};
+        EXPECT_EQ(lstat(file.c_str(), &status), 0) << file;
+        return status;
+    }
+
+    // Replaces the file in a process of its own, as the user nobody.
+    static FileReplaceResult ReplaceAsNobody(const std::string &file, const std::string &content) {
+        fflush(stdout);
+        const pid_t child = fork();
+        if (child == 0) {
+            if (setgid(nobody) < 0 || setuid(nobody) < 0) {
+                _exit(99);
+            }
+            _exit(static_cast<int>(FileReplaceContent(file.c_str(), content)));
+        }
+        int status = 0;
+        waitpid(child, &status, 0);
+        EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) != 99);
+        return static_cast<FileReplaceResult>(WEXITSTATUS(status));
+    }
+
+    TempDir folder;
+    const std::string path = folder.Path("file");
+    const std::string old = "the old content, which is longer than the fresh one";
+    const std::string fresh = "the fresh content";
+    const std::vector<std::string> onlyTheFile = {"file"};
+
+private:
+    mode_t savedMask_ = 0;
+};
+
+#define SKIP_WITHOUT_ROOT()                                                                        \
+    if (geteuid() != 0) {                                                                          \
+        GTEST_SKIP() << "acting for another user needs root";                                      \
+    }                                                                                              \
+    static_assert(true, "a semicolon follows")
+
+#endif
