@@ -18,7 +18,7 @@ int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &f
                   uint32_t inode, FileMappingTable *tableOut) {
     LogVerbose("Add file (%s) start", filePath.c_str());
     FileMappingTable table;
-    const Clock::time_point start = Clock::now();
+    const Clock::time_point start = Clock::now(); // NOLINT(clang-analyzer-deadcode.DeadStores)
     if (timeExtentLookup) {
         LogVerbose("Get mapping of file (%s) start. Time=%s", filePath.c_str(), GetTimeString());
     }

@@ -26,6 +26,7 @@ public:
     MessageText(const char *format, va_list arguments) {
         va_list again;
         va_copy(again, arguments);
+        // The caller has started the arguments. NOLINTNEXTLINE(clang-analyzer-valist.Uninitialized)
         const int length = vsnprintf(fixed_, sizeof(fixed_), format, arguments);
         if (length >= static_cast<int>(sizeof(fixed_))) {
             const size_t size = static_cast<size_t>(length) + 1;

@@ -16,11 +16,11 @@ int JsonArrayRemoveString(Json::Value &array, const std::string &text) {
     Json::Value kept;
     int count = 0;
     for (const Json::Value &element : array) {
-        std::string value = element.asString();
+        const std::string value = element.asString();
         if (value == text) {
             ++count;
         } else {
-            kept.append(std::move(value));
+            kept.append(value);
         }
     }
     if (count != 1) {

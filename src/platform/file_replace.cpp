@@ -13,7 +13,7 @@
 
 namespace {
 
-enum class Attempt { Done, Failed, NotAllowed };
+enum class Attempt { Done, NotCreated, NotWritten, NotAllowed };
 
 bool WriteAll(int fd, const std::string &content) {
     size_t written = 0;
@@ -37,7 +37,7 @@ bool IsFolderRefusal(int error) {
 }
 
 Attempt AttemptFromErrno() {
-    return IsFolderRefusal(errno) ? Attempt::NotAllowed : Attempt::Failed;
+    return IsFolderRefusal(errno) ? Attempt::NotAllowed : Attempt::NotCreated;
 }
 
 // A new file in the folder under a name that nobody else uses. Negative with errno on failure.
@@ -74,7 +74,7 @@ Attempt FillTemporary(int fd, const struct stat *old, const std::string &content
     if (old != nullptr && !CopyOwnerAndMode(fd, *old)) {
         return Attempt::NotAllowed;
     }
-    return WriteAll(fd, content) && fsync(fd) == 0 ? Attempt::Done : Attempt::Failed;
+    return WriteAll(fd, content) && fsync(fd) == 0 ? Attempt::Done : Attempt::NotWritten;
 }
 
 Attempt ReplaceByRename(const std::string &target, const struct stat *old,
@@ -121,7 +121,7 @@ FileReplaceResult ReplaceExisting(const char *path, const struct stat &old,
                                   const std::string &content) {
     // Renaming asks only the folder; a file that may not be written must stay as it is all the
     // same.
-    if (!ScopedFd(open(path, O_WRONLY | O_CLOEXEC)).IsOpen()) {
+    if (!ScopedFd(open(path, O_WRONLY | O_NONBLOCK | O_CLOEXEC)).IsOpen()) {
         return FileReplaceResult::CannotOpen;
     }
     const MallocText target(realpath(path, nullptr));
@@ -130,7 +130,8 @@ FileReplaceResult ReplaceExisting(const char *path, const struct stat &old,
     }
     switch (ReplaceByRename(target.get(), &old, content)) {
     case Attempt::Done: return FileReplaceResult::Done;
-    case Attempt::Failed: return FileReplaceResult::NotWritten;
+    case Attempt::NotCreated:
+    case Attempt::NotWritten: return FileReplaceResult::NotWritten;
     case Attempt::NotAllowed: break;
     }
     return WriteInPlace(path, content);
@@ -148,7 +149,8 @@ FileReplaceResult FileReplaceContent(const char *path, const std::string &conten
     if (errno == ENOENT && lstat(path, &status) < 0 && errno == ENOENT) {
         switch (ReplaceByRename(path, nullptr, content)) {
         case Attempt::Done: return FileReplaceResult::Done;
-        case Attempt::Failed: return FileReplaceResult::CannotOpen;
+        case Attempt::NotCreated: return FileReplaceResult::CannotOpen;
+        case Attempt::NotWritten: return FileReplaceResult::NotWritten;
         case Attempt::NotAllowed: break;
         }
     }

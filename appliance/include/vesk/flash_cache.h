@@ -34,7 +34,7 @@ struct VESKFlashCacheStat {
     int32_t reserved3[19];
     int32_t supportPin; // 1: the cache driver supports pinning
 };
-static_assert(sizeof(VESKFlashCacheStat) == 23 * 4, "supportPin is the record's 23rd word");
+static_assert(sizeof(VESKFlashCacheStat) == 23 * sizeof(int32_t), "supportPin is the record's 23rd word");
 
 // What the 32-bit target needs: the sizes below are the vendor library's there.
 static_assert(sizeof(void *) != 4 || sizeof(VESKFlashCacheConfigQuery) == 24, "six words");

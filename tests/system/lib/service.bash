@@ -8,7 +8,8 @@ SERVICE_LOG=/run/pin/service.log
 # and signals when it returns.
 start_service() {
     mkdir -p "${CONF%/*}"
-    tool --start-service --config-path "$CONF" --stdout "$@" >"$SERVICE_LOG" 2>&1 3>&- &
+    "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout "$@" \
+        >"$SERVICE_LOG" 2>&1 3>&- &
     SERVICE_PID=$!
     wait_until service_is_ready
 }

@@ -1,0 +1,41 @@
+// What the warming tests share: a cache device, its volume and the pending-space list.
+#ifndef TESTS_WARMING_WARMING_FIXTURE_H
+#define TESTS_WARMING_WARMING_FIXTURE_H
+
+#include "support/captured_log.h"
+#include "support/fake_appliance.h"
+#include "support/fake_libc.h"
+#include "support/leak_checked_test.h"
+#include "support/messages_of.h"
+#include "warming/fake_cache_device.h"
+
+#include "service/service_state.h"
+
+#include <gtest/gtest.h>
+#include <memory>
+
+class WarmingTest : public LeakCheckedTest {
+protected:
+    void SetUp() override {
+        LeakCheckedTest::SetUp();
+        ASSERT_EQ(ServiceStateInitialize(), 0);
+    }
+    // A device of this size (bytes) behind /volume1.
+    void UseDevice(uint64_t bytes) {
+        device_ = std::make_unique<FakeCacheDevice>(bytes);
+        FakeApplianceOneVolume(device_->Path());
+    }
+    static void SetPending() {
+        char path[] = "/volume1";
+        ASSERT_EQ(ServiceAddPendingSpaceAtomic(path), 0);
+    }
+    std::unique_ptr<FakeCacheDevice> device_;
+};
+
+#define SKIP_WITHOUT_DIRECT_READS()                                                                \
+    if (!device_->TakesDirectReads()) {                                                            \
+        GTEST_SKIP() << "the current folder takes no direct reads";                                \
+    }                                                                                              \
+    static_assert(true, "a semicolon follows")
+
+#endif
