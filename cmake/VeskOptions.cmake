@@ -18,6 +18,8 @@ set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/bin)
 set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
 set(CMAKE_ARCHIVE_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+# Found from the binary's own place, so that a build tree can be moved.
+set(CMAKE_BUILD_RPATH_USE_ORIGIN ON)
 
 add_library(vesk_options INTERFACE)
 add_library(vesk::options ALIAS vesk_options)

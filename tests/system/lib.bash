@@ -115,13 +115,26 @@ spare_device() {
     mkdir -p "/tmp/$name"
     truncate -s "$size" "/tmp/$name/backing"
     truncate -s 16M "/tmp/$name/ssd"
-    "$BIN/veskcachedev" --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \
-        --ssd "/tmp/$name/ssd" "$@" 3>&-
+    (
+        close_descriptors
+        exec "$BIN/veskcachedev" --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \
+            --ssd "/tmp/$name/ssd" "$@"
+    )
     echo "/run/$name/cachedev"
 }
 
-# make_volume: volume_make without the descriptor on which bats waits for every process to end.
-make_volume() { volume_make "$@" 3>&-; }
+# make_volume: volume_make as a test may call it.
+make_volume() { (close_descriptors && volume_make "$@"); }
+
+# Closes what bats keeps open in this subshell: it waits until nobody holds it any more, and what is
+# started here goes on running.
+close_descriptors() {
+    local fd
+    for fd in /proc/"$BASHPID"/fd/*; do
+        fd=${fd##*/}
+        [ "$fd" -le 2 ] || [ "$fd" -eq 255 ] || eval "exec $fd>&-"
+    done
+}
 
 # Every file's end of a test: no service is left over, and a failed test shows what it wrote.
 teardown() { end_service; }

@@ -87,14 +87,16 @@ END
     cp a /tmp/copy
     start_service
     pin 1 /volume1/a
-    local pinned others hits misses
+    local pinned last hits misses
     pinned=$(pinned_blocks 1)
-    others=$(comm -23 <(cached_blocks 1 | sort) <(sort <<<"$pinned"))
-    [ -n "$others" ]
     scan_device 1
     same "$pinned" "$(pinned_blocks 1)"
     is_subset "$pinned" "$(cached_blocks 1)"
-    same "" "$(common "$others" "$(cached_blocks 1)")"
+    # All other slots hold what was read last; up to 16 blocks are read at the same time.
+    last=$(seq 0 $((${SIZE%M} * 16 - 1)) | grep -Fvx "$pinned" |
+        tail -n $(($(state 1 .slots) - $(wc -l <<<"$pinned") + 16)))
+    is_subset "$(cached_blocks 1)" "$pinned"$'\n'"$last"
+    [ "$(state 1 .cachedBlocks)" -eq "$(state 1 .slots)" ]
     ssd_holds_the_data 1
     hits=$(state 1 .ssdReads)
     misses=$(state 1 .misses)

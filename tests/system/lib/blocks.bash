@@ -87,14 +87,14 @@ scan_device() { dd if="$(volume_device "$1")" of=/dev/null bs=1M iflag=direct st
 # random FILE SIZE [dd option...]: fresh bytes.
 random() { dd if=/dev/urandom of="$1" bs="$2" count=1 status=none "${@:3}"; }
 
-# fragmented FILE PIECES: that many pieces of 64 KiB, each an extent of its own, since another file
-# takes the place between them.
+# fragmented FILE PIECES: a file without holes whose pieces of 64 KiB, and 4 KiB behind them, are
+# extents of their own: what lay between them is cut out.
 fragmented() {
     local i
-    for ((i = 0; i < $2; i++)); do
-        fallocate -o $((i * 65536)) -l 65536 "$1"
-        fallocate -o $((i * 65536)) -l 65536 "$1.between"
+    random "$1" $(($2 * 128 + 4))K conv=fsync
+    for ((i = $2 - 1; i >= 0; i--)); do
+        fallocate --collapse-range -o $((i * 131072 + 65536)) -l 65536 "$1"
     done
-    dd if=/dev/urandom of="$1" bs=64K count="$2" conv=notrunc,fsync status=none
-    [ "$(extents "$1" | wc -l)" -ge "$2" ]
+    sync "$1"
+    [ "$(extents "$1" | wc -l)" -gt "$2" ]
 }

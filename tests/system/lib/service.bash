@@ -8,8 +8,10 @@ SERVICE_LOG=/run/pin/service.log
 # and signals when it returns.
 start_service() {
     mkdir -p "${CONF%/*}"
-    "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout "$@" \
-        >"$SERVICE_LOG" 2>&1 3>&- &
+    (
+        close_descriptors
+        exec "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout "$@"
+    ) >"$SERVICE_LOG" 2>&1 &
     SERVICE_PID=$!
     wait_until service_is_ready
 }
