@@ -25,17 +25,8 @@ constexpr fuse_ino_t kStateInode = 3;
 constexpr double kNameTimeout = 60;     // seconds; the names never change
 constexpr double kAttributeTimeout = 0; // seconds; the state file changes its length
 
-// What an open of the state file shows: the state at that moment. Its address is the file handle.
-using StateText = std::string;
-
 ServedDevice &Served(fuse_req_t request) {
     return *static_cast<ServedDevice *>(fuse_req_userdata(request));
-}
-
-const StateText *StateOf(const struct fuse_file_info *info) {
-    // The handle is the address that Open stored there.
-    // NOLINTNEXTLINE(performance-no-int-to-ptr)
-    return reinterpret_cast<const StateText *>(static_cast<uintptr_t>(info->fh));
 }
 
 // Runs the body of a callback: it replies and returns 0, or does not reply and returns an errno,
@@ -54,7 +45,19 @@ template <typename Body> void Guarded(fuse_req_t request, Body body) {
 }
 
 StateText CurrentState(ServedDevice &served) {
-    return StateJsonText(CacheDeviceSnapshot(served.device), getpid());
+    return std::make_shared<const std::string>(
+        StateJsonText(CacheDeviceSnapshot(served.device), getpid()));
+}
+
+// The text that an open state file shows.
+StateText OpenedState(ServedDevice &served, const struct fuse_file_info *info) {
+    const std::lock_guard<std::mutex> hold(served.openStates.mutex);
+    return served.openStates.texts.at(info->fh);
+}
+
+void CloseState(ServedDevice &served, uint64_t handle) {
+    const std::lock_guard<std::mutex> hold(served.openStates.mutex);
+    served.openStates.texts.erase(handle);
 }
 
 // The attributes of an inode; `info` is that of an open file or null.
@@ -66,7 +69,7 @@ struct stat StatusOf(ServedDevice &served, fuse_ino_t inode, const struct fuse_f
         bytes = served.device.images.deviceBytes;
     } else if (inode == kStateInode) {
         status.st_mode = S_IFREG | 0444;
-        bytes = info != nullptr ? StateOf(info)->size() : CurrentState(served).size();
+        bytes = (info != nullptr ? OpenedState(served, info) : CurrentState(served))->size();
     } else {
         status.st_mode = S_IFDIR | 0755;
     }
@@ -166,29 +169,31 @@ void ReadFolder(fuse_req_t request, fuse_ino_t, size_t size, off_t offset,
 
 void Open(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
     Guarded(request, [=] {
-        std::unique_ptr<StateText> state;
+        ServedDevice &served = Served(request);
+        info->direct_io = 1; // every read of the device reaches the cache
+        info->noflush = 1;   // nothing happens at close
+        info->fh = 0;
         if (inode == kStateInode) {
             if ((info->flags & O_ACCMODE) != O_RDONLY)
                 return EACCES;
-            state = std::make_unique<StateText>(CurrentState(Served(request)));
+            StateText text = CurrentState(served);
+            const std::lock_guard<std::mutex> hold(served.openStates.mutex);
+            info->fh = ++served.openStates.lastHandle;
+            served.openStates.texts.emplace(info->fh, std::move(text));
         }
-        info->direct_io = 1; // every read of the device reaches the cache
-        info->noflush = 1;   // nothing happens at close
-        info->fh = reinterpret_cast<uintptr_t>(state.get());
-        // A caller that was interrupted does not close what it does not have.
-        if (fuse_reply_open(request, info) == 0)
-            static_cast<void>(state.release());
+        // Whoever gave up waiting never closes the file that it did not get.
+        if (fuse_reply_open(request, info) != 0)
+            CloseState(served, info->fh);
         return 0;
     });
 }
 
-void Release(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
-    if (inode == kStateInode)
-        delete StateOf(info);
+void Release(fuse_req_t request, fuse_ino_t, struct fuse_file_info *info) {
+    CloseState(Served(request), info->fh);
     fuse_reply_err(request, 0);
 }
 
-void ReadState(fuse_req_t request, size_t size, off_t offset, const StateText &text) {
+void ReadState(fuse_req_t request, size_t size, off_t offset, const std::string &text) {
     const size_t start =
         static_cast<size_t>(std::min<uint64_t>(static_cast<uint64_t>(offset), text.size()));
     fuse_reply_buf(request, text.data() + start, std::min(size, text.size() - start));
@@ -198,7 +203,7 @@ void Read(fuse_req_t request, fuse_ino_t inode, size_t size, off_t offset,
           struct fuse_file_info *info) {
     Guarded(request, [=] {
         if (inode == kStateInode) {
-            ReadState(request, size, offset, *StateOf(info));
+            ReadState(request, size, offset, *OpenedState(Served(request), info));
             return 0;
         }
         const auto reply = [request](const ImagePieces &pieces) {

@@ -61,10 +61,19 @@ bool ParseFault(const std::string &text, uint64_t mostNumber, uint64_t &number, 
 }
 
 bool ParseDevice(const std::string &text, CachedevOptions &options) {
+    if (text.empty())
+        return false;
     const std::filesystem::path path = std::filesystem::absolute(text).lexically_normal();
     options.folder = path.parent_path().string();
     options.deviceName = path.filename().string();
-    return !text.empty() && !options.deviceName.empty() && options.deviceName != "..";
+    return !options.deviceName.empty() && options.deviceName != "..";
+}
+
+bool ParsePidFile(const std::string &text, std::string &pidFile) {
+    if (text.empty())
+        return false;
+    pidFile = std::filesystem::absolute(text).string();
+    return true;
 }
 
 bool ApplyFailIoctl(const std::string &text, CacheFaults &faults) {
@@ -102,7 +111,7 @@ bool Apply(int code, const std::string &value, CachedevOptions &options) {
     case kSsd: options.ssdPath = value; return true;
     case kMissDelay: return ApplyMissDelay(value, options.settings.missDelayMs);
     case kForeground: options.foreground = true; return true;
-    case kPidFile: options.pidFile = std::filesystem::absolute(value).string(); return true;
+    case kPidFile: return ParsePidFile(value, options.pidFile);
     case kFailIoctl: return ApplyFailIoctl(value, faults);
     case kFailRead: return ApplyFailRead(value, faults);
     case kShortAt: return ParseNumber(value, UINT64_MAX, faults.shortAt);

@@ -64,8 +64,12 @@ int Run(int argc, char **argv) {
     if (!options.pidFile.empty() && WritePidFile(options.pidFile, pidFile) != 0)
         return Fail("cannot write " + options.pidFile + ": " + strerror(errno));
 
-    ServedDevice served = {device, options.deviceName, options.deviceName + ".json", time(nullptr),
-                           [&background] { BackgroundReady(background); }};
+    ServedDevice served = {device,
+                           options.deviceName,
+                           options.deviceName + ".json",
+                           time(nullptr),
+                           [&background] { BackgroundReady(background); },
+                           {}};
     const int result = CachedevServe(served, options.folder);
     const int synced = CacheImagesSyncAll(device.images);
     if (synced != 0)

@@ -1,13 +1,12 @@
 #include "cli/log.h"
 
-#include "cli/syslog_capture.h"
+#include "cli/log_calls.h"
 #include "support/captured_log.h"
 
 #include <cerrno>
 #include <cstdio>
 #include <gtest/gtest.h>
 #include <string>
-#include <syslog.h>
 
 namespace {
 
@@ -16,49 +15,7 @@ const int initialLogToSyslog = LogToSyslog;
 const int initialLogLevel = LogLevel;
 const char *const initialProgramName = ProgramName;
 
-std::string Line(int line) {
-    return std::to_string(line);
-}
-
-// One message of each class, each in a function that readers of the log would look for. The line of
-// the call is handed back.
-int ReportError() {
-    LogError("Invalid input %d", 7);
-    return __LINE__ - 1;
-}
-int ReportNotice() {
-    LogNotice("Send bitmap OK");
-    return __LINE__ - 1;
-}
-int ReportVerbose() {
-    LogVerbose("Get UUID = %s", "u");
-    return __LINE__ - 1;
-}
-int ReportDebug() {
-    LogDebug("Next read start = %d bytes=%d", 0, 1);
-    return __LINE__ - 1;
-}
-
 class LogToStdout : public ::testing::Test {};
-
-class LogToSystemLog : public ::testing::Test {
-protected:
-    void SetUp() override {
-        LogToSyslog = 1;
-        SyslogRecords().clear();
-    }
-    void TearDown() override {
-        LogToSyslog = 0;
-        LogLevel = 1;
-    }
-    // The one record since the last call.
-    static std::string Taken() {
-        EXPECT_EQ(SyslogRecords().size(), 1U);
-        const std::string text = SyslogRecords().empty() ? "" : SyslogRecords()[0].text;
-        SyslogRecords().clear();
-        return text;
-    }
-};
 
 } // namespace
 
@@ -142,6 +99,12 @@ TEST_F(LogToStdout, PercentSignsInArgumentsAreText) {
     EXPECT_EQ(log.Text(), "tool: File (%s%n%d) doesn't exist\n");
 }
 
+TEST_F(LogToStdout, TextThatCannotBeFormattedIsLeftOut) {
+    CapturedLog log;
+    LogError("%ls", L"\u20ac"); // no such character in the C locale
+    EXPECT_EQ(log.Text(), "tool: \n");
+}
+
 TEST_F(LogToStdout, NullTextIsWrittenAsThePrintFunctionsDo) {
     CapturedLog log;
     const char *volatile none = nullptr;
@@ -190,78 +153,6 @@ TEST_F(LogToStdout, ErrnoIsAsBefore) {
     errno = EXDEV;
     LogError("%s", std::string(5000, 'x').c_str());
     EXPECT_EQ(errno, EXDEV);
-}
-
-TEST_F(LogToSystemLog, NothingGoesToStandardOutput) {
-    CapturedLog output;
-    LogToSyslog = 1;
-    ReportError();
-    EXPECT_EQ(output.Text(), "");
-    EXPECT_EQ(SyslogRecords().size(), 1U);
-}
-
-TEST_F(LogToSystemLog, Level1HasSourceFileLineAndText) {
-    const std::string error = Line(ReportError());
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + error + " Invalid input 7");
-    const std::string notice = Line(ReportNotice());
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + notice + " Send bitmap OK");
-    ReportVerbose();
-    ReportDebug();
-    EXPECT_TRUE(SyslogRecords().empty());
-}
-
-TEST_F(LogToSystemLog, LongErrorHasTheLineTwiceAndTheMarker) {
-    LogLevel = 2;
-    const std::string line = Line(ReportError());
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + line + " ReportError() [" + line +
-                           "] : ***** Invalid input 7");
-}
-
-TEST_F(LogToSystemLog, LongNoticeVerboseAndDebugHaveOneForm) {
-    LogLevel = 3;
-    const std::string notice = Line(ReportNotice());
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + notice + " ReportNotice() [" + notice +
-                           "] : Send bitmap OK");
-    const std::string verbose = Line(ReportVerbose());
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + verbose + " ReportVerbose() [" + verbose +
-                           "] : Get UUID = u");
-    const std::string debug = Line(ReportDebug());
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + debug + " ReportDebug() [" + debug +
-                           "] : Next read start = 0 bytes=1");
-}
-
-TEST_F(LogToSystemLog, DebugIsNotWrittenAtLevel2) {
-    LogLevel = 2;
-    ReportDebug();
-    EXPECT_TRUE(SyslogRecords().empty());
-}
-
-TEST_F(LogToSystemLog, TraceHasTheLongForm) {
-    LogLevel = 2;
-    const std::string entry = Line(__LINE__ + 1);
-    LogTraceEntry();
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + entry + " TestBody() [" + entry + "] : +++++");
-    const std::string leave = Line(__LINE__ + 1);
-    LogTraceExit();
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + leave + " TestBody() [" + leave + "] : -----");
-}
-
-TEST_F(LogToSystemLog, EveryClassHasErrorPriorityAndNoFacility) {
-    LogLevel = 3;
-    ReportError();
-    ReportNotice();
-    ReportVerbose();
-    ReportDebug();
-    ASSERT_EQ(SyslogRecords().size(), 4U);
-    for (const SyslogRecord &record : SyslogRecords()) {
-        EXPECT_EQ(record.priority, 3);
-    }
-}
-
-TEST_F(LogToSystemLog, LineFeedAtTheEndIsKept) {
-    const std::string line = Line(__LINE__ + 1);
-    LogError("Can't open bitmap file (%s) \n", "f");
-    EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + line + " Can't open bitmap file (f) \n");
 }
 
 TEST(LogU64, GivesTheWholeRange) {

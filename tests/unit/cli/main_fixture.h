@@ -5,6 +5,7 @@
 
 #include "cli/fake_commands.h"
 #include "cli/log.h"
+#include "cli/options_fixture.h"
 #include "cli/syslog_capture.h"
 #include "support/leak_checked_test.h"
 
@@ -18,6 +19,13 @@
 #include <vector>
 
 extern "C" int ToolMain(int argc, char *argv[]); // the tool's main
+
+const Arguments mount = {"--mount-path", "/volume1"};
+
+inline Arguments Range(const char *command) {
+    return Arguments{command, "--start-sector", "128", "--num-sectors", "18446744073709551"} +
+           mount;
+}
 
 struct Outcome {
     int status = -1;       // exit status
@@ -35,14 +43,14 @@ inline std::string Content(int file) {
 }
 
 // The run ends with the process, as in earnest: main keeps state for the whole of its process.
-[[noreturn]] inline void RunInChild(const std::vector<std::string> &arguments, int output,
-                                    int systemLog, int logLevel) {
+[[noreturn]] inline void RunInChild(const Arguments &arguments, int output, int systemLog,
+                                    int logLevel) {
     dup2(output, STDOUT_FILENO);
     LogToSyslog = 1;
     LogLevel = 1;
     ProgramName = nullptr;
     SyslogRecords().clear();
-    std::vector<std::string> words = arguments;
+    Arguments words = arguments;
     words.insert(words.begin(), "/usr/bin/tool");
     std::vector<char *> argv;
     for (std::string &word : words) {
@@ -65,7 +73,7 @@ protected:
         FakeCommands::bitmapSize = 0;
     }
 
-    static Outcome Tool(const std::vector<std::string> &arguments) {
+    static Outcome Tool(const Arguments &arguments) {
         const int output = memfd_create("output", 0);
         const int systemLog = memfd_create("system-log", 0);
         const int logLevel = memfd_create("log-level", 0);
@@ -88,7 +96,7 @@ protected:
     }
 
     // Runs the command with --stdout and with operations that give this result.
-    static Outcome ToolWith(int result, std::vector<std::string> arguments) {
+    static Outcome ToolWith(int result, Arguments arguments) {
         FakeCommands::result = result;
         arguments.insert(arguments.begin(), "--stdout");
         return Tool(arguments);

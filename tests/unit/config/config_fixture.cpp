@@ -12,7 +12,6 @@
 #include <sstream>
 #include <sys/stat.h>
 #include <thread>
-#include <unistd.h>
 
 namespace {
 
@@ -95,16 +94,4 @@ std::string ConfigTest::CreateFile(const std::string &relativePath) const {
     struct stat status {};
     EXPECT_EQ(stat(path.c_str(), &status), 0);
     return std::to_string(static_cast<uint32_t>(status.st_ino));
-}
-
-OrdinaryUser::OrdinaryUser() {
-    if (geteuid() == 0) {
-        EXPECT_EQ(seteuid(65534), 0);
-    }
-}
-
-OrdinaryUser::~OrdinaryUser() {
-    if (getuid() == 0) {
-        EXPECT_EQ(seteuid(0), 0);
-    }
 }

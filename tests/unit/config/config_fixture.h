@@ -3,6 +3,7 @@
 #ifndef TESTS_CONFIG_CONFIG_FIXTURE_H
 #define TESTS_CONFIG_CONFIG_FIXTURE_H
 
+#include "config/ordinary_user.h"
 #include "support/captured_log.h"
 #include "support/fake_appliance.h"
 #include "support/fake_libc.h"
@@ -44,15 +45,6 @@ protected:
     const TempDir folder_;
     const std::string path_ = folder_.Path("conf.json");
     const std::string volume_ = folder_.Path("volume1"); // a folder
-};
-
-// Takes root's power over file modes away for the length of a scope.
-class OrdinaryUser {
-public:
-    OrdinaryUser();
-    ~OrdinaryUser();
-    OrdinaryUser(const OrdinaryUser &) = delete;
-    OrdinaryUser &operator=(const OrdinaryUser &) = delete;
 };
 
 // Two pins on /volume1 (0 is done, 1 is queued) and a reload request.

@@ -121,6 +121,27 @@ TEST_F(FileReplaceFailureTest, NewFileThatCannotBeRenamedIsWrittenInPlaceOrNotAt
     EXPECT_EQ(Names(), (std::vector<std::string>{"file", "new"}));
 }
 
+TEST_F(FileReplaceFailureTest, GivesUpWhereEveryTemporaryNameIsTaken) {
+    const std::string prefix = folder.Path(".veskcachepinfile." + std::to_string(getpid()) + ".");
+    for (int i = 0; i < 500; ++i) {
+        WriteWhole(prefix + std::to_string(i) + ".tmp", "left");
+    }
+    EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::NotWritten);
+    EXPECT_EQ(ReadWhole(path), old);
+    EXPECT_EQ(FileReplaceContent(folder.Path("new").c_str(), fresh), FileReplaceResult::CannotOpen);
+    EXPECT_EQ(Names().size(), 501U);
+}
+
+TEST_F(FileReplaceFailureTest, FileThatHasNoNameAnyMoreIsWrittenInPlace) {
+    const int file = open(path.c_str(), O_RDWR);
+    ASSERT_EQ(unlink(path.c_str()), 0);
+    const std::string byNumber = "/proc/self/fd/" + std::to_string(file);
+    EXPECT_EQ(FileReplaceContent(byNumber.c_str(), fresh), FileReplaceResult::Done);
+    EXPECT_EQ(ReadWhole(byNumber), fresh);
+    close(file);
+    EXPECT_TRUE(Names().empty());
+}
+
 TEST_F(FileReplaceFailureTest, PathsThatCannotBeFilesAreNotOpened) {
     const std::string loop = folder.Path("loop");
     ASSERT_EQ(symlink("loop", loop.c_str()), 0);
@@ -163,10 +184,15 @@ TEST_F(FileReplaceFailureTest, FifoWithAReaderTakesWhatItHoldsAndDoesNotBlock) {
 }
 
 TEST_F(FileReplaceFailureTest, DevicesAreWrittenAndNotReplaced) {
-    EXPECT_EQ(FileReplaceContent("/dev/null", fresh), FileReplaceResult::Done);
-    EXPECT_EQ(FileReplaceContent("/dev/full", fresh), FileReplaceResult::NotWritten);
-    EXPECT_TRUE(S_ISCHR(Status("/dev/null").st_mode));
-    EXPECT_TRUE(S_ISCHR(Status("/dev/full").st_mode));
+    SKIP_WITHOUT_PRIVATE_MOUNTS();
+    const std::string null = folder.Path("null");
+    const std::string full = folder.Path("full");
+    ASSERT_TRUE(MakeCharacterDevice(null, 1, 3));
+    ASSERT_TRUE(MakeCharacterDevice(full, 1, 7));
+    EXPECT_EQ(FileReplaceContent(null.c_str(), fresh), FileReplaceResult::Done);
+    EXPECT_EQ(FileReplaceContent(full.c_str(), fresh), FileReplaceResult::NotWritten);
+    EXPECT_TRUE(S_ISCHR(Status(null).st_mode));
+    EXPECT_TRUE(S_ISCHR(Status(full).st_mode));
 }
 
 TEST_F(FileReplaceFailureTest, ReadOnlyFolderOfAnotherUserIsFollowedByWritingInPlace) {

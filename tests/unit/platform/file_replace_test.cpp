@@ -36,7 +36,7 @@ TEST_F(FileReplaceTest, SyncsTheFileBeforeItsRenameAndTheFolderAfterIt) {
 
 TEST_F(FileReplaceTest, KeepsTheMode) {
     umask(077);
-    for (const mode_t mode : {0600U, 0640U, 0666U, 0755U, 04755U}) {
+    for (const mode_t mode : {0600U, 0640U, 0666U, 0755U, 01640U}) {
         ASSERT_EQ(chmod(path.c_str(), mode), 0);
         EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::Done);
         EXPECT_EQ(Status(path).st_mode & 07777, mode);

@@ -2,6 +2,7 @@
 
 #include "support/captured_log.h"
 #include "support/leak_checked_test.h"
+#include "support/private_mounts.h"
 #include "support/temp_dir.h"
 
 #include <gtest/gtest.h>
@@ -60,9 +61,11 @@ TEST_F(FileTextTest, WriteFailsWhereTheFileCannotBeOpened) {
 }
 
 TEST_F(FileTextTest, WriteFailsOnAFullDisk) {
+    SKIP_WITHOUT_PRIVATE_MOUNTS();
+    ASSERT_TRUE(MakeCharacterDevice(path, 1, 7));
     for (const size_t length : {1U, 100000U}) { // found out when closing, when writing
         CapturedLog log;
-        EXPECT_EQ(FileWriteString("/dev/full", std::string(length, 'x').c_str()), -1);
+        EXPECT_EQ(FileWriteString(path.c_str(), std::string(length, 'x').c_str()), -1);
         EXPECT_EQ(log.Text(), "tool: Write error\n");
     }
 }

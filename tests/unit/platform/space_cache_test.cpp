@@ -233,3 +233,15 @@ TEST_F(SpaceCacheTest, PathThatIsNoVolumeIsAnErrorAndHasNoPinSupport) {
     EXPECT_EQ(log.Messages().back(), "SpaceHasCacheAndSupportPin() [N] : ***** Can't get space "
                                      "uuid from mount path (/home)");
 }
+
+TEST_F(SpaceCacheTest, CacheThatVanishesWhileItIsAskedForIsAnErrorAndHasNoPinSupport) {
+    int lookups = 0;
+    FakeAppliance::onConfigLookup = [&lookups] {
+        if (++lookups == 2) {
+            FakeAppliance::caches.clear();
+        }
+    };
+    CapturedLog log;
+    EXPECT_EQ(SpaceHasCacheAndSupportPinByUUID("uuid-1"), 0);
+    EXPECT_EQ(log.Text(), "tool: Can't get cache's ssd path\n");
+}

@@ -4,6 +4,7 @@
 
 #include <cerrno>
 #include <cstddef>
+#include <stdexcept>
 #include <sys/ipc.h>
 #include <sys/msg.h>
 
@@ -215,23 +216,18 @@ TEST_F(MessageQueueTest, AKeyFileThatCannotBeReadGivesNoKey) {
         Messages{"GetMsgKey() [N] : ***** Can't get message key from file (" + keyFile_ + ")"});
 }
 
-using MessageQueueDeathTest = MessageQueueTest;
-
-TEST_F(MessageQueueDeathTest, AKeyFileWithoutANumberEndsTheProcess) {
-    for (const char *text : {"abc", "\n12", "99999999999", "x1"}) {
+TEST_F(MessageQueueTest, AKeyFileWithoutANumberThrows) {
+    int key = 0;
+    for (const char *text : {"abc", "\n12", "x1", "-", " "}) {
         WriteWhole(keyFile_, text);
-        EXPECT_EXIT(
-            {
-                int key = 0;
-                GetMsgKey(&key, KeyFile());
-            },
-            ::testing::KilledBySignal(SIGABRT), "")
-            << text;
+        EXPECT_THROW(GetMsgKey(&key, KeyFile()), std::invalid_argument) << text;
     }
+    WriteWhole(keyFile_, "2147483648");
+    EXPECT_THROW(GetMsgKey(&key, KeyFile()), std::out_of_range);
 }
 
-TEST_F(MessageQueueDeathTest, AKeyFileWithoutANumberEndsWhoeverWantsTheQueue) {
+TEST_F(MessageQueueTest, NothingOnTheWayCatchesWhatAKeyFileWithoutANumberThrows) {
     MsgQueueGet(KeyFile());
     WriteWhole(keyFile_, "abc");
-    EXPECT_EXIT(MsgQueueGet(KeyFile()), ::testing::KilledBySignal(SIGABRT), "");
+    EXPECT_THROW(MsgQueueGet(KeyFile()), std::invalid_argument);
 }

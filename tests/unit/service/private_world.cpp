@@ -1,5 +1,7 @@
 #include "service/private_world.h"
 
+#include "support/temp_dir.h"
+
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
@@ -43,6 +45,9 @@ std::string EnterPrivateWorld() {
         mount("tmpfs", run, "tmpfs", 0, "mode=755") < 0) {
         return Because("no private /var/run");
     }
+    // Raising the limit of these queues alone needs no further right; where it is not to be had,
+    // the right to exceed it may be.
+    WriteWhole("/proc/sys/kernel/msgmnb", std::to_string(messageQueueBytes));
     return LargeQueuesAllowed() ? "" : Because("no message queue of 1024 requests");
 }
 

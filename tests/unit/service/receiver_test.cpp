@@ -8,6 +8,7 @@
 
 #include <cerrno>
 #include <climits>
+#include <csignal>
 #include <filesystem>
 #include <json/reader.h>
 #include <pthread.h>
@@ -322,4 +323,11 @@ TEST_F(ReceiverTest, ItCreatesQueueAndKeyFileWhenItComesFirst) {
     EXPECT_TRUE(PutMessage(MsgQueueGet(messageKeyFile), 1, ""));
     pthread_join(thread, nullptr);
     EXPECT_EQ(CountQueues(), 1);
+}
+
+using ReceiverDeathTest = ReceiverTest;
+
+TEST_F(ReceiverDeathTest, AKeyFileWithoutANumberEndsTheProcess) {
+    WriteWhole(messageKeyFile, "abc");
+    EXPECT_EXIT(RunReceiver(), ::testing::KilledBySignal(SIGABRT), "invalid_argument");
 }

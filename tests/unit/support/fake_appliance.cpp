@@ -11,6 +11,7 @@ std::vector<FakeSpace> FakeAppliance::spaces;
 std::vector<FakeCache> FakeAppliance::caches;
 int FakeAppliance::enumResult = 0;
 int FakeAppliance::configResult = 1;
+std::function<void()> FakeAppliance::onConfigLookup;
 int FakeAppliance::enumScope = 0;
 int FakeAppliance::devicePathResult = 0;
 std::string FakeAppliance::devicePath = "/dev/space1";
@@ -28,6 +29,7 @@ void FakeAppliance::Reset() {
     caches.clear();
     enumResult = 0;
     configResult = 1;
+    onConfigLookup = nullptr;
     enumScope = 0;
     devicePathResult = 0;
     devicePath = "/dev/space1";
@@ -140,6 +142,9 @@ char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
 
 int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,
                                VESKFlashCacheConfig **config) {
+    if (FakeAppliance::onConfigLookup) {
+        FakeAppliance::onConfigLookup();
+    }
     const VESKFlashCacheConfigQuery expected{2, 0, 0, query->spaceUuid, 0, 0};
     if (FakeAppliance::configResult == -1 || query->kind != expected.kind ||
         query->reserved1 != 0 || query->reserved2 != 0 || query->reserved4 != 0 ||

@@ -36,6 +36,9 @@ struct FakeAppliance {
     static int configResult; // of VESKFlashCacheConfigTmpGet when a cache is found; -1: error
     static int enumScope;    // what the last enumeration was asked for
 
+    // Called before a cache configuration is looked up.
+    static std::function<void()> onConfigLookup;
+
     static int devicePathResult;   // of FileSystemDevice::GetDevicePath
     static std::string devicePath; // what it gives
     static std::string askedPath;  // what it was last asked for

@@ -1,9 +1,12 @@
 #include "support/private_mounts.h"
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
 #include <sched.h>
 #include <sys/mount.h>
+#include <sys/stat.h>
+#include <sys/sysmacros.h>
 #include <unistd.h>
 #include <utility>
 
@@ -22,6 +25,7 @@ std::string EnterPrivateMounts() {
         mount("tmpfs", "/tmp", "tmpfs", 0, "mode=1777") < 0) {
         return std::string("no private /tmp: ") + strerror(errno);
     }
+    setenv("TMPDIR", "/tmp", 1); // also where the caller keeps temporary files elsewhere
     return "";
 }
 
@@ -46,6 +50,10 @@ bool UsePrivateMounts() {
 
 const std::string &PrivateMountsMissing() {
     return missing;
+}
+
+bool MakeCharacterDevice(const std::string &path, unsigned major, unsigned minor) {
+    return mknod(path.c_str(), S_IFCHR | 0600, makedev(major, minor)) == 0;
 }
 
 ScopedMount::ScopedMount(std::string target, bool mounted)

@@ -21,6 +21,11 @@ const std::string &PrivateMountsMissing();
     }                                                                                              \
     static_assert(true, "a semicolon follows")
 
+// Makes a node of a character device, for instance 1, 3 (null) or 1, 7 (full), at `path`. Tests
+// write to such nodes in the private view, never to the machine's: code that went astray could
+// replace them. False on failure.
+bool MakeCharacterDevice(const std::string &path, unsigned major, unsigned minor);
+
 // Something mounted for the length of a scope. Only in the private view.
 class ScopedMount {
 public:

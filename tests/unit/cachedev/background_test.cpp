@@ -1,0 +1,59 @@
+#include "cachedev/background.h"
+
+#include <gtest/gtest.h>
+
+#include <fcntl.h>
+#include <functional>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace {
+
+// Runs `daemon` in the background of a process of its own; the exit status of that process.
+int StatusOf(const std::function<void(Background &)> &daemon) {
+    const pid_t child = fork();
+    if (child == 0) {
+        Background background;
+        if (BackgroundStart(background) != 0)
+            _exit(99);
+        daemon(background);
+        _exit(0);
+    }
+    int status = 0;
+    EXPECT_EQ(waitpid(child, &status, 0), child);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+} // namespace
+
+TEST(BackgroundTest, TheCommandEndsWellOnceTheDaemonIsReady) {
+    int ends[2];
+    ASSERT_EQ(pipe(ends), 0);
+    EXPECT_EQ(StatusOf([&ends](Background &background) {
+                  BackgroundReady(background);
+                  // Still there after the parent's end, in a session of its own, and at "/".
+                  char folder[8] = {};
+                  const bool away = getsid(0) == getpid() && getcwd(folder, sizeof folder) &&
+                                    folder[0] == '/' && folder[1] == '\0';
+                  usleep(50000);
+                  const ssize_t written = write(ends[1], away ? "y" : "n", 1);
+                  static_cast<void>(written);
+              }),
+              0);
+    char answer = 0;
+    ASSERT_EQ(read(ends[0], &answer, 1), 1);
+    EXPECT_EQ(answer, 'y');
+    close(ends[0]);
+    close(ends[1]);
+}
+
+TEST(BackgroundTest, TheCommandFailsWhenTheDaemonEndsBefore) {
+    EXPECT_EQ(StatusOf([](Background &) { _exit(0); }), 1);
+    EXPECT_EQ(StatusOf([](Background &) { raise(SIGKILL); }), 1);
+}
+
+TEST(BackgroundTest, WithoutAParentNothingHappens) {
+    Background background;
+    BackgroundReady(background);
+    EXPECT_EQ(background.readyFd, -1);
+}

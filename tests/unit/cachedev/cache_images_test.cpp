@@ -1,0 +1,135 @@
+#include "cachedev/cache_images.h"
+
+#include "test_device.h"
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <filesystem>
+
+namespace {
+
+struct CacheImagesTest : testing::Test {
+    TestFolder folder;
+    CacheImages images;
+    std::string error;
+
+    std::string Path(const char *name) const { return folder.path + "/" + name; }
+    int Open() { return CacheImagesOpen(Path("backing"), Path("ssd"), images, error); }
+    bool ErrorHas(const char *text) const { return error.find(text) != std::string::npos; }
+};
+
+ImagePieces Piece(std::string &bytes) {
+    ImagePieces pieces;
+    ImagePiecesAdd(pieces, bytes.data(), bytes.size());
+    return pieces;
+}
+
+} // namespace
+
+TEST_F(CacheImagesTest, SizesAreTaken) {
+    TestMakeFile(Path("backing"), 512 * 131);
+    TestMakeFile(Path("ssd"), 3 * kBlockBytes - 1);
+    ASSERT_EQ(Open(), 0) << error;
+    EXPECT_EQ(images.deviceBytes, 512U * 131U);
+    EXPECT_EQ(images.slots, 2U);
+}
+
+TEST_F(CacheImagesTest, RefusesWhatCannotBeServed) {
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    EXPECT_EQ(Open(), -1);
+    EXPECT_TRUE(ErrorHas("backing")) << error;
+    EXPECT_TRUE(ErrorHas("No such file")) << error;
+    for (const uint64_t bytes : {0U, 511U, 513U}) {
+        TestMakeFile(Path("backing"), bytes);
+        CacheImages fresh;
+        EXPECT_EQ(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error), -1) << bytes;
+        EXPECT_TRUE(ErrorHas("512")) << error;
+    }
+}
+
+TEST_F(CacheImagesTest, RefusesAnSsdSmallerThanOneBlock) {
+    TestMakeFile(Path("backing"), 512);
+    TestMakeFile(Path("ssd"), kBlockBytes - 1);
+    EXPECT_EQ(Open(), -1);
+    EXPECT_TRUE(ErrorHas("smaller than one cache block")) << error;
+}
+
+TEST_F(CacheImagesTest, RefusesFoldersAndTheSameFileTwice) {
+    TestMakeFile(Path("backing"), 512);
+    std::filesystem::create_directory(Path("ssd"));
+    EXPECT_EQ(Open(), -1);
+    std::filesystem::remove(Path("ssd"));
+    TestMakeFile(Path("backing"), kBlockBytes);
+    std::filesystem::create_hard_link(Path("backing"), Path("ssd"));
+    CacheImages fresh;
+    EXPECT_EQ(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error), -1);
+    EXPECT_TRUE(ErrorHas("same file")) << error;
+}
+
+TEST_F(CacheImagesTest, ImagesBelongToOneDeviceAtATime) {
+    TestMakeFile(Path("backing"), 512);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    TestMakeFile(Path("other"), kBlockBytes);
+    ASSERT_EQ(Open(), 0) << error;
+    CacheImages second;
+    EXPECT_EQ(CacheImagesOpen(Path("other"), Path("ssd"), second, error), -1);
+    EXPECT_TRUE(ErrorHas("in use")) << error;
+}
+
+TEST_F(CacheImagesTest, TransfersGatherAndScatter) {
+    TestMakeFile(Path("backing"), 4096);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    ASSERT_EQ(Open(), 0) << error;
+    std::string one = "one";
+    std::string none;
+    std::string two = "second";
+    ImagePieces pieces;
+    for (std::string *part : {&none, &one, &none, &two, &none})
+        ImagePiecesAdd(pieces, part->data(), part->size());
+    ASSERT_EQ(CacheImagesWriteBacking(images, 100, pieces), 0);
+    EXPECT_EQ(TestReadFile(Path("backing")).substr(99, 11), std::string("\0onesecond\0", 11));
+    std::string all(9, ' ');
+    ASSERT_EQ(CacheImagesReadBacking(images, 100, Piece(all)), 0);
+    EXPECT_EQ(all, "onesecond");
+    one = two = "";
+    one.resize(2);
+    two.resize(4);
+    pieces = Piece(one);
+    ImagePiecesAdd(pieces, two.data(), two.size());
+    ASSERT_EQ(CacheImagesReadBacking(images, 103, pieces), 0);
+    EXPECT_EQ(one + two, "second");
+}
+
+TEST_F(CacheImagesTest, AnImageThatEndsTooEarlyIsAnError) {
+    TestMakeFile(Path("backing"), 4096);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    ASSERT_EQ(Open(), 0) << error;
+    std::string bytes(1024, ' ');
+    EXPECT_EQ(CacheImagesReadBacking(images, 4096 - 512, Piece(bytes)), -EIO);
+    EXPECT_EQ(CacheImagesReadSsd(images, kBlockBytes - 1023, Piece(bytes)), -EIO);
+    EXPECT_EQ(CacheImagesReadSsd(images, kBlockBytes - 1024, Piece(bytes)), 0);
+}
+
+TEST_F(CacheImagesTest, SlotsAreMappedAndSystemCallsFailOnLostOnes) {
+    TestMakeFile(Path("backing"), kBlockBytes);
+    TestMakeFile(Path("ssd"), 2 * kBlockBytes);
+    ASSERT_EQ(Open(), 0) << error;
+    std::string text = "in slot 1";
+    ASSERT_EQ(CacheImagesWriteBacking(images, 0, Piece(text)), 0);
+    ImagePieces slot;
+    ImagePiecesAdd(slot, CacheImagesSlotAddress(images, 1, 5), text.size());
+    ASSERT_EQ(CacheImagesReadBacking(images, 0, slot), 0);
+    EXPECT_EQ(TestReadFile(Path("ssd")).substr(kBlockBytes + 5, text.size()), text);
+    // Cut short: an error result, not a signal.
+    std::filesystem::resize_file(Path("ssd"), 0);
+    EXPECT_EQ(CacheImagesReadBacking(images, 0, slot), -EFAULT);
+}
+
+TEST_F(CacheImagesTest, SyncsSucceed) {
+    TestMakeFile(Path("backing"), 512);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    ASSERT_EQ(Open(), 0) << error;
+    EXPECT_EQ(CacheImagesSyncBacking(images), 0);
+    EXPECT_EQ(CacheImagesSyncAll(images), 0);
+}

@@ -1,0 +1,103 @@
+#include "cachedev/caller_memory.h"
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+#include <sys/mman.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace {
+
+const Caller kSelf = {getpid(), sizeof(void *) == 4};
+
+uint64_t AddressOf(const void *memory) {
+    return reinterpret_cast<uintptr_t>(memory);
+}
+
+} // namespace
+
+TEST(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
+    // The child has the same layout and its own copy of this variable.
+    static volatile int value = 1;
+    const pid_t child = fork();
+    if (child == 0) {
+        value = 42;
+        while (value == 42)
+            usleep(1000);
+        _exit(value);
+    }
+    const Caller caller = {child, sizeof(void *) == 4};
+    const uint64_t address = reinterpret_cast<uintptr_t>(&value);
+    int seen = 0;
+    for (int i = 0; i < 5000 && seen != 42; ++i) {
+        ASSERT_EQ(CallerRead(caller, address, &seen, sizeof seen), 0);
+        usleep(1000);
+    }
+    EXPECT_EQ(seen, 42);
+    const int written = 7;
+    EXPECT_EQ(CallerWrite(caller, address, &written, sizeof written), 0);
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_EQ(WEXITSTATUS(status), 7);
+    EXPECT_EQ(value, 1);
+    // It is gone now.
+    EXPECT_EQ(CallerRead(caller, address, &seen, sizeof seen), -EFAULT);
+    EXPECT_EQ(CallerWrite(caller, address, &written, sizeof written), -EFAULT);
+}
+
+TEST(CallerMemoryTest, MemoryThatIsNotThereIsRefused) {
+    char byte = 0;
+    EXPECT_EQ(CallerRead(kSelf, 0, &byte, 1), -EFAULT);
+    EXPECT_EQ(CallerRead(kSelf, 16, &byte, 1), -EFAULT);
+    EXPECT_EQ(CallerRead(kSelf, UINT64_MAX, &byte, 1), -EFAULT);
+    EXPECT_EQ(CallerWrite(kSelf, 16, &byte, 1), -EFAULT);
+    EXPECT_EQ(CallerRead({0, false}, AddressOf(&byte), &byte, 1), -EFAULT);
+    EXPECT_EQ(CallerRead({-1, false}, AddressOf(&byte), &byte, 1), -EFAULT);
+}
+
+TEST(CallerMemoryTest, NothingToReadNeedsNoMemory) {
+    EXPECT_EQ(CallerRead(kSelf, 0, nullptr, 0), 0);
+    EXPECT_EQ(CallerWrite(kSelf, 16, nullptr, 0), 0);
+}
+
+TEST(CallerMemoryTest, MemoryThatEndsTooEarlyIsRefused) {
+    const auto page = static_cast<size_t>(sysconf(_SC_PAGESIZE));
+    void *const pages =
+        mmap(nullptr, 2 * page, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+    ASSERT_NE(pages, MAP_FAILED);
+    ASSERT_EQ(munmap(static_cast<char *>(pages) + page, page), 0);
+    char buffer[32] = {};
+    const uint64_t end = AddressOf(pages) + page;
+    EXPECT_EQ(CallerRead(kSelf, end - sizeof buffer, buffer, sizeof buffer), 0);
+    EXPECT_EQ(CallerRead(kSelf, end - sizeof buffer + 1, buffer, sizeof buffer), -EFAULT);
+    EXPECT_EQ(CallerWrite(kSelf, end - 1, buffer, 2), -EFAULT);
+    munmap(pages, page);
+}
+
+TEST(DescriptorDecodeTest, The64BitForm) {
+    unsigned char bytes[kDescriptorBytes64];
+    memset(bytes, 0xEE, sizeof bytes); // the padding is not looked at
+    const uint64_t address = 0x0123456789ABCDEFULL;
+    const uint32_t length = 0x89ABCDEF;
+    memcpy(bytes, &address, sizeof address);
+    memcpy(bytes + 8, &length, sizeof length);
+    EXPECT_EQ(DescriptorBytes(false), sizeof bytes);
+    const BitmapDescriptor descriptor = DescriptorDecode(bytes, false);
+    EXPECT_EQ(descriptor.address, address);
+    EXPECT_EQ(descriptor.length, length);
+}
+
+TEST(DescriptorDecodeTest, The32BitForm) {
+    unsigned char bytes[kDescriptorBytes32];
+    const uint32_t address = 0xF1234567; // its top bit is not a sign
+    const uint32_t length = 0x00012345;
+    memcpy(bytes, &address, sizeof address);
+    memcpy(bytes + 4, &length, sizeof length);
+    EXPECT_EQ(DescriptorBytes(true), sizeof bytes);
+    const BitmapDescriptor descriptor = DescriptorDecode(bytes, true);
+    EXPECT_EQ(descriptor.address, 0xF1234567U);
+    EXPECT_EQ(descriptor.length, length);
+}

@@ -1,0 +1,160 @@
+#include "commands/bitmap_development.h"
+
+#include "commands/commands_fixture.h"
+
+#include <cerrno>
+
+class BitmapDevelopmentTest : public CommandsTest {};
+
+TEST_F(BitmapDevelopmentTest, SettingARangeWritesTheFileThenSendsTheBitmap) {
+    CapturedLog log;
+    EXPECT_EQ(SetBitmap(Volume(), 127, 2), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_EQ(device_->events, Events{"bitmap 0300 file 0300"}); // and nothing is read
+}
+
+TEST_F(BitmapDevelopmentTest, SettingWhatIsSetWritesAndSendsAgain) {
+    WriteWhole(bitmapFile_, std::string("\x03\x00", 2));
+    FakeLibc::Count("write");
+    EXPECT_EQ(SetBitmap(Volume(), 0, 256), 0);
+    EXPECT_EQ(FakeLibc::Calls("write"), 1);
+    EXPECT_EQ(device_->events, Events{"bitmap 0300 file 0300"});
+}
+
+TEST_F(BitmapDevelopmentTest, ClearingARangeKeepsTheOthers) {
+    WriteWhole(bitmapFile_, "\xff\xff");
+    CapturedLog log;
+    EXPECT_EQ(UnsetBitmap(Volume(), 128, 1024), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_EQ(device_->events, Events{"bitmap 01fe file 01fe"});
+}
+
+TEST_F(BitmapDevelopmentTest, AGrownVolumesBitmapIsWrittenWhole) {
+    WriteWhole(bitmapFile_, "\x80");
+    EXPECT_EQ(UnsetBitmap(Volume(), 0, 128), 0);
+    EXPECT_EQ(device_->events, Events{"bitmap 8000 file 8000"});
+}
+
+TEST_F(BitmapDevelopmentTest, ARangePastTheEndChangesNothing) {
+    EXPECT_EQ(SetBitmap(Volume(), 16 * 128, 128), 0);
+    EXPECT_EQ(device_->events, Events{"bitmap 0000 file 0000"});
+}
+
+TEST_F(BitmapDevelopmentTest, AnUnknownOperationWritesAndSendsNothing) {
+    WriteWhole(bitmapFile_, "\xff\xff");
+    for (const int op : {2, -1}) {
+        CapturedLog log(2);
+        EXPECT_EQ(ModifyBitmap(Volume(), 0, 128, op), -1);
+        EXPECT_EQ(MessagesOf(log, "ModifyBitmap"),
+                  Messages{"ModifyBitmap() [N] : ***** Unknown bitmap op = " + std::to_string(op)});
+    }
+    EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "ffff");
+    EXPECT_EQ(device_->events, Events{});
+}
+
+TEST_F(BitmapDevelopmentTest, ModifyTakes1AsSetAnd0AsClear) {
+    EXPECT_EQ(ModifyBitmap(Volume(), 0, 256, 1), 0);
+    EXPECT_EQ(ModifyBitmap(Volume(), 0, 128, 0), 0);
+    EXPECT_EQ(device_->events, (Events{"bitmap 0300 file 0300", "bitmap 0200 file 0200"}));
+}
+
+TEST_F(BitmapDevelopmentTest, WithoutTheSpaceItFails) {
+    FakeAppliance::spaces.clear();
+    CapturedLog log;
+    EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(UnsetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(log.Messages(),
+              (Messages{
+                  "Can't get space uuid", "Set bitmap failed", "Can't get space uuid",
+                  "Set bitmap failed", // the clearing command says so too
+              }));
+}
+
+TEST_F(BitmapDevelopmentTest, FailuresNameTheirFunctions) {
+    FakeAppliance::caches.clear();
+    CapturedLog log(2);
+    EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(UnsetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(MessagesOf(log, "ModifyBitmap"),
+              Messages(2, "ModifyBitmap() [N] : ***** Can't get cache path"));
+    EXPECT_EQ(MessagesOf(log, "SetBitmap"), Messages{"SetBitmap() [N] : ***** Set bitmap failed"});
+    EXPECT_EQ(MessagesOf(log, "UnsetBitmap"),
+              Messages{"UnsetBitmap() [N] : ***** Set bitmap failed"});
+}
+
+TEST_F(BitmapDevelopmentTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
+    WriteWhole(bitmapFile_, "abc");
+    CapturedLog log;
+    EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Incorrect bitmap size (2), file size (3)",
+                                  "Allocate bitmap failed",
+                                  "Set bitmap failed",
+                              }));
+    EXPECT_EQ(ReadWhole(bitmapFile_), "abc");
+}
+
+TEST_F(BitmapDevelopmentTest, ADeviceWithoutASizeFails) {
+    FakeAppliance::caches[0].cachePath = "/missing/device";
+    CapturedLog log;
+    EXPECT_EQ(ModifyBitmap(Volume(), 0, 128, 1), -1);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Can't open device (/missing/device)",
+                                  "Can't get block device path",
+                                  "Can't get needed bitmap sizeof",
+                                  "Allocate bitmap failed",
+                                  "Warning: data is NULL for free",
+                              }));
+}
+
+TEST_F(BitmapDevelopmentTest, ABitmapThatCannotBeWrittenIsNotSent) {
+    FakeLibc::Fail("write", ENOSPC);
+    CapturedLog log;
+    EXPECT_EQ(UnsetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Write bitmap file (" + bitmapFile_ + ") error",
+                                  "",
+                                  "Write bitmap failed",
+                                  "Set bitmap failed",
+                              }));
+    EXPECT_EQ(device_->events, Events{});
+}
+
+TEST_F(BitmapDevelopmentTest, ADriverThatRefusesLeavesTheFileChanged) {
+    device_->failingRequest = 0xFECF;
+    CapturedLog log(2);
+    EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(MessagesOf(log, "ModifyBitmap"),
+              Messages{"ModifyBitmap() [N] : ***** Can't send bitmap to driver"});
+    EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "0100");
+}
+
+TEST_F(BitmapDevelopmentTest, TheBitmapSizeIsThatOfTheCacheDevice) {
+    CapturedLog log;
+    uint64_t size = 0;
+    EXPECT_EQ(GetBitmapSizeByte(Volume(), &size), 0);
+    EXPECT_EQ(size, 2U);
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(BitmapDevelopmentTest, TheBitmapSizeNeedsACache) {
+    FakeAppliance::caches.clear();
+    uint64_t size = 0;
+    CapturedLog log(2);
+    EXPECT_EQ(GetBitmapSizeByte(Volume(), &size), -1);
+    EXPECT_EQ(MessagesOf(log, "GetBitmapSizeByte"),
+              Messages{"GetBitmapSizeByte() [N] : ***** Get cache path from mount path (" +
+                       volume_ + ") failed"});
+}
+
+TEST_F(BitmapDevelopmentTest, TheBitmapSizeNeedsTheDevice) {
+    FakeAppliance::caches[0].cachePath = "/missing/device";
+    uint64_t size = 0;
+    CapturedLog log;
+    EXPECT_EQ(GetBitmapSizeByte(Volume(), &size), -1);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Can't open device (/missing/device)",
+                                  "Can't get block device path",
+                                  "Get bitmap size for cache (/missing/device) failed",
+                              }));
+}

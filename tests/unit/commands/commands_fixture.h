@@ -1,0 +1,35 @@
+// What the command tests share: one volume with its cache device and its bitmap file.
+#ifndef TESTS_COMMANDS_COMMANDS_FIXTURE_H
+#define TESTS_COMMANDS_COMMANDS_FIXTURE_H
+
+#include "support/captured_log.h"
+#include "support/fake_appliance.h"
+#include "support/fake_libc.h"
+#include "support/leak_checked_test.h"
+#include "support/messages_of.h"
+#include "support/temp_dir.h"
+#include "warming/fake_cache_device.h"
+
+#include <filesystem>
+#include <gtest/gtest.h>
+#include <memory>
+
+using Events = std::vector<std::string>;
+
+class CommandsTest : public LeakCheckedTest {
+protected:
+    void SetUp() override {
+        LeakCheckedTest::SetUp();
+        std::filesystem::create_directory(volume_);
+        device_ = std::make_unique<FakeCacheDevice>(1 << 20); // 16 blocks, 2 bytes of bitmap
+        device_->bitmapFile = bitmapFile_;
+        FakeApplianceOneVolume(device_->Path(), volume_);
+    }
+    const char *Volume() const { return volume_.c_str(); }
+    const TempDir folder_;
+    const std::string volume_ = folder_.Path("volume1");
+    const std::string bitmapFile_ = volume_ + "/veskcachepinfile.bitmap";
+    std::unique_ptr<FakeCacheDevice> device_;
+};
+
+#endif

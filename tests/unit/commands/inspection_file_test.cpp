@@ -1,0 +1,118 @@
+// Whether one file is pinned.
+#include "commands/inspection.h"
+
+#include "commands/commands_fixture.h"
+
+#include <sys/stat.h>
+
+class InspectionFileTest : public CommandsTest {
+protected:
+    void SetUp() override {
+        CommandsTest::SetUp();
+        WriteWhole(file_, "x");
+    }
+    std::string Inode() const {
+        struct stat status {};
+        EXPECT_EQ(stat(file_.c_str(), &status), 0);
+        return std::to_string(static_cast<uint32_t>(status.st_ino));
+    }
+    // Records files of the file's top directory: a JSON object.
+    void StoreFiles(const std::string &files) const {
+        WriteWhole(config_, R"({"volumes" : {")" + topDir_ + R"(" : {"files" : )" + files + "}}}");
+    }
+    int Check() const { return CheckFileIsPin(config_.c_str(), file_.c_str()); }
+    const std::string config_ = folder_.Path("conf.json");
+    const std::string file_ = folder_.Path("file");
+    const std::string topDir_ = file_.substr(0, file_.find('/', 1));
+};
+
+TEST_F(InspectionFileTest, ARecordedInodeIsPinned) {
+    StoreFiles("{\"" + Inode() + "\" : \"any/path\"}");
+    CapturedLog log;
+    EXPECT_EQ(Check(), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(InspectionFileTest, TheTopDirectoryIsLoggedAtLevel2) {
+    StoreFiles("{}");
+    CapturedLog log(2);
+    EXPECT_EQ(Check(), 1);
+    EXPECT_EQ(MessagesOf(log, "CheckFileIsPin"),
+              Messages{"CheckFileIsPin() [N]: Mount path = " + topDir_});
+}
+
+TEST_F(InspectionFileTest, OtherInodesAreNotPinned) {
+    CapturedLog log;
+    for (const std::string &files :
+         {std::string("{}"), std::string("null"), "{\"" + Inode() + "0\" : \"file\"}",
+          "{\"0" + Inode() + "\" : \"file\"}"}) {
+        StoreFiles(files);
+        EXPECT_EQ(Check(), 1) << files;
+    }
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(InspectionFileTest, AReplacedFileIsNotPinned) {
+    StoreFiles("{\"" + Inode() + "\" : \"file\"}");
+    WriteWhole(folder_.Path("new"), "y"); // while the old inode is still in use
+    std::filesystem::rename(folder_.Path("new"), file_);
+    EXPECT_EQ(Check(), 1);
+}
+
+TEST_F(InspectionFileTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
+    std::filesystem::remove(file_);
+    CapturedLog log;
+    for (const std::string &text :
+         {std::string("{}"), std::string("null"), std::string(R"({"volumes" : null})"),
+          std::string(R"({"volumes" : {"/other" : {"files" : {}}}})"),
+          R"({"volumes" : {")" + topDir_ + R"(" : null}})"}) {
+        WriteWhole(config_, text);
+        EXPECT_EQ(Check(), 1) << text;
+    }
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(InspectionFileTest, WithoutAConfigurationItIsAnError) {
+    CapturedLog log;
+    EXPECT_EQ(CheckFileIsPin(config_.c_str(), "no top directory"), 2);
+    EXPECT_EQ(log.Messages(), Messages{"Can't find config file (" + config_ + ")"});
+}
+
+TEST_F(InspectionFileTest, APathWithoutATopDirectoryIsAnError) {
+    WriteWhole(config_, "damaged"); // not looked at yet
+    CapturedLog log;
+    EXPECT_EQ(CheckFileIsPin(config_.c_str(), "volume1/a"), 2);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Get top directory of file (volume1/a) error",
+                                  "",
+                                  "Can't get top directory of file (volume1/a)",
+                              }));
+}
+
+TEST_F(InspectionFileTest, AConfigurationThatCannotBeUsedIsAnError) {
+    for (const char *text : {"[]", "5", R"({"volumes" : []})", R"({"volumes" : {"/x" : "y"}})",
+                             R"({"volumes" : {"/x" : {"files" : []}}})"}) {
+        WriteWhole(config_, text);
+        CapturedLog log;
+        EXPECT_EQ(Check(), 2) << text;
+        EXPECT_EQ(log.Messages(), Messages{"Can't read data from config file (" + config_ + ")"});
+        EXPECT_EQ(ReadWhole(config_), text);
+    }
+    WriteWhole(config_, "");
+    CapturedLog log;
+    EXPECT_EQ(Check(), 2);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Prase file " + config_ + " error",
+                                  "Can't read data from config file (" + config_ + ")",
+                              }));
+}
+
+TEST_F(InspectionFileTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
+    StoreFiles("{\"1\" : \"file\"}");
+    std::filesystem::remove(file_);
+    CapturedLog log(2);
+    EXPECT_EQ(Check(), 2);
+    EXPECT_EQ(MessagesOf(log, "CheckFileIsPin").back(),
+              "CheckFileIsPin() [N] : ***** Can't get inode number of file (" + file_ + ")");
+    EXPECT_TRUE(log.Has("FileGetInodeNumber() [N] : ***** Stat file " + file_ + " error"));
+}

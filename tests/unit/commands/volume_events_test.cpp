@@ -1,0 +1,189 @@
+#include "commands/volume_events.h"
+
+#include "commands/commands_fixture.h"
+#include "config/ordinary_user.h"
+
+#include <json/reader.h>
+#include <sstream>
+#include <sys/stat.h>
+
+namespace {
+
+Json::Value Parse(const std::string &text) {
+    Json::Value root;
+    std::string errors;
+    std::istringstream stream(text);
+    EXPECT_TRUE(Json::parseFromStream(Json::CharReaderBuilder(), stream, &root, &errors)) << errors;
+    return root;
+}
+
+} // namespace
+
+class VolumeEventsTest : public CommandsTest {
+protected:
+    void SetUp() override {
+        CommandsTest::SetUp();
+        WriteWhole(config_, document_);
+    }
+    int Mount() const { return HandleSpaceMount(config_.c_str(), Volume()); }
+    const std::string config_ = folder_.Path("conf.json");
+    const std::string document_ = R"({"requestQueue" : ["0"],
+        "requests" : {"0" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
+                                  volume_ + R"("}},
+        "volumes" : {")" + volume_ +
+                                  R"(" : {"files" : {"1" : "a"}},
+                     "/volume2" : {"files" : {"2" : "b"}}}})";
+    const std::string recordsRemoved_ = "Remove pin file volume (" + volume_ + ") from config file";
+};
+
+TEST_F(VolumeEventsTest, MountOfAVolumeThatSupportsPinningTouchesNothing) {
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log;
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_EQ(ReadWhole(config_), document_);
+    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
+}
+
+TEST_F(VolumeEventsTest, MountOfAVolumeWithoutCacheRemovesRecordsAndBitmap) {
+    FakeAppliance::caches.clear();
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log;
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_EQ(log.Messages(), Messages{recordsRemoved_});
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+    Json::Value expected = Parse(document_);
+    expected["volumes"].removeMember(volume_);
+    EXPECT_EQ(Parse(ReadWhole(config_)), expected); // its requests stay
+}
+
+TEST_F(VolumeEventsTest, MountLogsAtLevel2) {
+    FakeAppliance::caches[0].state = 0;
+    CapturedLog log(2);
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_EQ(MessagesOf(log, "HandleSpaceMount"),
+              Messages{"HandleSpaceMount() [N]: Space (" + volume_ + ") doesn't support pin"});
+}
+
+TEST_F(VolumeEventsTest, MountWithoutABitmapFileStillRemovesTheRecords) {
+    FakeAppliance::caches.clear();
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_FALSE(Parse(ReadWhole(config_))["volumes"].isMember(volume_));
+}
+
+TEST_F(VolumeEventsTest, MountWithoutAConfigurationStillRemovesTheBitmap) {
+    FakeAppliance::caches.clear();
+    std::filesystem::remove(config_);
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log;
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+    EXPECT_FALSE(std::filesystem::exists(config_));
+}
+
+TEST_F(VolumeEventsTest, MountLeavesADirectoryAtTheBitmapPath) {
+    FakeAppliance::caches.clear();
+    std::filesystem::create_directory(bitmapFile_);
+    CapturedLog log;
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_EQ(log.Messages(), Messages{recordsRemoved_});
+    EXPECT_TRUE(std::filesystem::is_directory(bitmapFile_));
+}
+
+TEST_F(VolumeEventsTest, MountWithADamagedConfigurationKeepsTheBitmap) {
+    FakeAppliance::caches.clear();
+    WriteWhole(config_, R"({"volumes" : []})");
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log;
+    EXPECT_EQ(Mount(), -1);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Can't read data from config file (" + config_ + ")",
+                                  "Can't remove pin files in volume (" + volume_ + ")",
+                              }));
+    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
+    EXPECT_EQ(ReadWhole(config_), R"({"volumes" : []})");
+}
+
+TEST_F(VolumeEventsTest, MountThatCannotDeleteTheBitmapHasRemovedTheRecords) {
+    FakeAppliance::caches.clear();
+    WriteWhole(bitmapFile_, "ab");
+    chmod(folder_.Path().c_str(), 0777);
+    chmod(config_.c_str(), 0666);
+    CapturedLog log;
+    {
+        const OrdinaryUser user;
+        EXPECT_EQ(Mount(), -1);
+    }
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  recordsRemoved_,
+                                  "Can't delete bitmap file (" + bitmapFile_ + ")",
+                              }));
+    EXPECT_FALSE(Parse(ReadWhole(config_))["volumes"].isMember(volume_));
+    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
+}
+
+TEST_F(VolumeEventsTest, MountOfAnUnknownVolumeRemovesItsRecords) {
+    FakeAppliance::spaces.clear();
+    CapturedLog log;
+    EXPECT_EQ(Mount(), 0);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Can't get space uuid from mount path (" + volume_ + ")",
+                                  recordsRemoved_,
+                              }));
+}
+
+TEST_F(VolumeEventsTest, UmountChangesNothing) {
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log;
+    EXPECT_EQ(HandleSpaceUmount(Volume()), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    FakeAppliance::caches.clear();
+    EXPECT_EQ(HandleSpaceUmount(Volume()), 0);
+    EXPECT_EQ(log.Messages(), Messages{"Space (" + volume_ + ") doesn't support pin"});
+    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
+    EXPECT_EQ(ReadWhole(config_), document_);
+    EXPECT_EQ(device_->events, Events{});
+}
+
+TEST_F(VolumeEventsTest, UmountOfAVolumeWithoutPinningIsANotice) {
+    FakeAppliance::caches.clear();
+    CapturedLog log(2);
+    EXPECT_EQ(HandleSpaceUmount(Volume()), 0);
+    EXPECT_EQ(MessagesOf(log, "HandleSpaceUmount"),
+              Messages{"HandleSpaceUmount() [N] : Space (" + volume_ + ") doesn't support pin"});
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapDeletesTheFileAndNothingElse) {
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log(2);
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+    EXPECT_EQ(ReadWhole(config_), document_);
+    EXPECT_EQ(device_->events, Events{});
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapWithoutAFileSucceeds) {
+    CapturedLog log;
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    CapturedLog verbose(2);
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_EQ(verbose.Messages(),
+              Messages{"DeleteBitmap() [N]: bitmap (" + bitmapFile_ + ") doesn't exist"});
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapOfAVolumeThatIsNoSpaceWorksToo) {
+    FakeAppliance::spaces.clear();
+    WriteWhole(bitmapFile_, "ab");
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {
+    std::filesystem::create_directory(bitmapFile_);
+    CapturedLog log;
+    EXPECT_EQ(DeleteBitmap(Volume()), -1);
+    EXPECT_EQ(log.Messages(), Messages{"Can't delete bitmap (" + bitmapFile_ + ")"});
+}

@@ -1,0 +1,188 @@
+#include "service/child_process.h"
+
+#include "support/fake_libc.h"
+#include "support/temp_dir.h"
+
+#include "cli/log.h"
+
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <fcntl.h>
+#include <filesystem>
+#include <iterator>
+#include <pthread.h>
+#include <regex>
+#include <sstream>
+#include <sys/prctl.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+void PauseBriefly() {
+    usleep(1000);
+}
+
+void StuffPipe(int fd) {
+    const int flags = fcntl(fd, F_GETFL);
+    fcntl(fd, F_SETFL, flags | O_NONBLOCK);
+    const std::string block(512, '.');
+    while (write(fd, block.data(), block.size()) > 0) {
+    }
+    fcntl(fd, F_SETFL, flags);
+}
+
+struct Body {
+    const std::function<int()> &function;
+    int result;
+};
+
+void *RunBody(void *argument) {
+    auto *body = static_cast<Body *>(argument);
+    body->result = body->function();
+    return body;
+}
+
+// On a thread of its own: the end of a thread unwinds its stack, and the one that the test
+// framework calls a test on must not be unwound.
+[[noreturn]] void RunChild(int output, const ChildProcess::Setup &setup,
+                           const std::function<int()> &function) {
+    prctl(PR_SET_PDEATHSIG, SIGKILL);
+    dup2(output, STDOUT_FILENO);
+    stdout = fdopen(STDOUT_FILENO, "w"); // buffered as for any program whose output is a pipe
+    if (setup.lineBuffered) {
+        setvbuf(stdout, nullptr, _IOLBF, BUFSIZ);
+    }
+    LogToSyslog = 0;
+    LogLevel = setup.logLevel;
+    ProgramName = "tool";
+    FakeLibc::onSleep = PauseBriefly;
+
+    Body body{function, 0};
+    pthread_t thread{};
+    pthread_create(&thread, nullptr, RunBody, &body);
+    sigset_t all;
+    sigfillset(&all);
+    pthread_sigmask(SIG_SETMASK, &all, nullptr); // signals are for the body's threads
+    void *ended = nullptr;
+    pthread_join(thread, &ended);
+    while (ended != &body) { // ended without returning: what goes on, goes on in other threads
+        pause();
+    }
+    fflush(stdout);
+    _exit(body.result);
+}
+
+} // namespace
+
+ChildProcess::ChildProcess(const Setup &setup, const std::function<int()> &body) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) < 0) {
+        abort();
+    }
+    if (setup.stuffedPipe) {
+        StuffPipe(ends[1]);
+    }
+    fflush(stdout);
+    pid_ = fork();
+    if (pid_ == 0) {
+        RunChild(ends[1], setup, body);
+    }
+    close(ends[1]);
+    output_ = ends[0];
+    fcntl(output_, F_SETFL, O_NONBLOCK);
+}
+
+ChildProcess::~ChildProcess() {
+    if (!ended_) {
+        kill(pid_, SIGKILL);
+        waitpid(pid_, nullptr, 0);
+    }
+    close(output_);
+}
+
+void ChildProcess::Signal(int number) const {
+    kill(pid_, number);
+}
+
+int ChildProcess::AwaitEnd(std::chrono::milliseconds limit) {
+    const Clock::time_point end = Clock::now() + limit;
+    for (;;) {
+        int status = 0;
+        if (waitpid(pid_, &status, WNOHANG) == pid_) {
+            ended_ = true;
+            return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+        }
+        if (Clock::now() > end) {
+            return -1;
+        }
+        PauseBriefly();
+    }
+}
+
+bool ChildProcess::Runs() {
+    return AwaitEnd(std::chrono::milliseconds(0)) == -1;
+}
+
+bool ChildProcess::Await(const std::function<bool()> &condition) {
+    const Clock::time_point end = Clock::now() + std::chrono::seconds(5);
+    while (!condition()) {
+        if (Clock::now() > end) {
+            return false;
+        }
+        PauseBriefly();
+    }
+    return true;
+}
+
+// A thread that waits for the signal does not show it as blocked.
+bool ChildProcess::Blocks(int number) const {
+    using Folder = std::filesystem::directory_iterator;
+    std::error_code error;
+    int blocking = 0;
+    for (const auto &task : Folder("/proc/" + std::to_string(pid_) + "/task", error)) {
+        const std::string status = ReadWhole(task.path() / "status");
+        const size_t place = status.find("SigBlk:");
+        const char *mask = place == std::string::npos ? "" : status.c_str() + place + 7;
+        blocking += static_cast<int>(strtoull(mask, nullptr, 16) >> (number - 1) & 1);
+    }
+    return Threads() > 2 && blocking >= 2;
+}
+
+int ChildProcess::Threads() const {
+    using Folder = std::filesystem::directory_iterator;
+    std::error_code error;
+    const Folder tasks("/proc/" + std::to_string(pid_) + "/task", error);
+    return error ? 0 : static_cast<int>(std::distance(tasks, Folder()));
+}
+
+void ChildProcess::ReadOutput() {
+    char buffer[4096];
+    for (ssize_t got = 0; (got = read(output_, buffer, sizeof(buffer))) > 0;) {
+        text_.append(buffer, static_cast<size_t>(got));
+    }
+}
+
+bool ChildProcess::AwaitOutput(const std::string &text) {
+    return Await([&] {
+        ReadOutput();
+        return text_.find(text) != std::string::npos;
+    });
+}
+
+std::vector<std::string> ChildProcess::Messages() {
+    ReadOutput();
+    static const std::regex prefix("^tool: ");
+    static const std::regex lineNumber("^([A-Za-z]+\\(\\)) \\[[0-9]+\\]");
+    std::vector<std::string> messages;
+    std::istringstream lines(text_);
+    for (std::string line; std::getline(lines, line);) {
+        messages.push_back(
+            std::regex_replace(std::regex_replace(line, prefix, ""), lineNumber, "$1 [N]"));
+    }
+    return messages;
+}

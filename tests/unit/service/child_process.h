@@ -1,0 +1,61 @@
+// A part of a test in a process of its own, with its standard output in a pipe: for what ends the
+// process or changes its signals.
+//
+// Messages go to standard output; pauses last a millisecond. The child is killed when the object
+// goes or the test program does.
+#ifndef TESTS_SERVICE_CHILD_PROCESS_H
+#define TESTS_SERVICE_CHILD_PROCESS_H
+
+#include <chrono>
+#include <functional>
+#include <string>
+#include <sys/types.h>
+#include <vector>
+
+class ChildProcess {
+public:
+    struct Setup {
+        int logLevel = 1;
+        bool stuffedPipe = false;  // the pipe is full before the child starts
+        bool lineBuffered = false; // else its output comes in blocks, or at its end
+    };
+    // Runs `body` on a thread of the child; the child's exit status is what it returns. When it
+    // ends its thread instead, the child goes on.
+    ChildProcess(const Setup &setup, const std::function<int()> &body);
+    ~ChildProcess();
+    ChildProcess(const ChildProcess &) = delete;
+    ChildProcess &operator=(const ChildProcess &) = delete;
+
+    pid_t Id() const { return pid_; }
+    void Signal(int number) const;
+
+    // The exit status, 128 + the number of the signal that ended it, or -1 where it has not ended
+    // within this time.
+    int AwaitEnd(std::chrono::milliseconds limit = std::chrono::seconds(5));
+
+    // Whether it still runs.
+    bool Runs();
+
+    // Whether the condition comes true within five seconds.
+    static bool Await(const std::function<bool()> &condition);
+    // Whether the child's first thread and its body's have blocked this signal and there is a third
+    // thread; and how many threads there are.
+    bool Blocks(int number) const;
+    int Threads() const;
+
+    // Whether it writes this text within five seconds.
+    bool AwaitOutput(const std::string &text);
+
+    // What the child has written so far: lines without the program's name, with every line number
+    // as "[N]".
+    std::vector<std::string> Messages();
+
+private:
+    void ReadOutput();
+    pid_t pid_ = -1;
+    int output_ = -1;
+    bool ended_ = false;
+    std::string text_;
+};
+
+#endif

@@ -1,0 +1,139 @@
+#include "service/signal_handler.h"
+
+#include "service/child_process.h"
+#include "support/leak_checked_test.h"
+#include "support/messages_of.h"
+
+#include <cerrno>
+#include <csignal>
+#include <pthread.h>
+#include <thread>
+#include <unistd.h>
+
+namespace {
+
+const int endingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
+
+// Which of the ending signals have the handler (bits 0 to 2) and which are blocked (bits 3 to 5).
+int SignalState() {
+    sigset_t blocked;
+    pthread_sigmask(SIG_SETMASK, nullptr, &blocked);
+    int state = 0;
+    for (int i = 0; i < 3; ++i) {
+        struct sigaction action {};
+        sigaction(endingSignals[i], nullptr, &action);
+        state |= action.sa_handler == SignalHandler ? 1 << i : 0;
+        state |= sigismember(&blocked, endingSignals[i]) == 1 ? 8 << i : 0;
+    }
+    return state;
+}
+
+// Makes every thread that is started without an own stack size fail.
+void RefuseThreads() {
+    pthread_attr_t attributes;
+    pthread_attr_init(&attributes);
+    pthread_attr_setstacksize(&attributes, SIZE_MAX / 2 & ~size_t{0xFFFF});
+    pthread_setattr_default_np(&attributes);
+}
+
+} // namespace
+
+class SignalHandlerTest : public LeakCheckedTest {};
+
+TEST_F(SignalHandlerTest, AllThreeSignalsGetTheHandler) {
+    ChildProcess child({2}, [] { return SetSignalHandler() == 0 ? SignalState() : 99; });
+    EXPECT_EQ(child.AwaitEnd(), 0b111111);
+    EXPECT_EQ(child.Messages(), Messages{});
+}
+
+TEST_F(SignalHandlerTest, AFailureEndsItAndLeavesTheHandlersBeforeIt) {
+    const int expected[] = {0b000, 0b001, 0b011}; // interrupt, terminate, quit: in this order
+    for (int nth = 1; nth <= 3; ++nth) {
+        ChildProcess child({2}, [nth] {
+            FakeLibc::Fail("signal", EINVAL, nth);
+            return SetSignalHandler() == -1 ? SignalState() : 99;
+        });
+        EXPECT_EQ(child.AwaitEnd(), expected[nth - 1]);
+        EXPECT_EQ(child.Messages(), Messages{"SetSignalHandler() [N] : ***** Can't set handler"});
+    }
+}
+
+TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten) {
+    for (const int number : endingSignals) {
+        ChildProcess child({2}, [] {
+            SetSignalHandler();
+            LogNotice("still in the buffer");
+            for (;;) {
+                pause();
+            }
+            return 99;
+        });
+        ASSERT_TRUE(ChildProcess::Await([&] { return child.Blocks(SIGTERM); }));
+        child.Signal(number);
+        EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+        EXPECT_EQ(child.Messages().back(),
+                  "SignalHandler() [N]: Get signal = " + std::to_string(number));
+    }
+}
+
+TEST_F(SignalHandlerTest, ASignalIsSilentAtLevel1) {
+    ChildProcess child({1}, [] {
+        SetSignalHandler();
+        kill(getpid(), SIGTERM);
+        for (;;) {
+            pause();
+        }
+        return 99;
+    });
+    EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+    EXPECT_EQ(child.Messages(), Messages{});
+}
+
+TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
+    ChildProcess child({2, true}, [] {
+        SetSignalHandler();
+        for (;;) {
+            LogNotice("more and more, until the pipe takes no more and the lock is held for good");
+        }
+        return 99;
+    });
+    ASSERT_TRUE(ChildProcess::Await([&] { return child.Blocks(SIGTERM); }));
+    usleep(5000); // the thread has long filled its buffer
+    child.Signal(SIGTERM);
+    EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+}
+
+TEST_F(SignalHandlerTest, OtherSignalsKeepTheirActions) {
+    ChildProcess child({1}, [] {
+        SetSignalHandler();
+        raise(SIGUSR1);
+        return 99;
+    });
+    EXPECT_EQ(child.AwaitEnd(), 128 + SIGUSR1);
+}
+
+TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheHandlerRunsWhereItIsInterrupted) {
+    ChildProcess child({2}, [] {
+        RefuseThreads();
+        if (SetSignalHandler() != 0 || SignalState() != 0b000111) {
+            return 99;
+        }
+        raise(SIGINT);
+        return 98;
+    });
+    EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+    EXPECT_EQ(child.Messages(), Messages{"SignalHandler() [N]: Get signal = 2"});
+}
+
+TEST_F(SignalHandlerTest, TheLastServiceThreadEndsTheProcess) {
+    ChildProcess child({1}, [] {
+        SetSignalHandler();
+        SetServiceThreads(2);
+        ServiceThreadEnds();
+        LogNotice("one is left");
+        ServiceThreadEnds();
+        return 99;
+    });
+    EXPECT_EQ(child.AwaitEnd(), 0);
+    EXPECT_EQ(child.Messages(), Messages{"one is left"});
+}

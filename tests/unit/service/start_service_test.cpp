@@ -1,0 +1,250 @@
+#include "service/start_service.h"
+
+#include "service/child_process.h"
+#include "service/handler_fixture.h"
+#include "service/private_world.h"
+
+#include "cli/tool_parameters.h"
+#include "service/message_queue.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <csignal>
+#include <pthread.h>
+#include <sys/ipc.h>
+#include <sys/msg.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+using std::chrono::milliseconds;
+
+// The whole service in a process of its own.
+class StartServiceTest : public HandlerTest {
+protected:
+    void SetUp() override {
+        HandlerTest::SetUp();
+        if (IsSkipped()) {
+            return;
+        }
+        SKIP_WITHOUT_PRIVATE_WORLD();
+        EmptyPrivateWorld();
+        queueId_ = MsgQueueGet(messageKeyFile);
+    }
+    void TearDown() override {
+        HandlerTest::TearDown();
+        EmptyPrivateWorld();
+    }
+    std::function<int()> Service(const std::function<void()> &before = {}) const {
+        return [this, before] {
+            if (before) {
+                before();
+            }
+            ToolParameters parameters;
+            parameters.configPath = config_.c_str();
+            return StartService(&parameters) == -1 ? 42 : 43;
+        };
+    }
+    void Send(int type, const std::string &mountPath, const std::string &data = "") const {
+        ASSERT_TRUE(PutMessage(queueId_, 1, RecordBytes(type, mountPath, data)));
+    }
+    bool AwaitConfig(const std::string &part) const {
+        return ChildProcess::Await(
+            [&] { return ReadWhole(config_).find(part) != std::string::npos; });
+    }
+    static Messages Of(const Messages &all, const std::string &function) {
+        Messages messages;
+        for (const std::string &message : all) {
+            if (message.rfind(function + "() [N]", 0) == 0) {
+                messages.push_back(message);
+            }
+        }
+        return messages;
+    }
+    static bool Contains(const Messages &all, const std::string &message) {
+        return std::count(all.begin(), all.end(), message) > 0;
+    }
+    const std::string config_ = folder_.Path("conf.json");
+    int queueId_ = -1;
+};
+
+TEST_F(StartServiceTest, ARequestIsReceivedStoredAndCarriedOut) {
+    WriteWhole(volume_ + "/a", "x");
+    struct stat status {};
+    ASSERT_EQ(stat((volume_ + "/a").c_str(), &status), 0);
+    const auto inode = static_cast<uint32_t>(status.st_ino);
+    extents_[inode] = {FakeExtent(0, 8, 16)};
+    ChildProcess service({1, false, true}, Service());
+    Send(requestPinFiles, volume_, volume_ + "/a");
+    EXPECT_TRUE(service.AwaitOutput("OK \n"));
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.Messages(),
+              Messages{"Handle request (type=pinFiles files=a#" + std::to_string(inode) + ") OK "});
+    EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "0100");
+    EXPECT_NE(ReadWhole(config_).find('"' + std::to_string(inode) + "\" : \"a\""),
+              std::string::npos);
+}
+
+TEST_F(StartServiceTest, EachSignalEndsTheIdleServiceWithItsOutputWritten) {
+    for (const int number : {SIGTERM, SIGINT, SIGQUIT}) {
+        ChildProcess service({2}, Service());
+        Send(requestReloadPinBlocks, "/volume9"); // of no cache: stored, woken for and dropped
+        EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
+        service.Signal(number);
+        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        const Messages messages = service.Messages();
+        EXPECT_EQ(messages.front(), "StartService() [N] : +++++");
+        EXPECT_EQ(messages.back(), "SignalHandler() [N]: Get signal = " + std::to_string(number));
+        EXPECT_TRUE(Contains(
+            messages, "GetRequests() [N]: Get a new message. Request type = reloadPinBlocks"));
+        EXPECT_TRUE(Contains(messages, "DoRequests() [N] : +++++"));
+        EXPECT_TRUE(
+            Contains(messages, "ConfigParseAndGetNextAvailableRequest() [N]: Remove request (0)"));
+        std::filesystem::remove(config_);
+    }
+    EXPECT_NE(CountMessages(queueId_), -1); // queue and key file stay
+    EXPECT_NE(ReadWhole(messageKeyFile), "");
+}
+
+TEST_F(StartServiceTest, ASignalEndsTheServiceInTheMiddleOfARequest) {
+    WriteWhole(bitmapFile_, std::string("\x01\x00", 2));
+    int marker[2];
+    ASSERT_EQ(pipe(marker), 0);
+    device_->onRead = [&marker] {
+        EXPECT_EQ(write(marker[1], "r", 1), 1);
+        for (;;) {
+            pause();
+        }
+    };
+    {
+        ChildProcess service({2}, Service());
+        Send(requestReloadPinBlocks, volume_);
+        char byte = 0;
+        EXPECT_EQ(syscall(SYS_read, marker[0], &byte, 1), 1);
+        service.Signal(SIGTERM);
+        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        EXPECT_EQ(service.Messages().back(), "SignalHandler() [N]: Get signal = 15");
+    }
+    close(marker[0]);
+    close(marker[1]);
+    EXPECT_NE(ReadWhole(config_).find("reloadPinBlocks"), std::string::npos); // still queued
+}
+
+TEST_F(StartServiceTest, ASignalEndsTheServiceWhoseOutputNobodyReads) {
+    ChildProcess service({2, true}, Service());
+    for (int i = 0; i < 200; ++i) {
+        Send(requestAddPendingSpace, "/volume" + std::to_string(i));
+    }
+    int waiting = -1;
+    EXPECT_TRUE(ChildProcess::Await([&] { // until it takes no more
+        const int before = waiting;
+        waiting = CountMessages(queueId_);
+        usleep(5000);
+        return waiting == before && waiting < 200;
+    }));
+    EXPECT_GT(waiting, 0);
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+}
+
+TEST_F(StartServiceTest, ASignalEndsTheServiceBeforeItHasItsQueue) {
+    // A key file that is a FIFO holds the receiver up at reading the key of the existing queue.
+    EmptyPrivateWorld();
+    ASSERT_EQ(mkfifo(messageKeyFile, 0600), 0);
+    ASSERT_NE(msgget(ftok(messageKeyFile, 'x'), IPC_CREAT | 0600), -1);
+    for (const int number : {SIGTERM, SIGINT, SIGQUIT}) {
+        ChildProcess service({2}, Service());
+        EXPECT_TRUE(ChildProcess::Await([&] { return service.Threads() >= 4; }));
+        usleep(2000);
+        EXPECT_TRUE(service.Runs());
+        service.Signal(number);
+        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        const Messages messages = service.Messages();
+        EXPECT_TRUE(Contains(messages, "MsgQueueGet() [N] : +++++"));
+        EXPECT_EQ(messages.back(), "SignalHandler() [N]: Get signal = " + std::to_string(number));
+    }
+}
+
+TEST_F(StartServiceTest, ASignalRightAfterTheHandlersAreInstalledEndsTheService) {
+    for (int i = 0; i < 10; ++i) {
+        ChildProcess service({1}, Service());
+        EXPECT_TRUE(ChildProcess::Await([&] { return service.Blocks(SIGTERM); }));
+        service.Signal(SIGTERM);
+        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    }
+}
+
+TEST_F(StartServiceTest, WithoutItsQueueTheReceiverEndsAndTheWorkerGoesOn) {
+    WriteWhole(messageKeyFile, "");
+    WriteWhole(config_, R"({"requestQueue" : ["0"], "requests" :
+        {"0" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
+                            volume_ + R"("}}})");
+    ChildProcess service({1}, Service());
+    EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
+    EXPECT_TRUE(service.Runs());
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_TRUE(Contains(service.Messages(), "Create server messsage queue by file "
+                                             "(/var/run/veskcachepinfile-msg-server.key) failed"));
+}
+
+TEST_F(StartServiceTest, ASelectionErrorEndsTheWorkerAndTheReceiverGoesOn) {
+    WriteWhole(config_, R"({"requestQueue" : ["7"]})");
+    ChildProcess service({1, false, true}, Service());
+    EXPECT_TRUE(service.AwaitOutput("Get request error"));
+    Send(requestReloadPinBlocks, "/volume1");
+    EXPECT_TRUE(AwaitConfig("/volume1"));
+    EXPECT_TRUE(service.Runs());
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.Messages(), (Messages{
+                                      "Can't find request number (7) in config",
+                                      "Get request error",
+                                  }));
+}
+
+TEST_F(StartServiceTest, WhenBothThreadsHaveEndedTheProcessEndsWithStatus0) {
+    WriteWhole(config_, "[]");
+    ChildProcess service({2}, Service());
+    Send(requestReloadPinBlocks, "/volume1");
+    EXPECT_EQ(service.AwaitEnd(), 0);
+    const Messages messages = service.Messages();
+    EXPECT_EQ(Of(messages, "GetRequests").back(), "GetRequests() [N] : -----");
+    EXPECT_EQ(Of(messages, "DoRequests").back(), "DoRequests() [N] : -----");
+}
+
+TEST_F(StartServiceTest, WithoutItsHandlersItDoesNotStart) {
+    ChildProcess service({2}, Service([] { FakeLibc::Fail("signal", EINVAL, 2); }));
+    EXPECT_EQ(service.AwaitEnd(), 42);
+    EXPECT_EQ(service.Messages(), (Messages{
+                                      "StartService() [N] : +++++",
+                                      "SetSignalHandler() [N] : ***** Can't set handler",
+                                      "StartService() [N] : ***** Can't get signal handler",
+                                      "StartService() [N] : -----",
+                                  }));
+}
+
+TEST_F(StartServiceTest, WithoutItsLockItDoesNotStart) {
+    ChildProcess service({2}, Service([] { FakeLibc::Fail("pthread_mutex_init", ENOMEM); }));
+    EXPECT_EQ(service.AwaitEnd(), 42);
+    EXPECT_EQ(service.Messages(), (Messages{
+                                      "StartService() [N] : +++++",
+                                      "StartService() [N] : ***** Initialize mutex failed",
+                                  }));
+}
+
+TEST_F(StartServiceTest, WithoutItsWorkerItDoesNotStart) {
+    ChildProcess service({2}, Service([] {
+                             pthread_attr_t attributes;
+                             pthread_attr_init(&attributes);
+                             pthread_attr_setstacksize(&attributes, SIZE_MAX / 2 & ~size_t{0xFFFF});
+                             pthread_setattr_default_np(&attributes);
+                         }));
+    EXPECT_EQ(service.AwaitEnd(), 42);
+    EXPECT_EQ(service.Messages(),
+              (Messages{
+                  "StartService() [N] : +++++",
+                  "StartService() [N] : ***** Can't create thread: Cannot allocate memory",
+              }));
+}
