@@ -12,17 +12,18 @@ namespace {
 bool AwaitReady(int fd) {
     char byte = 0;
     ssize_t got = -1;
-    do
+    do {
         got = read(fd, &byte, 1);
-    while (got < 0 && errno == EINTR);
+    } while (got < 0 && errno == EINTR);
     return got == 1;
 }
 
 } // namespace
 
 Background::~Background() {
-    if (readyFd >= 0)
+    if (readyFd >= 0) {
         close(readyFd);
+    }
 }
 
 int BackgroundStart(Background &background) {
@@ -49,16 +50,20 @@ int BackgroundStart(Background &background) {
 }
 
 void BackgroundReady(Background &background) {
-    if (background.readyFd < 0)
+    if (background.readyFd < 0) {
         return;
+    }
     setsid();
-    if (chdir("/") != 0)
+    if (chdir("/") != 0) {
         fprintf(stderr, "veskcachedev: cannot leave the working folder: %s\n", strerror(errno));
+    }
     const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-    for (int fd = 0; null >= 0 && fd <= 2; ++fd)
+    for (int fd = 0; null >= 0 && fd <= 2; ++fd) {
         dup2(null, fd);
-    if (null > 2)
+    }
+    if (null > 2) {
         close(null);
+    }
     // Writes to a parent that was killed meanwhile may fail: the daemon serves all the same.
     const char byte = 1;
     const ssize_t written = write(background.readyFd, &byte, 1);

@@ -13,14 +13,16 @@ void MakeEvictable(BlockCache &cache, uint32_t number) {
 // Takes the pin off a slot; the caller takes the block out of pinnedBlocks.
 void ClearPin(BlockCache &cache, uint32_t number) {
     cache.slots[number].pinned = false;
-    if (!cache.slots[number].inUse)
+    if (!cache.slots[number].inUse) {
         MakeEvictable(cache, number);
+    }
 }
 
 // Takes the block out of a slot that is in use or no longer evictable.
 void Forget(BlockCache &cache, CacheSlot &slot) {
-    if (slot.pinned)
+    if (slot.pinned) {
         slot.pinNode = cache.pinnedBlocks.extract(slot.block);
+    }
     slot.indexNode = cache.slotOfBlock.extract(slot.block);
     slot.block = kNoBlock;
     slot.pinned = false;
@@ -51,8 +53,9 @@ uint32_t BlockCacheFind(const BlockCache &cache, uint64_t block) {
 
 void BlockCacheUse(BlockCache &cache, uint32_t slot) {
     CacheSlot &used = cache.slots[slot];
-    if (!used.pinned)
+    if (!used.pinned) {
         used.useNode = cache.evictable.extract(used.lastUse);
+    }
     used.inUse = true;
     used.lastUse = ++cache.useClock;
 }
@@ -88,8 +91,9 @@ void BlockCacheStore(BlockCache &cache, uint32_t slot, uint64_t block) {
 
 void BlockCachePin(BlockCache &cache, uint32_t slot) {
     CacheSlot &pinned = cache.slots[slot];
-    if (pinned.pinned)
+    if (pinned.pinned) {
         return;
+    }
     pinned.pinned = true;
     pinned.pinNode.value() = pinned.block;
     cache.pinnedBlocks.insert(std::move(pinned.pinNode));
@@ -97,13 +101,15 @@ void BlockCachePin(BlockCache &cache, uint32_t slot) {
 
 void BlockCacheRelease(BlockCache &cache, uint32_t slot) {
     cache.slots[slot].inUse = false;
-    if (!cache.slots[slot].pinned)
+    if (!cache.slots[slot].pinned) {
         MakeEvictable(cache, slot);
+    }
 }
 
 void BlockCacheDrop(BlockCache &cache, uint32_t slot) {
-    if (cache.slots[slot].block != kNoBlock)
+    if (cache.slots[slot].block != kNoBlock) {
         Forget(cache, cache.slots[slot]);
+    }
     cache.slots[slot].inUse = false;
     cache.freeSlots.push_back(slot);
 }
@@ -124,10 +130,11 @@ void BlockCacheUnpinAll(BlockCache &cache) {
 std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache) {
     std::vector<BlockRun> runs;
     for (const uint64_t block : cache.pinnedBlocks) {
-        if (!runs.empty() && runs.back().first + runs.back().count == block)
+        if (!runs.empty() && runs.back().first + runs.back().count == block) {
             ++runs.back().count;
-        else
+        } else {
             runs.push_back({block, 1});
+        }
     }
     return runs;
 }

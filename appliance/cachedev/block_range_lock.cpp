@@ -23,6 +23,7 @@ BlockRangeGuard::~BlockRangeGuard() {
         lock.queue.erase(place);
         wake = lock.waiting > 0;
     }
-    if (wake)
+    if (wake) {
         lock.released.notify_all();
+    }
 }

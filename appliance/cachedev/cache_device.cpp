@@ -14,8 +14,9 @@ bool PassesEnd(const SectorRange &range, uint64_t deviceSectors) {
 
 // The blocks that a range inside the device touches.
 BlockRun TouchedBlocks(const SectorRange &range) {
-    if (range.sectorCount == 0)
+    if (range.sectorCount == 0) {
         return {0, 0};
+    }
     const uint64_t first = range.startSector / kBlockSectors;
     const uint64_t last = (range.startSector + range.sectorCount - 1) / kBlockSectors;
     return {first, last - first + 1};
@@ -43,12 +44,14 @@ int CacheDeviceUnpinRanges(CacheDevice &device, const std::vector<SectorRange> &
     const auto passesEnd = [deviceSectors](const SectorRange &range) {
         return PassesEnd(range, deviceSectors);
     };
-    if (std::any_of(ranges.begin(), ranges.end(), passesEnd))
+    if (std::any_of(ranges.begin(), ranges.end(), passesEnd)) {
         return -EINVAL;
+    }
     std::vector<SectorRange> accepted = ranges;
     const std::lock_guard<std::mutex> hold(device.stateMutex);
-    for (const SectorRange &range : ranges)
+    for (const SectorRange &range : ranges) {
         BlockCacheUnpin(device.cache, TouchedBlocks(range));
+    }
     device.lastUnpin.swap(accepted);
     device.slotReleased.notify_all();
     return 0;
@@ -73,10 +76,12 @@ bool CacheDeviceIsAllUnpinned(CacheDevice &device) {
 
 void CacheDeviceCountRequest(CacheDevice &device, uint64_t RequestCounters::*kind, bool refused) {
     const std::lock_guard<std::mutex> hold(device.stateMutex);
-    if (kind != nullptr)
+    if (kind != nullptr) {
         ++(device.requests.*kind);
-    if (refused)
+    }
+    if (refused) {
         ++device.requests.refused;
+    }
 }
 
 CacheSnapshot CacheDeviceSnapshot(CacheDevice &device) {
@@ -89,8 +94,9 @@ CacheSnapshot CacheDeviceSnapshot(CacheDevice &device) {
     snapshot.pinned = BlockCachePinnedRuns(device.cache);
     snapshot.pinnedBlocks = device.cache.pinnedBlocks.size();
     snapshot.cachedBlocks = device.cache.slotOfBlock.size();
-    for (const CacheSlot &slot : device.cache.slots)
+    for (const CacheSlot &slot : device.cache.slots) {
         snapshot.slotBlocks.push_back(slot.block);
+    }
     snapshot.evictions = device.cache.evictions;
     snapshot.counters = device.counters;
     snapshot.requests = device.requests;

@@ -44,8 +44,9 @@ template <typename Move> int ForEachGroup(const CacheRun &run, const Span &span,
                      std::min(span.end, CacheRunBlockStart(run, next)), nullptr};
         part.buffer = span.buffer + (part.offset - span.offset);
         const int result = move(part, run.slots[first], static_cast<size_t>(part.offset - start));
-        if (result != 0)
+        if (result != 0) {
             return result;
+        }
         first = next;
     }
     return 0;
@@ -90,8 +91,9 @@ int Fetch(const CacheImages &images, CacheRun &run, const Span &span, bool maySt
     if (run.kind != RunKind::Bypass) {
         const int loaded = run.kind == RunKind::Load ? LoadSlots(images, run) : 0;
         stayed = run.kind == RunKind::Load && loaded == 0 && mayStay;
-        if (stayed || (loaded == 0 && CopyFromSlots(images, run, span) == 0))
+        if (stayed || (loaded == 0 && CopyFromSlots(images, run, span) == 0)) {
             return 0;
+        }
         run.broken = true; // the backing image has the same bytes
     }
     return CacheImagesReadBacking(images, span.offset, OnePiece(span));
@@ -111,12 +113,14 @@ char *ReadBuffer(size_t bytes) {
 
 // Where the data is slow to come by, whoever wants the same blocks waits along; nobody else does.
 void DelayMisses(CacheDevice &device, uint64_t firstBlock, uint64_t lastBlock) {
-    if (device.settings.missDelayMs == 0)
+    if (device.settings.missDelayMs == 0) {
         return;
+    }
     const std::chrono::milliseconds delay(device.settings.missDelayMs);
     for (uint64_t missing = CacheRunCountMissing(device, firstBlock, lastBlock); missing > 0;
-         --missing)
+         --missing) {
         std::this_thread::sleep_for(delay);
+    }
 }
 
 int ReadRequest(CacheDevice &device, const Span &request, const CacheReader &deliver) {
@@ -135,13 +139,15 @@ int ReadRequest(CacheDevice &device, const Span &request, const CacheReader &del
             // not stay in theirs: a request that holds slots must not wait for more.
             ImagePieces pieces =
                 OnePiece({request.offset, stayed ? position : request.end, request.buffer});
-            if (stayed)
+            if (stayed) {
                 AddSlotPieces(device.images, run, span, pieces);
+            }
             deliver(pieces);
         }
         CacheRunRelease(device, run);
-        if (isLast || error != 0)
+        if (isLast || error != 0) {
             return error;
+        }
         position = span.end;
     }
 }
@@ -157,8 +163,9 @@ int WriteRequest(CacheDevice &device, const Span &request) {
         run.broken = error != 0 || CopyToSlots(device.images, run, span) != 0;
         CacheRunPublish(device, run, error);
         CacheRunRelease(device, run);
-        if (error != 0)
+        if (error != 0) {
             return error;
+        }
         position = span.end;
     }
     return 0;
@@ -170,22 +177,26 @@ int64_t CacheDeviceRead(CacheDevice &device, uint64_t offset, size_t size,
                         const CacheReader &deliver) {
     const CacheFaults &faults = device.settings.faults;
     const uint64_t deviceEnd = std::min(device.images.deviceBytes, faults.shortAt);
-    if (offset >= deviceEnd || size == 0)
+    if (offset >= deviceEnd || size == 0) {
         return 0;
+    }
     const uint64_t end = offset + std::min<uint64_t>(size, deviceEnd - offset);
     const auto fault = faults.failRead.lower_bound(offset);
-    if (fault != faults.failRead.end() && fault->first < end)
+    if (fault != faults.failRead.end() && fault->first < end) {
         return -fault->second;
+    }
     const auto bytes = static_cast<size_t>(end - offset);
     const int error = ReadRequest(device, {offset, end, ReadBuffer(bytes)}, deliver);
     return error != 0 ? error : static_cast<int64_t>(bytes);
 }
 
 int64_t CacheDeviceWrite(CacheDevice &device, uint64_t offset, const char *buffer, size_t size) {
-    if (size == 0)
+    if (size == 0) {
         return 0;
-    if (offset >= device.images.deviceBytes)
+    }
+    if (offset >= device.images.deviceBytes) {
         return -ENOSPC;
+    }
     const uint64_t end = offset + std::min<uint64_t>(size, device.images.deviceBytes - offset);
     // The pieces of a transfer are not const; a write only reads them.
     const int error = WriteRequest(device, {offset, end, const_cast<char *>(buffer)});

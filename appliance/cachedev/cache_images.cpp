@@ -20,26 +20,32 @@ int TransferAll(TransferCall call, int fd, uint64_t offset, ImagePieces pieces) 
     struct iovec *part = pieces.parts;
     struct iovec *const end = pieces.parts + pieces.count;
     while (true) {
-        while (part != end && part->iov_len == 0)
+        while (part != end && part->iov_len == 0) {
             ++part;
-        if (part == end)
+        }
+        if (part == end) {
             return 0;
+        }
         const ssize_t moved =
             call(fd, part, static_cast<int>(end - part), static_cast<off_t>(offset));
-        if (moved < 0 && errno == EINTR)
+        if (moved < 0 && errno == EINTR) {
             continue;
-        if (moved < 0)
+        }
+        if (moved < 0) {
             return -errno;
-        if (moved == 0)
+        }
+        if (moved == 0) {
             return -EIO;
+        }
         offset += static_cast<uint64_t>(moved);
         for (auto left = static_cast<size_t>(moved); left > 0;) {
             const size_t step = std::min(left, part->iov_len);
             part->iov_base = static_cast<char *>(part->iov_base) + step;
             part->iov_len -= step;
             left -= step;
-            if (part->iov_len == 0)
+            if (part->iov_len == 0) {
                 ++part;
+            }
         }
     }
 }
@@ -72,8 +78,9 @@ int OpenImage(const std::string &path, const char *what, ImageFile &image, struc
 }
 
 bool IsSameImage(const struct stat &one, const struct stat &other) {
-    if (S_ISBLK(one.st_mode) && S_ISBLK(other.st_mode))
+    if (S_ISBLK(one.st_mode) && S_ISBLK(other.st_mode)) {
         return one.st_rdev == other.st_rdev;
+    }
     return one.st_dev == other.st_dev && one.st_ino == other.st_ino;
 }
 
@@ -81,9 +88,10 @@ int MapSlots(CacheImages &images, std::string &error) {
     const uint64_t bytes = images.slots * kBlockBytes;
     void *start = MAP_FAILED;
     errno = EFBIG;
-    if (bytes <= PTRDIFF_MAX)
+    if (bytes <= PTRDIFF_MAX) {
         start = mmap(nullptr, static_cast<size_t>(bytes), PROT_READ | PROT_WRITE, MAP_SHARED,
                      images.ssd.fd, 0);
+    }
     if (start == MAP_FAILED) {
         error = "cannot map the SSD image (" + std::to_string(bytes) +
                 " bytes) into memory: " + strerror(errno);
@@ -97,13 +105,15 @@ int MapSlots(CacheImages &images, std::string &error) {
 } // namespace
 
 ImageFile::~ImageFile() {
-    if (fd >= 0)
+    if (fd >= 0) {
         close(fd);
+    }
 }
 
 SlotMap::~SlotMap() {
-    if (start != nullptr)
+    if (start != nullptr) {
         munmap(start, bytes);
+    }
 }
 
 int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, CacheImages &images,
@@ -116,10 +126,13 @@ int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, 
         return -1;
     }
     uint64_t ssdBytes = 0;
-    if (OpenImage(backingPath, "backing", images.backing, backing, images.deviceBytes, error) != 0)
+    if (OpenImage(backingPath, "backing", images.backing, backing, images.deviceBytes, error) !=
+        0) {
         return -1;
-    if (OpenImage(ssdPath, "SSD", images.ssd, ssd, ssdBytes, error) != 0)
+    }
+    if (OpenImage(ssdPath, "SSD", images.ssd, ssd, ssdBytes, error) != 0) {
         return -1;
+    }
     if (images.deviceBytes == 0 || images.deviceBytes % kSectorBytes != 0) {
         error = "the size of the backing image (" + std::to_string(images.deviceBytes) +
                 " bytes) is not a multiple of 512 bytes above 0";

@@ -33,17 +33,21 @@ void TakeFirst(CacheDevice &device, std::unique_lock<std::mutex> &hold, CacheRun
 // Adds the next block if it is of the run's kind. stateMutex is held.
 bool TakeNext(BlockCache &cache, CacheRun &run) {
     uint32_t slot = BlockCacheFind(cache, run.firstBlock + run.count);
-    if ((slot != kNoSlot) != (run.kind == RunKind::Hit))
+    if ((slot != kNoSlot) != (run.kind == RunKind::Hit)) {
         return false;
-    if (run.kind == RunKind::Hit)
+    }
+    if (run.kind == RunKind::Hit) {
         BlockCacheUse(cache, slot);
-    else if (run.kind == RunKind::Load)
+    } else if (run.kind == RunKind::Load) {
         slot = BlockCacheTake(cache);
+    }
     // Out of slots: those of this run will be free for the next one.
-    if (run.kind == RunKind::Load && slot == kNoSlot)
+    if (run.kind == RunKind::Load && slot == kNoSlot) {
         return false;
-    if (run.kind == RunKind::Bypass && BlockCacheMayTakeLater(cache))
+    }
+    if (run.kind == RunKind::Bypass && BlockCacheMayTakeLater(cache)) {
         return false;
+    }
     run.slots[run.count++] = slot;
     return true;
 }
@@ -55,15 +59,17 @@ void Count(CacheDevice &device, const CacheRun &run, int error) {
         return;
     }
     (run.kind == RunKind::Hit ? counters.hits : counters.misses) += run.count;
-    if (run.kind == RunKind::Hit && !run.broken)
+    if (run.kind == RunKind::Hit && !run.broken) {
         counters.ssdReads += run.count;
-    else if (error == 0)
+    } else if (error == 0) {
         counters.backingReads += run.count;
+    }
 }
 
 void WakeSlotWaiters(CacheDevice &device) {
-    if (device.slotWaiters > 0)
+    if (device.slotWaiters > 0) {
         device.slotReleased.notify_all();
+    }
 }
 
 } // namespace
@@ -74,8 +80,10 @@ CacheRun CacheRunTakeForRead(CacheDevice &device, uint64_t first, uint64_t last)
     const size_t most = MostBlocks(first, last);
     std::unique_lock<std::mutex> hold(device.stateMutex);
     TakeFirst(device, hold, run);
-    while (run.count < most && TakeNext(device.cache, run))
-        continue;
+    bool more = true;
+    while (more && run.count < most) {
+        more = TakeNext(device.cache, run);
+    }
     return run;
 }
 
@@ -87,8 +95,9 @@ CacheRun CacheRunTakeForWrite(CacheDevice &device, uint64_t first, uint64_t last
     const std::lock_guard<std::mutex> hold(device.stateMutex);
     for (size_t i = 0; i < run.count; ++i) {
         run.slots[i] = BlockCacheFind(device.cache, first + i);
-        if (run.slots[i] != kNoSlot)
+        if (run.slots[i] != kNoSlot) {
             BlockCacheUse(device.cache, run.slots[i]);
+        }
     }
     return run;
 }
@@ -96,8 +105,9 @@ CacheRun CacheRunTakeForWrite(CacheDevice &device, uint64_t first, uint64_t last
 uint64_t CacheRunCountMissing(CacheDevice &device, uint64_t first, uint64_t last) {
     uint64_t missing = 0;
     const std::lock_guard<std::mutex> hold(device.stateMutex);
-    for (uint64_t block = first; block <= last; ++block)
+    for (uint64_t block = first; block <= last; ++block) {
         missing += BlockCacheFind(device.cache, block) == kNoSlot ? 1 : 0;
+    }
     return missing;
 }
 
@@ -106,36 +116,43 @@ void CacheRunPublish(CacheDevice &device, CacheRun &run, int error) {
     Count(device, run, error);
     for (size_t i = 0; i < run.count; ++i) {
         const uint32_t slot = run.slots[i];
-        if (slot == kNoSlot)
+        if (slot == kNoSlot) {
             continue;
+        }
         if (run.broken) {
             BlockCacheDrop(device.cache, slot);
             run.slots[i] = kNoSlot;
             continue;
         }
         const uint64_t block = run.firstBlock + i;
-        if (run.kind == RunKind::Load)
+        if (run.kind == RunKind::Load) {
             BlockCacheStore(device.cache, slot, block);
-        if (run.kind != RunKind::Write && device.bitmap && PinBitmapTest(*device.bitmap, block))
+        }
+        if (run.kind != RunKind::Write && device.bitmap && PinBitmapTest(*device.bitmap, block)) {
             BlockCachePin(device.cache, slot);
+        }
     }
-    if (run.broken)
+    if (run.broken) {
         WakeSlotWaiters(device);
+    }
 }
 
 void CacheRunRelease(CacheDevice &device, const CacheRun &run) {
     const std::lock_guard<std::mutex> hold(device.stateMutex);
     for (size_t i = 0; i < run.count; ++i) {
-        if (run.slots[i] != kNoSlot)
+        if (run.slots[i] != kNoSlot) {
             BlockCacheRelease(device.cache, run.slots[i]);
+        }
     }
     WakeSlotWaiters(device);
 }
 
 size_t CacheRunGroupEnd(const CacheRun &run, size_t index) {
     size_t end = index + 1;
-    while (end < run.count && run.slots[end] != kNoSlot && run.slots[end] == run.slots[end - 1] + 1)
+    while (end < run.count && run.slots[end] != kNoSlot &&
+           run.slots[end] == run.slots[end - 1] + 1) {
         ++end;
+    }
     return end;
 }
 

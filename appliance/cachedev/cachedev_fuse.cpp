@@ -40,8 +40,9 @@ template <typename Body> void Guarded(fuse_req_t request, Body body) {
     } catch (...) {
         error = EIO;
     }
-    if (error != 0)
+    if (error != 0) {
         fuse_reply_err(request, error);
+    }
 }
 
 StateText CurrentState(ServedDevice &served) {
@@ -89,20 +90,22 @@ void Init(void *userData, struct fuse_conn_info *connection) {
     // with it, it would take the device for empty from then on, whatever the answer.
     connection->want &= ~static_cast<unsigned>(FUSE_CAP_ATOMIC_O_TRUNC);
     const auto &served = *static_cast<ServedDevice *>(userData);
-    if (served.onReady)
+    if (served.onReady) {
         served.onReady();
+    }
 }
 
 void LookUp(fuse_req_t request, fuse_ino_t, const char *name) {
     Guarded(request, [=] {
         ServedDevice &served = Served(request);
         struct fuse_entry_param entry = {};
-        if (served.deviceName == name)
+        if (served.deviceName == name) {
             entry.ino = kDeviceInode;
-        else if (served.stateName == name)
+        } else if (served.stateName == name) {
             entry.ino = kStateInode;
-        else
+        } else {
             return ENOENT;
+        }
         entry.attr = StatusOf(served, entry.ino, nullptr);
         entry.attr_timeout = kAttributeTimeout;
         entry.entry_timeout = kNameTimeout;
@@ -124,11 +127,13 @@ void SetAttributes(fuse_req_t request, fuse_ino_t inode, struct stat *wanted, in
                    struct fuse_file_info *info) {
     Guarded(request, [=] {
         ServedDevice &served = Served(request);
-        if ((which & FUSE_SET_ATTR_SIZE) == 0)
+        if ((which & FUSE_SET_ATTR_SIZE) == 0) {
             return EPERM;
+        }
         if (inode != kDeviceInode ||
-            static_cast<uint64_t>(wanted->st_size) != served.device.images.deviceBytes)
+            static_cast<uint64_t>(wanted->st_size) != served.device.images.deviceBytes) {
             return EINVAL;
+        }
         const struct stat status = StatusOf(served, inode, info);
         fuse_reply_attr(request, &status, kAttributeTimeout);
         return 0;
@@ -158,8 +163,9 @@ void ReadFolder(fuse_req_t request, fuse_ino_t, size_t size, off_t offset,
             const size_t needed =
                 fuse_add_direntry(request, buffer.data() + used, size - used, entries[index].name,
                                   &status, static_cast<off_t>(index + 1));
-            if (needed > size - used)
+            if (needed > size - used) {
                 break;
+            }
             used += needed;
         }
         fuse_reply_buf(request, buffer.data(), used);
@@ -174,16 +180,18 @@ void Open(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
         info->noflush = 1;   // nothing happens at close
         info->fh = 0;
         if (inode == kStateInode) {
-            if ((info->flags & O_ACCMODE) != O_RDONLY)
+            if ((info->flags & O_ACCMODE) != O_RDONLY) {
                 return EACCES;
+            }
             StateText text = CurrentState(served);
             const std::lock_guard<std::mutex> hold(served.openStates.mutex);
             info->fh = ++served.openStates.lastHandle;
             served.openStates.texts.emplace(info->fh, std::move(text));
         }
         // Whoever gave up waiting never closes the file that it did not get.
-        if (fuse_reply_open(request, info) != 0)
+        if (fuse_reply_open(request, info) != 0) {
             CloseState(served, info->fh);
+        }
         return 0;
     });
 }
@@ -211,8 +219,9 @@ void Read(fuse_req_t request, fuse_ino_t inode, size_t size, off_t offset,
         };
         const int64_t result =
             CacheDeviceRead(Served(request).device, static_cast<uint64_t>(offset), size, reply);
-        if (result == 0)
+        if (result == 0) {
             fuse_reply_buf(request, nullptr, 0);
+        }
         return result < 0 ? static_cast<int>(-result) : 0;
     });
 }
@@ -220,12 +229,14 @@ void Read(fuse_req_t request, fuse_ino_t inode, size_t size, off_t offset,
 void Write(fuse_req_t request, fuse_ino_t inode, const char *buffer, size_t size, off_t offset,
            struct fuse_file_info *) {
     Guarded(request, [=] {
-        if (inode != kDeviceInode)
+        if (inode != kDeviceInode) {
             return EBADF;
+        }
         const int64_t result =
             CacheDeviceWrite(Served(request).device, static_cast<uint64_t>(offset), buffer, size);
-        if (result < 0)
+        if (result < 0) {
             return static_cast<int>(-result);
+        }
         fuse_reply_write(request, static_cast<size_t>(result));
         return 0;
     });
@@ -240,8 +251,9 @@ void Sync(fuse_req_t request, fuse_ino_t inode, int, struct fuse_file_info *) {
 void Ioctl(fuse_req_t request, fuse_ino_t inode, unsigned number, void *argument,
            struct fuse_file_info *, unsigned flags, const void *, size_t, size_t answerBytes) {
     Guarded(request, [=] {
-        if (inode != kDeviceInode)
+        if (inode != kDeviceInode) {
             return ENOTTY;
+        }
         std::array<unsigned char, 8> answer = {};
         PinRequest pin = {};
         pin.number = number;
@@ -250,8 +262,9 @@ void Ioctl(fuse_req_t request, fuse_ino_t inode, unsigned number, void *argument
                       sizeof(void *) == 4 || (flags & (FUSE_IOCTL_COMPAT | kIoctlFrom32Bit)) != 0};
         pin.data = answer.data();
         const int result = PinRequestHandle(Served(request).device, pin);
-        if (result != 0)
+        if (result != 0) {
             return -result;
+        }
         fuse_reply_ioctl(request, 0, answer.data(), std::min(answerBytes, answer.size()));
         return 0;
     });

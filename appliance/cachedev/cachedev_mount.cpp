@@ -34,8 +34,9 @@ SessionPtr MakeSession(ServedDevice &served) {
     const std::unique_ptr<struct fuse_args, ArgumentFreer> freeArguments(&arguments);
     for (const char *argument :
          {"veskcachedev", "-o", "fsname=veskcachedev,subtype=veskcachedev,default_permissions"}) {
-        if (fuse_opt_add_arg(&arguments, argument) != 0)
+        if (fuse_opt_add_arg(&arguments, argument) != 0) {
             return nullptr;
+        }
     }
     const struct fuse_lowlevel_ops operations = CachedevFuseOperations();
     return SessionPtr(fuse_session_new(&arguments, &operations, sizeof operations, &served));

@@ -40,8 +40,9 @@ const struct option kOptions[] = {
 
 // A whole text as a number up to `most`: decimal, or hexadecimal after 0x.
 bool ParseNumber(const std::string &text, uint64_t most, uint64_t &number) {
-    if (text.empty() || text[0] < '0' || text[0] > '9') // strtoull would take a sign and spaces
+    if (text.empty() || text[0] < '0' || text[0] > '9') { // strtoull would take a sign and spaces
         return false;
+    }
     char *end = nullptr;
     errno = 0;
     const bool isHex = text.compare(0, 2, "0x") == 0;
@@ -54,15 +55,17 @@ bool ParseFault(const std::string &text, uint64_t mostNumber, uint64_t &number, 
     const size_t colon = text.find(':');
     uint64_t errorNumber = 0;
     if (colon == std::string::npos || !ParseNumber(text.substr(0, colon), mostNumber, number) ||
-        !ParseNumber(text.substr(colon + 1), kMostErrno, errorNumber) || errorNumber == 0)
+        !ParseNumber(text.substr(colon + 1), kMostErrno, errorNumber) || errorNumber == 0) {
         return false;
+    }
     error = static_cast<int>(errorNumber);
     return true;
 }
 
 bool ParseDevice(const std::string &text, CachedevOptions &options) {
-    if (text.empty())
+    if (text.empty()) {
         return false;
+    }
     const std::filesystem::path path = std::filesystem::absolute(text).lexically_normal();
     options.folder = path.parent_path().string();
     options.deviceName = path.filename().string();
@@ -70,8 +73,9 @@ bool ParseDevice(const std::string &text, CachedevOptions &options) {
 }
 
 bool ParsePidFile(const std::string &text, std::string &pidFile) {
-    if (text.empty())
+    if (text.empty()) {
         return false;
+    }
     pidFile = std::filesystem::absolute(text).string();
     return true;
 }
@@ -79,8 +83,9 @@ bool ParsePidFile(const std::string &text, std::string &pidFile) {
 bool ApplyFailIoctl(const std::string &text, CacheFaults &faults) {
     uint64_t number = 0;
     int error = 0;
-    if (!ParseFault(text, UINT32_MAX, number, error))
+    if (!ParseFault(text, UINT32_MAX, number, error)) {
         return false;
+    }
     faults.failRequest[static_cast<uint32_t>(number)] = error;
     return true;
 }
@@ -88,16 +93,18 @@ bool ApplyFailIoctl(const std::string &text, CacheFaults &faults) {
 bool ApplyFailRead(const std::string &text, CacheFaults &faults) {
     uint64_t offset = 0;
     int error = 0;
-    if (!ParseFault(text, UINT64_MAX, offset, error))
+    if (!ParseFault(text, UINT64_MAX, offset, error)) {
         return false;
+    }
     faults.failRead[offset] = error;
     return true;
 }
 
 bool ApplyMissDelay(const std::string &text, unsigned &milliseconds) {
     uint64_t number = 0;
-    if (!ParseNumber(text, kMostDelayMs, number))
+    if (!ParseNumber(text, kMostDelayMs, number)) {
         return false;
+    }
     milliseconds = static_cast<unsigned>(number);
     return true;
 }
@@ -144,8 +151,9 @@ int CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
             return -1;
         }
     }
-    if (options.help)
+    if (options.help) {
         return 0;
+    }
     if (optind < argc) {
         error = std::string("unexpected argument ") + argv[optind];
         return -1;

@@ -12,13 +12,15 @@ using TransferCall = ssize_t (*)(pid_t, const struct iovec *, unsigned long, con
 
 // One call moves at most about 2 GiB and may stop early, at a page that is not there.
 int Transfer(TransferCall call, const Caller &caller, uint64_t address, void *buffer, size_t size) {
-    if (caller.pid <= 0)
+    if (caller.pid <= 0) {
         return -EFAULT;
+    }
     constexpr size_t kMostBytes = 1U << 30U;
     for (size_t done = 0; done < size;) {
         const uint64_t remoteAddress = address + done;
-        if (remoteAddress < address || remoteAddress > UINTPTR_MAX)
+        if (remoteAddress < address || remoteAddress > UINTPTR_MAX) {
             return -EFAULT;
+        }
         const size_t step = std::min(size - done, kMostBytes);
         const struct iovec local = {static_cast<char *>(buffer) + done, step};
         // A pointer of another process: never dereferenced here.
@@ -26,8 +28,9 @@ int Transfer(TransferCall call, const Caller &caller, uint64_t address, void *bu
         void *const there = reinterpret_cast<void *>(static_cast<uintptr_t>(remoteAddress));
         const struct iovec remote = {there, step};
         const ssize_t moved = call(caller.pid, &local, 1, &remote, 1, 0);
-        if (moved <= 0)
+        if (moved <= 0) {
             return -EFAULT;
+        }
         done += static_cast<size_t>(moved);
     }
     return 0;

@@ -24,8 +24,9 @@ struct PidFile {
     std::string path; // empty: none
     PidFile() = default;
     ~PidFile() {
-        if (!path.empty())
+        if (!path.empty()) {
             unlink(path.c_str());
+        }
     }
     PidFile(const PidFile &) = delete;
     PidFile &operator=(const PidFile &) = delete;
@@ -34,8 +35,9 @@ struct PidFile {
 int WritePidFile(const std::string &path, PidFile &file) {
     std::ofstream stream(path, std::ios::trunc);
     stream << getpid() << '\n';
-    if (!stream.flush())
+    if (!stream.flush()) {
         return -1;
+    }
     file.path = path;
     return 0;
 }
@@ -43,26 +45,31 @@ int WritePidFile(const std::string &path, PidFile &file) {
 int Run(int argc, char **argv) {
     CachedevOptions options;
     std::string error;
-    if (CachedevOptionsParse(argc, argv, options, error) != 0)
+    if (CachedevOptionsParse(argc, argv, options, error) != 0) {
         return Fail(error + "\nTry 'veskcachedev --help'.");
+    }
     if (options.help) {
         fputs(CachedevUsage(), stdout);
         return fflush(stdout) == 0 ? 0 : 1;
     }
     Background background;
-    if (!options.foreground && BackgroundStart(background) != 0)
+    if (!options.foreground && BackgroundStart(background) != 0) {
         return 1;
+    }
 
     CacheDevice device;
     device.settings = options.settings;
-    if (CacheImagesOpen(options.backingPath, options.ssdPath, device.images, error) != 0)
+    if (CacheImagesOpen(options.backingPath, options.ssdPath, device.images, error) != 0) {
         return Fail(error);
+    }
     CacheDeviceStart(device);
-    if (CachedevPrepareFolder(options.folder, error) != 0)
+    if (CachedevPrepareFolder(options.folder, error) != 0) {
         return Fail(error);
+    }
     PidFile pidFile;
-    if (!options.pidFile.empty() && WritePidFile(options.pidFile, pidFile) != 0)
+    if (!options.pidFile.empty() && WritePidFile(options.pidFile, pidFile) != 0) {
         return Fail("cannot write " + options.pidFile + ": " + strerror(errno));
+    }
 
     ServedDevice served = {device,
                            options.deviceName,
@@ -72,8 +79,9 @@ int Run(int argc, char **argv) {
                            {}};
     const int result = CachedevServe(served, options.folder);
     const int synced = CacheImagesSyncAll(device.images);
-    if (synced != 0)
+    if (synced != 0) {
         return Fail(std::string("cannot sync the images: ") + strerror(-synced));
+    }
     return result == 0 ? 0 : 1;
 }
 

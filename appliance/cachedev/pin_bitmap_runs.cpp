@@ -7,8 +7,9 @@ constexpr uint64_t kByteBits = 8;
 } // namespace
 
 bool PinBitmapTest(const std::vector<uint8_t> &bitmap, uint64_t block) {
-    if (block / kByteBits >= bitmap.size())
+    if (block / kByteBits >= bitmap.size()) {
         return false;
+    }
     const unsigned byte = bitmap[static_cast<size_t>(block / kByteBits)];
     return ((byte >> (block % kByteBits)) & 1U) != 0;
 }
@@ -19,8 +20,9 @@ std::vector<BlockRun> PinBitmapRuns(const std::vector<uint8_t> &bitmap) {
     const uint64_t bits = uint64_t{bitmap.size()} * kByteBits;
     uint64_t bit = 0;
     const auto close = [&] {
-        if (open > 0)
+        if (open > 0) {
             runs.push_back({bit - open, open});
+        }
         open = 0;
     };
     while (bit < bits) {
@@ -33,10 +35,11 @@ std::vector<BlockRun> PinBitmapRuns(const std::vector<uint8_t> &bitmap) {
             open += kByteBits;
             bit += kByteBits;
         } else {
-            if (((byte >> (bit % kByteBits)) & 1U) == 0)
+            if (((byte >> (bit % kByteBits)) & 1U) == 0) {
                 close();
-            else
+            } else {
                 ++open;
+            }
             ++bit;
         }
     }

@@ -9,35 +9,42 @@ int SetBitmap(CacheDevice &device, const PinRequest &request) {
     unsigned char bytes[kDescriptorBytes64] = {};
     const bool is32bit = request.caller.is32bit;
     int result = CallerRead(request.caller, request.argument, bytes, DescriptorBytes(is32bit));
-    if (result != 0)
+    if (result != 0) {
         return result;
+    }
     const BitmapDescriptor descriptor = DescriptorDecode(bytes, is32bit);
     // Compared before anything of that length is allocated.
-    if (descriptor.length != CacheDeviceBitmapBytes(device))
+    if (descriptor.length != CacheDeviceBitmapBytes(device)) {
         return -EINVAL;
+    }
     std::vector<uint8_t> bitmap(descriptor.length);
     result = CallerRead(request.caller, descriptor.address, bitmap.data(), bitmap.size());
-    if (result == 0)
+    if (result == 0) {
         CacheDeviceSetBitmap(device, std::move(bitmap));
+    }
     return result;
 }
 
 int UnpinRanges(CacheDevice &device, const PinRequest &request) {
     std::vector<SectorRange> ranges(kRangeListRecords);
     const int result = CallerRead(request.caller, request.argument, ranges.data(), kRangeListBytes);
-    if (result != 0)
+    if (result != 0) {
         return result;
+    }
     size_t used = 0;
-    while (used < ranges.size() && (ranges[used].startSector != 0 || ranges[used].sectorCount != 0))
+    while (used < ranges.size() &&
+           (ranges[used].startSector != 0 || ranges[used].sectorCount != 0)) {
         ++used;
+    }
     ranges.resize(used);
     return CacheDeviceUnpinRanges(device, ranges);
 }
 
 int Answer(const PinRequest &request, bool value) {
     const int32_t answer = value ? 1 : 0;
-    if (request.data == nullptr)
+    if (request.data == nullptr) {
         return -EFAULT;
+    }
     memcpy(request.data, &answer, sizeof answer);
     return 0;
 }
@@ -47,8 +54,9 @@ int Answer(const PinRequest &request, bool value) {
 // and have to agree.
 int GetSize(const CacheDevice &device, const PinRequest &request) {
     const uint64_t bytes = device.images.deviceBytes;
-    if (request.data == nullptr)
+    if (request.data == nullptr) {
         return -EFAULT;
+    }
     if (request.number == kRequestGetSize64Bit) {
         memcpy(request.data, &bytes, sizeof bytes);
         return 0;

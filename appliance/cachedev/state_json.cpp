@@ -19,8 +19,9 @@ Json::Value Pair(uint64_t first, uint64_t second) {
 
 Json::Value RunArray(const std::vector<BlockRun> &runs) {
     Json::Value array(Json::arrayValue);
-    for (const BlockRun &run : runs)
+    for (const BlockRun &run : runs) {
         array.append(Pair(run.first, run.count));
+    }
     return array;
 }
 
@@ -51,8 +52,9 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     state["pinnedBlocks"] = Number(snapshot.pinnedBlocks);
     state["cachedBlocks"] = Number(snapshot.cachedBlocks);
     Json::Value &slotBlocks = state["slotBlocks"] = Json::Value(Json::arrayValue);
-    for (const uint64_t block : snapshot.slotBlocks)
+    for (const uint64_t block : snapshot.slotBlocks) {
         slotBlocks.append(block == kNoBlock ? Json::Value(-1) : Number(block));
+    }
     state["hits"] = Number(snapshot.counters.hits);
     state["misses"] = Number(snapshot.counters.misses);
     state["ssdReads"] = Number(snapshot.counters.ssdReads);
@@ -61,8 +63,9 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     state["evictions"] = Number(snapshot.evictions);
     state["ioctls"] = RequestCounts(snapshot.requests);
     Json::Value &lastUnpin = state["lastUnpin"] = Json::Value(Json::arrayValue);
-    for (const SectorRange &range : snapshot.lastUnpin)
+    for (const SectorRange &range : snapshot.lastUnpin) {
         lastUnpin.append(Pair(range.startSector, range.sectorCount));
+    }
 
     Json::StreamWriterBuilder writer;
     writer["indentation"] = ""; // one line: some thousand slots are polled often

@@ -17,8 +17,7 @@ volume_make() {
     mkdir -p "/tmp/volume$n"
     truncate -s "$size" "/tmp/volume$n/backing"
     truncate -s "$ssd_size" "/tmp/volume$n/ssd"
-    "$BIN/veskcachedev" --device "$device" --backing "/tmp/volume$n/backing" \
-        --ssd "/tmp/volume$n/ssd" "$@"
+    volume_serve --device "$device" --backing "/tmp/volume$n/backing" --ssd "/tmp/volume$n/ssd" "$@"
     loop=$(losetup --find --show "$device")
     case "$fstype" in
     ext*) "mkfs.$fstype" -q -b 4096 "$loop" ;;
@@ -30,6 +29,18 @@ volume_make() {
     losetup --detach "$loop"
     echo "$loop" >"/tmp/volume$n/loop"
     volume_configure
+}
+
+# volume_serve VESKCACHEDEV_OPTION...: a cache device below /run.
+#
+# The daemon gets a mount namespace of its own, in which no volume is mounted; only what it mounts below
+# /run is seen here. Were it the last process of the world's namespace to end, as happens when all are
+# killed, its exit would unmount the volume, and that waits for the daemon itself, for ever.
+volume_serve() {
+    mount --make-shared /run
+    # shellcheck disable=SC2016
+    unshare --mount --propagation unchanged -- \
+        sh -c 'umount /volume? 2>/dev/null; exec "$0" "$@"' "$BIN/veskcachedev" "$@"
 }
 
 volume_loop() { cat "/tmp/volume$1/loop"; }

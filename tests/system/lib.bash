@@ -30,9 +30,9 @@ says() {
     expect_output "$1" /dev/null tool --stdout "${@:2}"
 }
 
-# The same with --stdout and --verbose or --debug; the numbers of source lines and addresses, which
-# any change of the sources moves, are written as N and ADDRESS.
-says_verbosely() {
+# The same, with what differs from build to build written as N (the lines of the sources, in the long
+# forms) and ADDRESS.
+says_masked() {
     expect_output "$1" mask_numbers tool --stdout "${@:2}"
 }
 
@@ -107,17 +107,17 @@ map_cache() {
         "$1" "$2" >"$VESK_FLASHCACHE_CONFIG"
 }
 
-# spare_device NAME SIZE [veskcachedev option...]: a cache device that no volume lies on, with 16 MiB
-# of cache; prints its path. With map_cache it takes the place of a volume's own.
+# spare_device NAME SIZE [veskcachedev option...]: a cache device that no volume lies on, with SSD_SIZE
+# (16M) of cache; prints its path. With map_cache it takes the place of a volume's own.
 spare_device() {
     local name=$1 size=$2
     shift 2
     mkdir -p "/tmp/$name"
     truncate -s "$size" "/tmp/$name/backing"
-    truncate -s 16M "/tmp/$name/ssd"
+    truncate -s "${SSD_SIZE:-16M}" "/tmp/$name/ssd"
     (
         close_descriptors
-        exec "$BIN/veskcachedev" --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \
+        volume_serve --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \
             --ssd "/tmp/$name/ssd" "$@"
     )
     echo "/run/$name/cachedev"
@@ -134,6 +134,20 @@ close_descriptors() {
         fd=${fd##*/}
         [ "$fd" -le 2 ] || [ "$fd" -eq 255 ] || eval "exec $fd>&-"
     done
+}
+
+# Volume 1 as it was made, no queue, no configuration file; the current folder is the volume.
+fresh_volume() {
+    volume_configure
+    find /volume1 -mindepth 1 -maxdepth 1 ! -name lost+found -exec rm -rf {} +
+    tool --unpin-all --mount-path /volume1
+    fresh_service
+    cd /volume1 || return
+}
+fresh_service() {
+    rm -rf "${CONF%/*}"
+    mkdir -p "${CONF%/*}"
+    remove_queues
 }
 
 # Every file's end of a test: no service is left over, and a failed test shows what it wrote.

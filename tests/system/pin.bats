@@ -6,13 +6,7 @@ load lib
 
 setup_file() { make_volume 1 "$SIZE" 16M "$FSTYPE"; }
 
-setup() {
-    find /volume1 -mindepth 1 -maxdepth 1 ! -name lost+found -exec rm -rf {} +
-    rm -rf "${CONF%/*}"
-    remove_queues
-    tool --unpin-all --mount-path /volume1
-    cd /volume1 || return
-}
+setup() { fresh_volume; }
 
 # The files are all that is pinned on volume 1: in the bitmap file, in the driver, in the records,
 # and their written blocks on the SSD.

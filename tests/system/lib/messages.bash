@@ -27,7 +27,7 @@ send_raw() { "$HELPERS/system_message" send "$KEY_FILE" "$@"; }
 receive_raw() { "$HELPERS/system_message" receive "$KEY_FILE" "$1"; }
 
 messages_waiting() { awk 'NR > 1 { sum += $5 } END { print sum + 0 }' /proc/sysvipc/msg; }
-queue_is_read() { [ "$(messages_waiting)" -eq 0 ]; }
+waiting_is() { [ "$(messages_waiting)" -eq "$1" ]; }
 
 # Removes every queue of this private world, and the key file.
 remove_queues() {

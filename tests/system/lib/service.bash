@@ -2,12 +2,11 @@
 # writes is buffered and complete only once it has ended.
 # shellcheck shell=bash
 
-SERVICE_LOG=/run/pin/service.log
+SERVICE_LOG=/run/service.log
 
 # start_service [OPTION...]: with --stdout; leaves the process id in SERVICE_PID. Ready for requests
 # and signals when it returns.
 start_service() {
-    mkdir -p "${CONF%/*}"
     (
         close_descriptors
         exec "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout "$@"
@@ -69,6 +68,7 @@ request_is_done() {
     jq -e --argjson n "$1" '.nextRequestNum > $n and
         (.requestQueue | index($n | tostring) | not)' "$CONF" >/dev/null 2>&1
 }
+config_has() { jq -e "$1" "$CONF" >/dev/null 2>&1; }
 queue_is_empty() { jq -e '.requestQueue | length == 0' "$CONF" >/dev/null 2>&1; }
 
 # join FILE...: the form of the files argument.

@@ -46,8 +46,9 @@ TEST_F(BlockCacheTest, FillsFreeSlotsInOrder) {
 }
 
 TEST_F(BlockCacheTest, EvictsTheLeastRecentlyUsed) {
-    for (const uint64_t block : {1U, 2U, 3U})
+    for (const uint64_t block : {1U, 2U, 3U}) {
         Load(cache, block);
+    }
     Use(cache, 1);
     EXPECT_EQ(Load(cache, 4), 1U); // the slot of block 2
     EXPECT_TRUE(Has(1));
@@ -69,8 +70,9 @@ TEST_F(BlockCacheTest, BlockZeroAndHugeBlockNumbersAreOrdinary) {
 }
 
 TEST_F(BlockCacheTest, NeverEvictsPinnedOrUsedBlocks) {
-    for (const uint64_t block : {1U, 2U, 3U})
+    for (const uint64_t block : {1U, 2U, 3U}) {
         Load(cache, block);
+    }
     Pin(cache, 1);
     BlockCacheUse(cache, BlockCacheFind(cache, 2));
     EXPECT_EQ(Load(cache, 4), 2U);
@@ -84,8 +86,9 @@ TEST_F(BlockCacheTest, NeverEvictsPinnedOrUsedBlocks) {
 }
 
 TEST_F(BlockCacheTest, UnpinnedBlocksKeepTheirPlaceInTheOrderOfUse) {
-    for (const uint64_t block : {1U, 2U, 3U})
+    for (const uint64_t block : {1U, 2U, 3U}) {
         Load(cache, block);
+    }
     Pin(cache, 2);
     Use(cache, 1);
     Use(cache, 3);

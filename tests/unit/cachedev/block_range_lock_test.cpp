@@ -17,8 +17,9 @@ void AwaitQueue(BlockRangeLock &lock, size_t count) {
     while (std::chrono::steady_clock::now() < deadline) {
         {
             const std::lock_guard<std::mutex> hold(lock.mutex);
-            if (lock.queue.size() >= count)
+            if (lock.queue.size() >= count) {
                 return;
+            }
         }
         std::this_thread::yield();
     }
@@ -77,19 +78,23 @@ TEST(BlockRangeLockTest, OneHolderPerBlockAtATime) {
     const auto work = [&](unsigned seed) {
         for (int i = 0; i < 2000; ++i) {
             seed = seed * 1664525U + 1013904223U;
-            const uint64_t first = (seed >> 8U) % kBlocks;
-            const uint64_t last = first + (seed >> 16U) % (kBlocks - first);
+            const size_t first = (seed >> 8U) % kBlocks;
+            const size_t last = first + (seed >> 16U) % (kBlocks - first);
             const BlockRangeGuard guard(lock, {first, last});
-            for (uint64_t block = first; block <= last; ++block)
+            for (size_t block = first; block <= last; ++block) {
                 clashes += holders[block]++ != 0 ? 1 : 0;
-            for (uint64_t block = first; block <= last; ++block)
+            }
+            for (size_t block = first; block <= last; ++block) {
                 --holders[block];
+            }
         }
     };
     std::vector<std::thread> threads;
-    for (unsigned seed = 1; seed <= 4; ++seed)
+    for (unsigned seed = 1; seed <= 4; ++seed) {
         threads.emplace_back(work, seed);
-    for (std::thread &thread : threads)
+    }
+    for (std::thread &thread : threads) {
         thread.join();
+    }
     EXPECT_EQ(clashes, 0);
 }

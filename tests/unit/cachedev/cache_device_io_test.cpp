@@ -26,10 +26,12 @@ void ExpectSlotsAgree(TestDevice &test) {
     const std::string ssd = TestReadFile(test.ssdPath);
     const Blocks slots = CacheDeviceSnapshot(test.device).slotBlocks;
     for (size_t slot = 0; slot < slots.size(); ++slot) {
-        if (slots[slot] == kNoBlock)
+        if (slots[slot] == kNoBlock) {
             continue;
-        const std::string block = backing.substr(slots[slot] * kBlockBytes, kBlockBytes);
-        EXPECT_EQ(ssd.compare(slot * kBlockBytes, block.size(), block), 0)
+        }
+        const auto start = static_cast<size_t>(slots[slot] * kBlockBytes);
+        const std::string block = backing.substr(start, kBlockBytes);
+        EXPECT_EQ(ssd.compare(static_cast<size_t>(slot * kBlockBytes), block.size(), block), 0)
             << "block " << slots[slot] << " in slot " << slot;
     }
 }
@@ -45,10 +47,11 @@ TEST(CacheDeviceReadTest, AnyOffsetAndSizeGivesTheBackingBytes) {
              {uint64_t{1}, uint64_t{511}, kBlockBytes, kBlockBytes + 1, 3 * kBlockBytes, end}) {
             const auto expected = static_cast<size_t>(std::min(size, end - offset));
             // Twice: as misses and, as far as it fits, as hits.
-            for (int i = 0; i < 2; ++i)
+            for (int i = 0; i < 2; ++i) {
                 EXPECT_EQ(TestRead(test.device, offset, static_cast<size_t>(size)),
                           TestBytes(offset, expected))
                     << offset << " " << size;
+            }
         }
     }
     ExpectSlotsAgree(test);
@@ -118,7 +121,7 @@ TEST(CacheDeviceWriteTest, WritesThroughAndUpdatesWhatIsCached) {
     TestTouch(test.device, {4, 1, 6}); // among them the partial block at the end
     std::string expected = TestBytes(0, 6 * kBlockBytes + 512);
     struct {
-        uint64_t offset;
+        size_t offset;
         size_t size;
     } const writes[] = {{kBlockBytes + 10, 20},
                         {kBlockBytes - 5, 10},
@@ -223,15 +226,16 @@ TEST(CacheDeviceDelayTest, OnlyMissesAreDelayedAndNobodyElseWaits) {
 }
 
 TEST(CacheDeviceRandomTest, AgreesWithAPlainFile) {
-    constexpr uint64_t kBytes = 23 * kBlockBytes + 3 * 512;
+    constexpr size_t kBytes = 23 * kBlockBytes + 3 * kSectorBytes;
     for (const uint32_t slots : {1U, 5U, 24U}) {
         TestDevice test(kBytes, slots);
         std::string expected = TestBytes(0, kBytes);
         std::mt19937 random(slots);
         for (int i = 0; i < 1500; ++i) {
-            const uint64_t offset = random() % kBytes;
+            const size_t offset = random() % kBytes;
             const uint64_t most = random() % 4 == 0 ? 20 * kBlockBytes : 2 * kBlockBytes;
-            const auto size = static_cast<size_t>(std::min(random() % most + 1, kBytes - offset));
+            const auto size =
+                static_cast<size_t>(std::min<uint64_t>(random() % most + 1, kBytes - offset));
             switch (random() % 5) {
             case 0: {
                 const std::string bytes(size, static_cast<char>(random()));

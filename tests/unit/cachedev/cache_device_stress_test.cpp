@@ -16,8 +16,9 @@
 
 namespace {
 
-constexpr uint64_t kBlocks = 40;
-constexpr uint64_t kDeviceBytes = (kBlocks - 1) * kBlockBytes + 8192; // the last block is partial
+constexpr size_t kBytes = kBlockBytes;
+constexpr size_t kBlocks = 40;
+constexpr size_t kDeviceBytes = (kBlocks - 1) * kBytes + 8192; // the last block is partial
 constexpr int kRounds = 300;
 
 // A block's content is one version number, repeated. A writer announces a version before it writes
@@ -34,55 +35,59 @@ struct Stress {
 
     Stress() {
         const std::string zeros(kDeviceBytes, '\0');
-        if (CacheDeviceWrite(test.device, 0, zeros.data(), zeros.size()) < 0)
+        if (CacheDeviceWrite(test.device, 0, zeros.data(), zeros.size()) < 0) {
             ++failed;
+        }
     }
 };
 
-uint64_t BlockBytes(uint64_t block) {
-    return std::min(kBlockBytes, kDeviceBytes - block * kBlockBytes);
+size_t BlockBytes(size_t block) {
+    return std::min(kBytes, kDeviceBytes - block * kBytes);
 }
 
-void CheckBlock(Stress &stress, uint64_t block, const std::string &bytes, uint32_t oldest) {
+void CheckBlock(Stress &stress, size_t block, const std::string &bytes, uint32_t oldest) {
     uint32_t version = 0;
     memcpy(&version, bytes.data(), sizeof version);
-    for (size_t i = 0; i + sizeof version <= bytes.size(); i += sizeof version)
+    for (size_t i = 0; i + sizeof version <= bytes.size(); i += sizeof version) {
         stress.torn += memcmp(&bytes[i], &version, sizeof version) != 0 ? 1 : 0;
+    }
     stress.stale += version < oldest || version > stress.announced[block] ? 1 : 0;
 }
 
-void ReadOnce(Stress &stress, uint64_t first, uint64_t count) {
+void ReadOnce(Stress &stress, size_t first, size_t count) {
     std::array<uint32_t, kBlocks> oldest{};
-    for (uint64_t i = 0; i < count; ++i)
+    for (size_t i = 0; i < count; ++i) {
         oldest[i] = stress.confirmed[first + i];
-    const std::string bytes =
-        TestRead(stress.test.device, first * kBlockBytes, static_cast<size_t>(count * kBlockBytes));
-    for (uint64_t i = 0; i < count; ++i)
-        CheckBlock(stress, first + i, bytes.substr(i * kBlockBytes, BlockBytes(first + i)),
-                   oldest[i]);
+    }
+    const std::string bytes = TestRead(stress.test.device, first * kBytes, count * kBytes);
+    for (size_t i = 0; i < count; ++i) {
+        CheckBlock(stress, first + i, bytes.substr(i * kBytes, BlockBytes(first + i)), oldest[i]);
+    }
 }
 
 void Reader(Stress &stress, unsigned seed) {
     std::mt19937 random(seed);
     for (int i = 0; i < kRounds; ++i) {
-        const uint64_t first = random() % kBlocks;
-        const uint64_t most = std::min<uint64_t>(kBlocks - first, random() % 8 == 0 ? 20 : 2);
+        const size_t first = random() % kBlocks;
+        const size_t most = std::min<size_t>(kBlocks - first, random() % 8 == 0 ? 20 : 2);
         ReadOnce(stress, first, random() % most + 1);
     }
 }
 
 // Each writer has its own blocks: `part` of two.
-void Writer(Stress &stress, uint64_t part) {
+void Writer(Stress &stress, size_t part) {
     std::mt19937 random(static_cast<unsigned>(part));
     for (int i = 0; i < kRounds; ++i) {
-        const uint64_t block = random() % (kBlocks / 2) * 2 + part;
+        const size_t block = random() % (kBlocks / 2) * 2 + part;
         const uint32_t version = ++stress.announced[block];
         std::string bytes(BlockBytes(block), '\0');
-        for (size_t at = 0; at < bytes.size(); at += sizeof version)
+        for (size_t at = 0; at < bytes.size(); at += sizeof version) {
             memcpy(&bytes[at], &version, sizeof version);
-        if (CacheDeviceWrite(stress.test.device, block * kBlockBytes, bytes.data(), bytes.size()) !=
-            static_cast<int64_t>(bytes.size()))
+        }
+        if (CacheDeviceWrite(stress.test.device, block * kBytes, bytes.data(), bytes.size()) !=
+            static_cast<int64_t>(bytes.size())) {
             ++stress.failed;
+        }
         stress.confirmed[block] = version;
     }
 }
@@ -92,8 +97,9 @@ void Requester(Stress &stress, unsigned seed) {
     std::vector<SectorRange> ranges(kRangeListRecords);
     while (!stress.stop) {
         std::vector<uint8_t> bitmap(kDeviceBytes >> kBitmapShift);
-        for (uint8_t &byte : bitmap)
-            byte = static_cast<uint8_t>(random() & random());
+        for (uint8_t &byte : bitmap) {
+            byte = static_cast<uint8_t>(1U << (random() % 16)); // every other one is 0
+        }
         unsigned char descriptor[kDescriptorBytes64] = {};
         const uint64_t address = reinterpret_cast<uintptr_t>(bitmap.data());
         const bool is32bit = sizeof(void *) == 4;
@@ -122,13 +128,16 @@ void Watcher(Stress &stress) {
     while (!stress.stop) {
         const CacheSnapshot snapshot = CacheDeviceSnapshot(stress.test.device);
         uint64_t cached = 0;
-        for (const uint64_t block : snapshot.slotBlocks)
+        for (const uint64_t block : snapshot.slotBlocks) {
             cached += block != kNoBlock ? 1 : 0;
+        }
         uint64_t pinned = 0;
-        for (const BlockRun &run : snapshot.pinned)
+        for (const BlockRun &run : snapshot.pinned) {
             pinned += run.count;
-        if (cached != snapshot.cachedBlocks || pinned != snapshot.pinnedBlocks || pinned > cached)
+        }
+        if (cached != snapshot.cachedBlocks || pinned != snapshot.pinnedBlocks || pinned > cached) {
             ++stress.failed;
+        }
         std::this_thread::yield();
     }
 }
@@ -142,23 +151,28 @@ TEST(CacheDeviceStressTest, NobodySeesTornOrStaleData) {
     endless.emplace_back(Requester, std::ref(stress), 12);
     endless.emplace_back(Watcher, std::ref(stress));
     std::vector<std::thread> workers;
-    for (unsigned seed = 1; seed <= 3; ++seed)
+    for (unsigned seed = 1; seed <= 3; ++seed) {
         workers.emplace_back(Reader, std::ref(stress), seed);
-    for (uint64_t part = 0; part < 2; ++part)
+    }
+    for (size_t part = 0; part < 2; ++part) {
         workers.emplace_back(Writer, std::ref(stress), part);
-    for (std::thread &worker : workers)
+    }
+    for (std::thread &worker : workers) {
         worker.join();
+    }
     stress.stop = true;
-    for (std::thread &thread : endless)
+    for (std::thread &thread : endless) {
         thread.join();
+    }
     EXPECT_EQ(stress.torn, 0);
     EXPECT_EQ(stress.stale, 0);
     EXPECT_EQ(stress.failed, 0);
 
     // Nothing is left in use, and what the slots hold is what the device holds.
     CacheDeviceUnpinAll(stress.test.device);
-    for (uint64_t block = 0; block < kBlocks; ++block)
+    for (size_t block = 0; block < kBlocks; ++block) {
         ReadOnce(stress, block, 1);
+    }
     EXPECT_EQ(TestCached(stress.test.device),
               (std::vector<uint64_t>{kBlocks - 6, kBlocks - 5, kBlocks - 4, kBlocks - 3,
                                      kBlocks - 2, kBlocks - 1}));

@@ -1,5 +1,6 @@
 #include "cachedev/cache_images.h"
 
+#include "cachedev/driver_requests.h"
 #include "test_device.h"
 
 #include <gtest/gtest.h>
@@ -28,10 +29,10 @@ ImagePieces Piece(std::string &bytes) {
 } // namespace
 
 TEST_F(CacheImagesTest, SizesAreTaken) {
-    TestMakeFile(Path("backing"), 512 * 131);
+    TestMakeFile(Path("backing"), kSectorBytes * 131);
     TestMakeFile(Path("ssd"), 3 * kBlockBytes - 1);
     ASSERT_EQ(Open(), 0) << error;
-    EXPECT_EQ(images.deviceBytes, 512U * 131U);
+    EXPECT_EQ(images.deviceBytes, kSectorBytes * 131);
     EXPECT_EQ(images.slots, 2U);
 }
 
@@ -85,8 +86,9 @@ TEST_F(CacheImagesTest, TransfersGatherAndScatter) {
     std::string none;
     std::string two = "second";
     ImagePieces pieces;
-    for (std::string *part : {&none, &one, &none, &two, &none})
+    for (std::string *part : {&none, &one, &none, &two, &none}) {
         ImagePiecesAdd(pieces, part->data(), part->size());
+    }
     ASSERT_EQ(CacheImagesWriteBacking(images, 100, pieces), 0);
     EXPECT_EQ(TestReadFile(Path("backing")).substr(99, 11), std::string("\0onesecond\0", 11));
     std::string all(9, ' ');

@@ -15,8 +15,10 @@ struct OptionsTest : testing::Test {
     int Parse(std::vector<std::string> arguments) {
         arguments.insert(arguments.begin(), "veskcachedev");
         std::vector<char *> argv;
-        for (std::string &argument : arguments)
+        argv.reserve(arguments.size() + 1);
+        for (std::string &argument : arguments) {
             argv.push_back(argument.data());
+        }
         const int argc = static_cast<int>(argv.size());
         argv.push_back(nullptr);
         return CachedevOptionsParse(argc, argv.data(), options, error);
@@ -24,8 +26,9 @@ struct OptionsTest : testing::Test {
 
     // With the three that are always needed.
     int ParseMore(std::vector<std::string> arguments) {
-        for (const char *needed : {"--device=/run/vesk/cachedev_0", "--backing=b", "--ssd=s"})
+        for (const char *needed : {"--device=/run/vesk/cachedev_0", "--backing=b", "--ssd=s"}) {
             arguments.emplace_back(needed);
+        }
         return Parse(arguments);
     }
 };
@@ -86,8 +89,9 @@ TEST_F(OptionsTest, HelpNeedsNothing) {
     EXPECT_EQ(Parse({"--help"}), 0);
     EXPECT_TRUE(options.help);
     for (const char *name : {"--device", "--backing", "--ssd", "--miss-delay-ms", "--foreground",
-                             "--pid-file", "--fail-ioctl", "--fail-read", "--short-at", "--help"})
+                             "--pid-file", "--fail-ioctl", "--fail-read", "--short-at", "--help"}) {
         EXPECT_NE(std::string(CachedevUsage()).find(name), std::string::npos) << name;
+    }
 }
 
 TEST_F(OptionsTest, BadValuesAreNamed) {

@@ -25,8 +25,9 @@ TEST(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
     const pid_t child = fork();
     if (child == 0) {
         value = 42;
-        while (value == 42)
+        while (value == 42) {
             usleep(1000);
+        }
         _exit(value);
     }
     const Caller caller = {child, sizeof(void *) == 4};

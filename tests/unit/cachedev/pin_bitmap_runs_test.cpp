@@ -9,9 +9,10 @@ namespace {
 // Runs as text, "first+count ...".
 std::string Text(const std::vector<BlockRun> &runs) {
     std::string text;
-    for (const BlockRun &run : runs)
+    for (const BlockRun &run : runs) {
         text +=
             (text.empty() ? "" : " ") + std::to_string(run.first) + "+" + std::to_string(run.count);
+    }
     return text;
 }
 
@@ -19,8 +20,9 @@ std::string Text(const std::vector<BlockRun> &runs) {
 
 TEST(PinBitmapTestTest, LeastSignificantBitComesFirst) {
     const std::vector<uint8_t> bitmap = {0x01, 0x80, 0x00};
-    for (uint64_t block = 0; block < 24; ++block)
+    for (uint64_t block = 0; block < 24; ++block) {
         EXPECT_EQ(PinBitmapTest(bitmap, block), block == 0 || block == 15) << block;
+    }
 }
 
 TEST(PinBitmapTestTest, PastTheEndNothingIsSet) {
@@ -45,16 +47,18 @@ TEST(PinBitmapRunsTest, AgreesWithTheSingleBits) {
     for (int round = 0; round < 200; ++round) {
         std::vector<uint8_t> bitmap(random() % 12);
         const uint8_t choice[] = {0x00, 0xFF, 0x0F, 0xF0, static_cast<uint8_t>(random())};
-        for (uint8_t &byte : bitmap)
+        for (uint8_t &byte : bitmap) {
             byte = choice[random() % 5];
+        }
         std::vector<uint8_t> rebuilt(bitmap.size());
         uint64_t end = 0;
         for (const BlockRun &run : PinBitmapRuns(bitmap)) {
             EXPECT_GT(run.count, 0U);
             EXPECT_TRUE(end == 0 || run.first > end) << "adjacent or overlapping runs";
             end = run.first + run.count;
-            for (uint64_t bit = run.first; bit < end; ++bit)
+            for (auto bit = static_cast<size_t>(run.first); bit < end; ++bit) {
                 rebuilt.at(bit / 8) = static_cast<uint8_t>(rebuilt.at(bit / 8) | 1U << bit % 8);
+            }
         }
         EXPECT_EQ(rebuilt, bitmap);
     }

@@ -77,8 +77,9 @@ TEST_F(PinRequestsTest, SetsTheBitmap) {
 TEST_F(PinRequestsTest, RefusesABitmapOfAnotherLength) {
     const std::vector<uint8_t> bitmap(64, 0xFF);
     ASSERT_EQ(SendBlocks({5}), 0);
-    for (const uint32_t length : {0U, 7U, 9U, 64U, UINT32_MAX})
+    for (const uint32_t length : {0U, 7U, 9U, 64U, UINT32_MAX}) {
         EXPECT_EQ(SendBitmap(bitmap.data(), length), -EINVAL) << length;
+    }
     TestTouch(device, {4, 5});
     EXPECT_EQ(TestPinned(device), (Blocks{5}));
     EXPECT_EQ(Counts().refused, 5U);
@@ -120,8 +121,9 @@ TEST_F(PinRequestsTest, A32BitDescriptorIsReadAsSuch) {
 #endif
                            ,
                            -1, 0);
-    if (low == MAP_FAILED || reinterpret_cast<uintptr_t>(low) > UINT32_MAX)
+    if (low == MAP_FAILED || reinterpret_cast<uintptr_t>(low) > UINT32_MAX) {
         GTEST_SKIP() << "no memory below 4 GiB";
+    }
     memset(low, 0x81, 8);
     const uint32_t good[2] = {static_cast<uint32_t>(reinterpret_cast<uintptr_t>(low)), 8};
     EXPECT_EQ(Send(kRequestSetBitmap, good, nullptr, true), 0);
@@ -145,8 +147,9 @@ TEST_F(PinRequestsTest, UnpinsRangesUpToTheZeroRecord) {
 TEST_F(PinRequestsTest, AFullListNeedsNoZeroRecord) {
     ASSERT_EQ(SendBlocks({1, 2}), 0);
     TestTouch(device, {1, 2});
-    for (SectorRange &range : ranges)
+    for (SectorRange &range : ranges) {
         range = {kBlockSectors, 1};
+    }
     ranges.back() = {2 * kBlockSectors, 1};
     EXPECT_EQ(SendRanges(), 0);
     EXPECT_TRUE(TestPinned(device).empty());
@@ -193,8 +196,9 @@ TEST_F(PinRequestsTest, TellsTheSizeInBothEncodings) {
 TEST_F(PinRequestsTest, OtherNumbersAreUnknown) {
     int32_t answer = 0;
     for (const uint32_t number :
-         {0U, 0xFED2U, 0x8004FED0U, 0x8004FED1U, 0xC004FECFU, 0x0000FECEU, 0x1260U, UINT32_MAX})
+         {0U, 0xFED2U, 0x8004FED0U, 0x8004FED1U, 0xC004FECFU, 0x0000FECEU, 0x1260U, UINT32_MAX}) {
         EXPECT_EQ(Send(number, &answer, &answer), -ENOTTY) << number;
+    }
     EXPECT_EQ(Counts().refused, 8U);
 }
 

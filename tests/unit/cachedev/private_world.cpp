@@ -19,8 +19,9 @@ constexpr int kSkipped = 77;
 [[noreturn]] void RunBody(const std::function<void()> &body) {
     if (mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0 ||
         mount("world", "/run", "tmpfs", 0, nullptr) != 0 ||
-        mount("proc", "/proc", "proc", 0, nullptr) != 0)
+        mount("proc", "/proc", "proc", 0, nullptr) != 0) {
         SkipWorld("no private mounts");
+    }
     body();
     const bool failed = testing::Test::HasFailure();
     fflush(nullptr);
@@ -30,8 +31,9 @@ constexpr int kSkipped = 77;
 int StatusOf(pid_t child) {
     int status = 0;
     while (waitpid(child, &status, 0) < 0) {
-        if (errno != EINTR)
+        if (errno != EINTR) {
             return kFailed;
+        }
     }
     return WIFEXITED(status) ? WEXITSTATUS(status) : kFailed;
 }
@@ -39,8 +41,9 @@ int StatusOf(pid_t child) {
 // Makes the namespaces; the body runs in a child, since only children get into a new PID namespace.
 [[noreturn]] void EnterWorld(const std::function<void()> &body) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
-    if (unshare(CLONE_NEWNS | CLONE_NEWPID) != 0)
+    if (unshare(CLONE_NEWNS | CLONE_NEWPID) != 0) {
         SkipWorld("no namespaces");
+    }
     const pid_t first = fork();
     if (first == 0) {
         prctl(PR_SET_PDEATHSIG, SIGKILL);
@@ -58,17 +61,21 @@ void SkipWorld(const char *reason) {
 }
 
 void RunInPrivateWorld(const std::function<void()> &body) {
-    if (geteuid() != 0)
+    if (geteuid() != 0) {
         GTEST_SKIP() << "needs root";
-    if (access("/dev/fuse", R_OK | W_OK) != 0)
+    }
+    if (access("/dev/fuse", R_OK | W_OK) != 0) {
         GTEST_SKIP() << "needs /dev/fuse";
+    }
     fflush(nullptr);
     const pid_t child = fork();
     ASSERT_GE(child, 0);
-    if (child == 0)
+    if (child == 0) {
         EnterWorld(body);
+    }
     const int status = StatusOf(child);
-    if (status == kSkipped)
+    if (status == kSkipped) {
         GTEST_SKIP() << "what this test needs is not there, see above";
+    }
     EXPECT_EQ(status, 0) << "failed in its private world, see above";
 }

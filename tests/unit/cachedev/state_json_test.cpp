@@ -39,15 +39,18 @@ TEST(StateJsonTest, AFreshDevice) {
     EXPECT_EQ(state["slots"].asUInt(), 3U);
     EXPECT_TRUE(state["bitmapSet"].isBool());
     EXPECT_FALSE(state["bitmapSet"].asBool());
-    for (const char *name : {"bitmapBits", "pinned", "lastUnpin"})
+    for (const char *name : {"bitmapBits", "pinned", "lastUnpin"}) {
         EXPECT_EQ(Text(state[name]), "[]") << name;
+    }
     EXPECT_EQ(Text(state["slotBlocks"]), "[-1,-1,-1]");
     for (const char *name : {"pinnedBlocks", "cachedBlocks", "hits", "misses", "ssdReads",
-                             "backingReads", "writes", "evictions"})
+                             "backingReads", "writes", "evictions"}) {
         EXPECT_EQ(Text(state[name]), "0") << name;
+    }
     for (const char *name : {"setBitmap", "queryBitmapSet", "unpinRanges", "unpinAll",
-                             "queryAllUnpinned", "getSize", "refused"})
+                             "queryAllUnpinned", "getSize", "refused"}) {
         EXPECT_EQ(Text(state["ioctls"][name]), "0") << name;
+    }
     EXPECT_EQ(state["ioctls"].size(), 7U);
 }
 

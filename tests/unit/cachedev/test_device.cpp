@@ -11,8 +11,9 @@
 
 TestFolder::TestFolder() {
     char name[] = "/tmp/cachedev_test.XXXXXX";
-    if (mkdtemp(name) == nullptr)
+    if (mkdtemp(name) == nullptr) {
         throw std::runtime_error("no folder for the test");
+    }
     path = name;
 }
 
@@ -26,8 +27,9 @@ TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
     TestWriteFile(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(ssdPath, slots * kBlockBytes);
     std::string error;
-    if (CacheImagesOpen(backingPath, ssdPath, device.images, error) != 0)
+    if (CacheImagesOpen(backingPath, ssdPath, device.images, error) != 0) {
         throw std::runtime_error(error);
+    }
     CacheDeviceStart(device);
 }
 
@@ -38,8 +40,9 @@ char TestByte(uint64_t offset) {
 
 std::string TestBytes(uint64_t offset, size_t size) {
     std::string bytes(size, '\0');
-    for (size_t i = 0; i < size; ++i)
+    for (size_t i = 0; i < size; ++i) {
         bytes[i] = TestByte(offset + i);
+    }
     return bytes;
 }
 
@@ -63,9 +66,10 @@ std::string TestRead(CacheDevice &device, uint64_t offset, size_t size) {
     int calls = 0;
     const int64_t result = CacheDeviceRead(device, offset, size, [&](const ImagePieces &pieces) {
         ++calls;
-        for (int i = 0; i < pieces.count; ++i)
+        for (int i = 0; i < pieces.count; ++i) {
             bytes.append(static_cast<const char *>(pieces.parts[i].iov_base),
                          pieces.parts[i].iov_len);
+        }
     });
     EXPECT_EQ(calls, result > 0 ? 1 : 0);
     EXPECT_EQ(static_cast<int64_t>(bytes.size()), result);
@@ -77,8 +81,9 @@ int64_t TestReadResult(CacheDevice &device, uint64_t offset, size_t size) {
 }
 
 void TestTouch(CacheDevice &device, const std::vector<uint64_t> &blocks) {
-    for (const uint64_t block : blocks)
+    for (const uint64_t block : blocks) {
         EXPECT_EQ(TestReadResult(device, block * kBlockBytes, 1), 1) << "block " << block;
+    }
 }
 
 std::vector<uint8_t> TestBitmap(const CacheDevice &device, const std::vector<uint64_t> &blocks) {
@@ -100,8 +105,9 @@ std::vector<uint64_t> TestCached(CacheDevice &device) {
 std::vector<uint64_t> TestPinned(CacheDevice &device) {
     std::vector<uint64_t> blocks;
     for (const BlockRun &run : CacheDeviceSnapshot(device).pinned) {
-        for (uint64_t i = 0; i < run.count; ++i)
+        for (uint64_t i = 0; i < run.count; ++i) {
             blocks.push_back(run.first + i);
+        }
     }
     return blocks;
 }

@@ -5,6 +5,7 @@
 #include "cli/syslog_capture.h"
 #include "support/captured_log.h"
 
+#include <cerrno>
 #include <gtest/gtest.h>
 
 namespace {
@@ -85,14 +86,25 @@ TEST_F(LogToSystemLog, TraceHasTheLongForm) {
 }
 
 TEST_F(LogToSystemLog, EveryClassHasErrorPriorityAndNoFacility) {
-    LogLevel = 3;
-    ReportError();
-    ReportNotice();
-    ReportVerbose();
-    ReportDebug();
-    ASSERT_EQ(SyslogRecords().size(), 4U);
+    for (const int level : {1, 2, 3}) {
+        LogLevel = level;
+        ReportError();
+        ReportNotice();
+        ReportVerbose();
+        ReportDebug();
+    }
+    ASSERT_EQ(SyslogRecords().size(), 9U); // two, three and four
     for (const SyslogRecord &record : SyslogRecords()) {
         EXPECT_EQ(record.priority, 3);
+    }
+}
+
+TEST_F(LogToSystemLog, ErrnoIsAsBefore) {
+    for (const int level : {1, 2}) {
+        LogLevel = level;
+        errno = EXDEV;
+        ReportError();
+        EXPECT_EQ(errno, EXDEV);
     }
 }
 

@@ -3,7 +3,6 @@
 #include "cli/log_calls.h"
 #include "support/captured_log.h"
 
-#include <cerrno>
 #include <cstdio>
 #include <gtest/gtest.h>
 #include <string>
@@ -146,13 +145,6 @@ TEST_F(LogToStdout, ArgumentsOfSilentMessagesAreNotEvaluated) {
     LogVerbose("%d", ++evaluated);
     LogDebug("%d", ++evaluated);
     EXPECT_EQ(evaluated, 0);
-}
-
-TEST_F(LogToStdout, ErrnoIsAsBefore) {
-    CapturedLog log(3);
-    errno = EXDEV;
-    LogError("%s", std::string(5000, 'x').c_str());
-    EXPECT_EQ(errno, EXDEV);
 }
 
 TEST(LogU64, GivesTheWholeRange) {

@@ -1,6 +1,7 @@
 // The C library's own declarations are left out: they may replace syslog by an inline function.
 #include "cli/syslog_capture.h"
 
+#include <cerrno>
 #include <cstdarg>
 #include <cstdio>
 
@@ -15,6 +16,7 @@ void Record(int priority, const char *format, va_list arguments) {
     char text[4096];
     vsnprintf(text, sizeof(text), format, arguments);
     SyslogRecords().push_back({priority, text});
+    errno = ENOTCONN; // as the real one may leave it
 }
 
 } // namespace

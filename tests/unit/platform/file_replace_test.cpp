@@ -99,11 +99,12 @@ TEST_F(FileReplaceTest, LinkThatPointsNowhereCreatesItsTarget) {
 }
 
 TEST_F(FileReplaceTest, RelativePathIsTakenFromTheWorkingFolder) {
-    const std::string before = std::filesystem::current_path();
+    const int before = open(".", O_RDONLY | O_DIRECTORY);
     ASSERT_EQ(chdir(folder.Path().c_str()), 0);
     EXPECT_EQ(FileReplaceContent("file", fresh), FileReplaceResult::Done);
     EXPECT_EQ(FileReplaceContent("new", fresh), FileReplaceResult::Done);
-    ASSERT_EQ(chdir(before.c_str()), 0);
+    ASSERT_EQ(fchdir(before), 0);
+    close(before);
     EXPECT_EQ(ReadWhole(path), fresh);
     EXPECT_EQ(ReadWhole(folder.Path("new")), fresh);
 }

@@ -10,14 +10,15 @@
 #include <cstdlib>
 #include <cstring>
 #include <fcntl.h>
-#include <filesystem>
-#include <iterator>
 #include <pthread.h>
 #include <regex>
 #include <sstream>
 #include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
+
+// Writes the counts of a build that measures coverage; only such a build has it.
+extern "C" void __gcov_dump() __attribute__((weak));
 
 namespace {
 
@@ -36,6 +37,12 @@ void StuffPipe(int fd) {
     fcntl(fd, F_SETFL, flags);
 }
 
+void WriteCoverage() {
+    if (__gcov_dump != nullptr) {
+        __gcov_dump();
+    }
+}
+
 struct Body {
     const std::function<int()> &function;
     int result;
@@ -43,6 +50,9 @@ struct Body {
 
 void *RunBody(void *argument) {
     auto *body = static_cast<Body *>(argument);
+    sigset_t none;
+    sigemptyset(&none);
+    pthread_sigmask(SIG_SETMASK, &none, nullptr);
     body->result = body->function();
     return body;
 }
@@ -61,19 +71,21 @@ void *RunBody(void *argument) {
     LogLevel = setup.logLevel;
     ProgramName = "tool";
     FakeLibc::onSleep = PauseBriefly;
+    at_quick_exit(WriteCoverage);
 
-    Body body{function, 0};
-    pthread_t thread{};
-    pthread_create(&thread, nullptr, RunBody, &body);
     sigset_t all;
     sigfillset(&all);
     pthread_sigmask(SIG_SETMASK, &all, nullptr); // signals are for the body's threads
+    Body body{function, 0};
+    pthread_t thread{};
+    pthread_create(&thread, nullptr, RunBody, &body);
     void *ended = nullptr;
     pthread_join(thread, &ended);
     while (ended != &body) { // ended without returning: what goes on, goes on in other threads
         pause();
     }
     fflush(stdout);
+    WriteCoverage();
     _exit(body.result);
 }
 
@@ -139,25 +151,11 @@ bool ChildProcess::Await(const std::function<bool()> &condition) {
     return true;
 }
 
-// A thread that waits for the signal does not show it as blocked.
-bool ChildProcess::Blocks(int number) const {
-    using Folder = std::filesystem::directory_iterator;
-    std::error_code error;
-    int blocking = 0;
-    for (const auto &task : Folder("/proc/" + std::to_string(pid_) + "/task", error)) {
-        const std::string status = ReadWhole(task.path() / "status");
-        const size_t place = status.find("SigBlk:");
-        const char *mask = place == std::string::npos ? "" : status.c_str() + place + 7;
-        blocking += static_cast<int>(strtoull(mask, nullptr, 16) >> (number - 1) & 1);
-    }
-    return Threads() > 2 && blocking >= 2;
-}
-
-int ChildProcess::Threads() const {
-    using Folder = std::filesystem::directory_iterator;
-    std::error_code error;
-    const Folder tasks("/proc/" + std::to_string(pid_) + "/task", error);
-    return error ? 0 : static_cast<int>(std::distance(tasks, Folder()));
+bool ChildProcess::Catches(int number) const {
+    const std::string status = ReadWhole("/proc/" + std::to_string(pid_) + "/status");
+    const size_t place = status.find("SigCgt:");
+    const char *mask = place == std::string::npos ? "" : status.c_str() + place + 7;
+    return (strtoull(mask, nullptr, 16) >> (number - 1) & 1) != 0;
 }
 
 void ChildProcess::ReadOutput() {

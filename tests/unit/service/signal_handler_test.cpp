@@ -68,11 +68,12 @@ TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten
             }
             return 99;
         });
-        ASSERT_TRUE(ChildProcess::Await([&] { return child.Blocks(SIGTERM); }));
+        ASSERT_TRUE(ChildProcess::Await([&] { return child.Catches(SIGQUIT); }));
         child.Signal(number);
         EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
-        EXPECT_EQ(child.Messages().back(),
-                  "SignalHandler() [N]: Get signal = " + std::to_string(number));
+        const Messages messages = child.Messages();
+        ASSERT_FALSE(messages.empty());
+        EXPECT_EQ(messages.back(), "SignalHandler() [N]: Get signal = " + std::to_string(number));
     }
 }
 
@@ -90,6 +91,7 @@ TEST_F(SignalHandlerTest, ASignalIsSilentAtLevel1) {
 }
 
 TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
+    SKIP_WHERE_SIGNALS_COME_LATE();
     ChildProcess child({2, true}, [] {
         SetSignalHandler();
         for (;;) {
@@ -97,7 +99,7 @@ TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
         }
         return 99;
     });
-    ASSERT_TRUE(ChildProcess::Await([&] { return child.Blocks(SIGTERM); }));
+    ASSERT_TRUE(ChildProcess::Await([&] { return child.Catches(SIGQUIT); }));
     usleep(5000); // the thread has long filled its buffer
     child.Signal(SIGTERM);
     EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
@@ -113,6 +115,7 @@ TEST_F(SignalHandlerTest, OtherSignalsKeepTheirActions) {
 }
 
 TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheHandlerRunsWhereItIsInterrupted) {
+    SKIP_WHERE_SIGNALS_COME_LATE();
     ChildProcess child({2}, [] {
         RefuseThreads();
         if (SetSignalHandler() != 0 || SignalState() != 0b000111) {

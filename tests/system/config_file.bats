@@ -1,0 +1,134 @@
+#!/usr/bin/env bats
+# Where the configuration file lies: what can go wrong with its folder, and what a change keeps.
+
+load lib
+
+setup_file() { make_volume 1 64M 16M ext4; }
+
+setup() {
+    fresh_volume
+    random a 8K conv=fsync
+    FOLDER=${CONF%/*}
+}
+
+teardown() {
+    end_service
+    cd /
+    while mountpoint -q "$FOLDER"; do
+        umount -l "$FOLDER"
+    done
+    ! mountpoint -q "$CONF" || umount "$CONF"
+}
+
+no_temporary_files() { same "" "$(find "$1" -name '.*' -type f)"; }
+
+@test "the file keeps its owner and mode" {
+    put_config '{}'
+    chown 1234:2345 "$CONF"
+    chmod 0640 "$CONF"
+    start_service
+    pin 1 /volume1/a
+    stop_service
+    same "1234:2345 640" "$(stat -c '%u:%g %a' "$CONF")"
+    no_temporary_files "$FOLDER"
+}
+
+@test "a symbolic link stays one, its target changes" {
+    mkdir -p /run/elsewhere
+    echo '{}' >/run/elsewhere/target.json
+    ln -s ../elsewhere/target.json "$CONF"
+    start_service
+    pin 1 /volume1/a
+    stop_service
+    test -L "$CONF"
+    same ../elsewhere/target.json "$(readlink "$CONF")"
+    same 1 "$(jq .nextRequestNum /run/elsewhere/target.json)"
+    no_temporary_files "$FOLDER"
+    no_temporary_files /run/elsewhere
+}
+
+@test "a link that points nowhere creates its target" {
+    rm -rf /run/elsewhere
+    mkdir -p /run/elsewhere
+    ln -s /run/elsewhere/target.json "$CONF"
+    start_service
+    pin 1 /volume1/a
+    stop_service
+    test -L "$CONF"
+    same 1 "$(jq .nextRequestNum /run/elsewhere/target.json)"
+}
+
+@test "in a read-only folder nothing changes" {
+    put_config '{"nextRequestNum":5}'
+    mount --bind "$FOLDER" "$FOLDER"
+    mount -o remount,bind,ro "$FOLDER"
+    start_service
+    tool --reload-blocks --mount-path /volume1
+    wait_until waiting_is 0
+    sleep 0.1
+    same '{"nextRequestNum":5}' "$(config .)"
+    service_said <<END
+: Can't open config file ($CONF)
+: Can't write to files
+: Can't add request to config ($CONF)
+END
+}
+
+@test "a file that is a mount of its own is written in place" {
+    put_config '{}'
+    echo '{}' >/tmp/own.json
+    mount --bind /tmp/own.json "$CONF"
+    start_service
+    pin 1 /volume1/a
+    stop_service
+    same 1 "$(jq .nextRequestNum /tmp/own.json)"
+    no_temporary_files "$FOLDER"
+}
+
+@test "on a full disk the old document stays whole, and the service goes on when there is room" {
+    mount -t tmpfs -o size=64k tmpfs "$FOLDER"
+    put_config '{"nextRequestNum":7}'
+    start_service
+    dd if=/dev/zero of="$FOLDER/filler" bs=4k status=none 2>/dev/null || true
+    tool --pin-files /volume1/a --mount-path /volume1
+    wait_until waiting_is 0
+    sleep 0.1
+    same '{"nextRequestNum":7}' "$(config .)"
+    no_temporary_files "$FOLDER"
+    rm "$FOLDER/filler"
+    pin 1 /volume1/a
+    same 8 "$(config .nextRequestNum)"
+    service_said <<END
+: Handle request (type=pinFiles files=a#$(inode a)) OK 
+END
+}
+
+@test "a folder that is missing is not made" {
+    rm -rf "$FOLDER"
+    start_service
+    tool --reload-blocks --mount-path /volume1
+    wait_until waiting_is 0
+    sleep 0.1
+    refute test -e "$FOLDER"
+    service_said <<END
+: Can't open config file ($CONF)
+: Can't write to files
+: Can't add request to config ($CONF)
+END
+}
+
+@test "a FIFO in its place blocks nobody's end" {
+    mkfifo "$CONF"
+    start_service
+    stop_service
+}
+
+@test "a file removed while the service runs is made anew by the next request" {
+    start_service
+    pin 1 /volume1/a
+    rm "$CONF"
+    tool --reload-blocks --mount-path /volume1
+    wait_until request_is_done 0
+    same '{"nextRequestNum":1,"requestQueue":null,"requests":{}}' "$(config .)"
+    stop_service
+}

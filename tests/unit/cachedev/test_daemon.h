@@ -1,0 +1,57 @@
+// The daemon in the private world of a test (see private_world.h), run and used as a script would.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <fcntl.h>
+#include <json/json.h>
+#include <string>
+#include <sys/types.h>
+#include <vector>
+
+constexpr const char *kDaemonFolder = "/run/vesk";
+constexpr const char *kDaemonDevice = "/run/vesk/cachedev_0";
+constexpr const char *kDaemonState = "/run/vesk/cachedev_0.json";
+constexpr const char *kDaemonBacking = "/run/backing.img";
+constexpr const char *kDaemonSsd = "/run/ssd.img";
+
+// An open file, closed with the record.
+struct TestFd {
+    int fd; // -1: could not be opened
+    explicit TestFd(const char *path, int flags = O_RDWR);
+    ~TestFd();
+    TestFd(const TestFd &) = delete;
+    TestFd &operator=(const TestFd &) = delete;
+};
+
+// Runs a shell command; its exit status. What it wrote to standard error is in DaemonErrors.
+int DaemonCommand(const std::string &command);
+std::string DaemonErrors();
+
+// Starts the daemon on the images, with more options; the exit status of the command.
+int DaemonStart(const std::string &more = "");
+
+// Makes the images, the backing one with TestByte content, and starts the daemon.
+void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots, const std::string &more = "");
+
+// The daemon's state, and one member of it as compact text.
+Json::Value DaemonState();
+std::string DaemonStateText(const char *member);
+pid_t DaemonPid();
+
+// The exit status of a child, or the negative number of the signal that ended it. The daemon is
+// one, because orphans of a world become children of its first process.
+int DaemonAwaitEnd(pid_t child);
+
+// Ends the daemon with SIGTERM; its exit status.
+int DaemonStop();
+
+// Sends one ioctl to the device: 0 or an errno.
+int DaemonRequest(unsigned long number, const void *argument);
+int DaemonSetBitmap(const std::vector<uint8_t> &bitmap);
+
+// Sends one of the two query requests: the answer or a negative errno.
+int DaemonQuery(unsigned long number);
+
+// Reads with an aligned buffer; "error N" when that fails.
+std::string TestReadAt(int fd, uint64_t offset, uint64_t size);
