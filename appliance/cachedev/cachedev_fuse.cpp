@@ -1,13 +1,11 @@
 #include "cachedev/cachedev_fuse.h"
 
 #include "cachedev/pin_requests.h"
-#include "cachedev/state_json.h"
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
 #include <fcntl.h>
-#include <memory>
 #include <new>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -45,22 +43,6 @@ template <typename Body> void Guarded(fuse_req_t request, Body body) {
     }
 }
 
-StateText CurrentState(ServedDevice &served) {
-    return std::make_shared<const std::string>(
-        StateJsonText(CacheDeviceSnapshot(served.device), getpid()));
-}
-
-// The text that an open state file shows.
-StateText OpenedState(ServedDevice &served, const struct fuse_file_info *info) {
-    const std::lock_guard<std::mutex> hold(served.openStates.mutex);
-    return served.openStates.texts.at(info->fh);
-}
-
-void CloseState(ServedDevice &served, uint64_t handle) {
-    const std::lock_guard<std::mutex> hold(served.openStates.mutex);
-    served.openStates.texts.erase(handle);
-}
-
 // The attributes of an inode; `info` is that of an open file or null.
 struct stat StatusOf(ServedDevice &served, fuse_ino_t inode, const struct fuse_file_info *info) {
     struct stat status = {};
@@ -70,7 +52,8 @@ struct stat StatusOf(ServedDevice &served, fuse_ino_t inode, const struct fuse_f
         bytes = served.device.images.deviceBytes;
     } else if (inode == kStateInode) {
         status.st_mode = S_IFREG | 0444;
-        bytes = (info != nullptr ? OpenedState(served, info) : CurrentState(served))->size();
+        bytes = info != nullptr ? OpenStatesText(served.openStates, info->fh)->size()
+                                : OpenStatesBytes(served.openStates, served.device);
     } else {
         status.st_mode = S_IFDIR | 0755;
     }
@@ -183,21 +166,18 @@ void Open(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
             if ((info->flags & O_ACCMODE) != O_RDONLY) {
                 return EACCES;
             }
-            StateText text = CurrentState(served);
-            const std::lock_guard<std::mutex> hold(served.openStates.mutex);
-            info->fh = ++served.openStates.lastHandle;
-            served.openStates.texts.emplace(info->fh, std::move(text));
+            info->fh = OpenStatesOpen(served.openStates, served.device);
         }
         // Whoever gave up waiting never closes the file that it did not get.
         if (fuse_reply_open(request, info) != 0) {
-            CloseState(served, info->fh);
+            OpenStatesClose(served.openStates, info->fh);
         }
         return 0;
     });
 }
 
 void Release(fuse_req_t request, fuse_ino_t, struct fuse_file_info *info) {
-    CloseState(Served(request), info->fh);
+    OpenStatesClose(Served(request).openStates, info->fh);
     fuse_reply_err(request, 0);
 }
 
@@ -211,7 +191,7 @@ void Read(fuse_req_t request, fuse_ino_t inode, size_t size, off_t offset,
           struct fuse_file_info *info) {
     Guarded(request, [=] {
         if (inode == kStateInode) {
-            ReadState(request, size, offset, *OpenedState(Served(request), info));
+            ReadState(request, size, offset, *OpenStatesText(Served(request).openStates, info->fh));
             return 0;
         }
         const auto reply = [request](const ImagePieces &pieces) {

@@ -9,28 +9,15 @@
 #pragma once
 
 #include "cachedev/cache_device.h"
+#include "cachedev/open_states.h"
 
-#include <cstdint>
 #include <ctime>
 #include <functional>
-#include <map>
-#include <memory>
-#include <mutex>
 #include <string>
 
 // FUSE 3.12 introduced the form of the loop configuration that is used here.
 #define FUSE_USE_VERSION 312
 #include <fuse_lowlevel.h>
-
-// What an open of the state file shows: the state at that moment. Shared with the reads, because a
-// file may be closed as soon as the reply of a read is on its way, before its callback is done.
-using StateText = std::shared_ptr<const std::string>;
-
-struct OpenStates {
-    std::mutex mutex; // guards what follows
-    uint64_t lastHandle = 0;
-    std::map<uint64_t, StateText> texts; // by file handle, which is above 0
-};
 
 struct ServedDevice {
     CacheDevice &device;

@@ -129,8 +129,7 @@ END
 Error
 END
     tool --reload-blocks --mount-path /volume1
-    CONF=$path
-    start_service
+    CONF=$path start_service
     wait_until waiting_is 0
     sleep 0.1
     service_said <<END

@@ -17,7 +17,7 @@ start_slow_warming() {
     map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
     local before
     before=$(slow_misses)
-    start_service "$@"
+    start_service
     tool --pin-files /volume1/a --mount-path /volume1
     wait_until slow_misses_are_above $((before + 2))
 }
@@ -28,7 +28,7 @@ slow_misses_are_above() { [ "$(slow_misses)" -gt "$1" ]; }
 stops_at_once() {
     local begin
     begin=$(now_ms)
-    stop_service "$1"
+    stop_service_by "$1"
     [ $(($(now_ms) - begin)) -lt "${2:-1000}" ]
 }
 
@@ -81,12 +81,7 @@ stops_at_once() {
     mkfifo "${CONF%/*}/pipe"
     cat "${CONF%/*}/pipe" >"$BATS_TEST_TMPDIR/read" &
     local reader=$!
-    (
-        close_descriptors
-        exec "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout
-    ) >"${CONF%/*}/pipe" &
-    SERVICE_PID=$!
-    wait_until service_is_ready
+    run_service --stdout >"${CONF%/*}/pipe"
     stop_service
     wait "$reader"
     same "veskcachepinfiletool: Service starts (Build time: 2018-06-08-15:24)" \
@@ -97,14 +92,7 @@ stops_at_once() {
     mkfifo "${CONF%/*}/pipe"
     exec 8<>"${CONF%/*}/pipe"
     dd if=/dev/zero of=/proc/self/fd/8 bs=4096 count=64 oflag=nonblock status=none 2>/dev/null || true
-    (
-        # Only its standard output is the pipe.
-        exec 8>&-
-        close_descriptors
-        exec "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout
-    ) >&8 &
-    SERVICE_PID=$!
-    wait_until service_is_ready
+    run_service --stdout >&8
     stops_at_once TERM 2000
     exec 8>&-
 }

@@ -31,10 +31,7 @@ waiting_is() { [ "$(messages_waiting)" -eq "$1" ]; }
 
 # Removes every queue of this private world, and the key file.
 remove_queues() {
-    local id
-    for id in $(awk 'NR > 1 { print $2 }' /proc/sysvipc/msg); do
-        ipcrm -q "$id"
-    done
+    awk 'NR > 1 { print $2 }' /proc/sysvipc/msg | xargs -r -n 1 ipcrm -q
     rm -rf "$KEY_FILE"
 }
 

@@ -4,16 +4,19 @@
 
 SERVICE_LOG=/run/service.log
 
-# start_service [OPTION...]: with --stdout; leaves the process id in SERVICE_PID. Ready for requests
-# and signals when it returns.
-start_service() {
+# run_service [OPTION...]: in the background; leaves its process id in SERVICE_PID. It is ready for
+# requests and signals when this returns.
+run_service() {
     (
         close_descriptors
-        exec "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" --stdout "$@"
-    ) >"$SERVICE_LOG" 2>&1 &
+        exec "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF" "$@"
+    ) &
     SERVICE_PID=$!
     wait_until service_is_ready
 }
+
+# The same with --stdout, to SERVICE_LOG.
+start_service() { run_service --stdout "$@" >"$SERVICE_LOG" 2>&1; }
 
 # It handles SIGTERM and its queue is there.
 service_is_ready() {
@@ -22,10 +25,13 @@ service_is_ready() {
     [ -n "$caught" ] && ((0x$caught & 0x4000)) && [ -s "$KEY_FILE" ]
 }
 
-# stop_service [SIGNAL]: it must end with status 0.
-stop_service() {
+# The service must end with status 0.
+stop_service() { stop_service_by TERM; }
+
+# stop_service_by SIGNAL
+stop_service_by() {
     local status=0
-    kill -s "${1:-TERM}" "$SERVICE_PID"
+    kill -s "$1" "$SERVICE_PID"
     wait "$SERVICE_PID" || status=$?
     SERVICE_PID=
     [ "$status" -eq 0 ] || {

@@ -40,7 +40,7 @@ Bytes Cleared(const Bytes &before, uint64_t startSector, uint64_t numSectors) {
 Bytes Model(Bytes bytes, uint64_t startSector, uint64_t numSectors, int op) {
     const uint64_t first = startSector / 128;
     const uint64_t last = (startSector + numSectors - 1) / 128;
-    for (uint64_t bit = 0; bit < bytes.size() * 8; ++bit) {
+    for (size_t bit = 0; bit < bytes.size() * 8; ++bit) {
         if (bit < first || bit > last) {
             continue;
         }
@@ -151,7 +151,7 @@ TEST_F(PinBitmapTest, AgreesWithTheModelOnRandomRanges) {
     std::mt19937_64 random(20180608);
     const auto below = [&random](uint64_t limit) { return random() % limit; };
     for (int i = 0; i < 20000; ++i) {
-        Bytes before(below(40));
+        Bytes before(static_cast<size_t>(below(40)));
         for (unsigned char &byte : before) {
             byte = static_cast<unsigned char>(random());
         }

@@ -11,10 +11,8 @@
 
 // The linker puts these in front of the C library's calloc.
 extern "C" {
-// NOLINTBEGIN(bugprone-reserved-identifier)
 void *__real_calloc(size_t count, size_t size);
 void *__wrap_calloc(size_t count, size_t size);
-// NOLINTEND(bugprone-reserved-identifier)
 }
 
 namespace {
@@ -68,7 +66,7 @@ protected:
 
 } // namespace
 
-void *__wrap_calloc(size_t count, size_t size) { // NOLINT(bugprone-reserved-identifier)
+void *__wrap_calloc(size_t count, size_t size) {
     if (callocsLeft == 0) {
         return nullptr;
     }

@@ -1,5 +1,7 @@
 #include "cachedev/caller_memory.h"
 
+#include "test_device.h"
+
 #include <gtest/gtest.h>
 
 #include <cerrno>
@@ -17,9 +19,17 @@ uint64_t AddressOf(const void *memory) {
     return reinterpret_cast<uintptr_t>(memory);
 }
 
+struct CallerMemoryTest : testing::Test {
+    void SetUp() override {
+        if (!TestHasCallerMemory()) {
+            GTEST_SKIP() << "needs process_vm_readv";
+        }
+    }
+};
+
 } // namespace
 
-TEST(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
+TEST_F(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
     // The child has the same layout and its own copy of this variable.
     static volatile int value = 1;
     const pid_t child = fork();
@@ -49,7 +59,7 @@ TEST(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
     EXPECT_EQ(CallerWrite(caller, address, &written, sizeof written), -EFAULT);
 }
 
-TEST(CallerMemoryTest, MemoryThatIsNotThereIsRefused) {
+TEST_F(CallerMemoryTest, MemoryThatIsNotThereIsRefused) {
     char byte = 0;
     EXPECT_EQ(CallerRead(kSelf, 0, &byte, 1), -EFAULT);
     EXPECT_EQ(CallerRead(kSelf, 16, &byte, 1), -EFAULT);
@@ -59,12 +69,12 @@ TEST(CallerMemoryTest, MemoryThatIsNotThereIsRefused) {
     EXPECT_EQ(CallerRead({-1, false}, AddressOf(&byte), &byte, 1), -EFAULT);
 }
 
-TEST(CallerMemoryTest, NothingToReadNeedsNoMemory) {
+TEST_F(CallerMemoryTest, NothingToReadNeedsNoMemory) {
     EXPECT_EQ(CallerRead(kSelf, 0, nullptr, 0), 0);
     EXPECT_EQ(CallerWrite(kSelf, 16, nullptr, 0), 0);
 }
 
-TEST(CallerMemoryTest, MemoryThatEndsTooEarlyIsRefused) {
+TEST_F(CallerMemoryTest, MemoryThatEndsTooEarlyIsRefused) {
     const auto page = static_cast<size_t>(sysconf(_SC_PAGESIZE));
     void *const pages =
         mmap(nullptr, 2 * page, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);

@@ -21,6 +21,12 @@ struct PinRequestsTest : testing::Test {
     CacheDevice &device = test.device;
     std::vector<SectorRange> ranges = std::vector<SectorRange>(kRangeListRecords);
 
+    void SetUp() override {
+        if (!TestHasCallerMemory()) {
+            GTEST_SKIP() << "needs process_vm_readv";
+        }
+    }
+
     int Send(uint32_t number, const void *argument, void *data = nullptr, bool is32bit = kIs32Bit) {
         PinRequest request = {};
         request.number = number;

@@ -1,5 +1,7 @@
 #include "private_world.h"
 
+#include "test_device.h"
+
 #include <gtest/gtest.h>
 
 #include <csignal>
@@ -66,6 +68,9 @@ void RunInPrivateWorld(const std::function<void()> &body) {
     }
     if (access("/dev/fuse", R_OK | W_OK) != 0) {
         GTEST_SKIP() << "needs /dev/fuse";
+    }
+    if (!TestHasCallerMemory()) {
+        GTEST_SKIP() << "needs process_vm_readv";
     }
     fflush(nullptr);
     const pid_t child = fork();

@@ -1,5 +1,7 @@
 #include "test_device.h"
 
+#include "cachedev/caller_memory.h"
+
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -8,6 +10,7 @@
 #include <fstream>
 #include <sstream>
 #include <stdexcept>
+#include <unistd.h>
 
 TestFolder::TestFolder() {
     char name[] = "/tmp/cachedev_test.XXXXXX";
@@ -110,4 +113,11 @@ std::vector<uint64_t> TestPinned(CacheDevice &device) {
         }
     }
     return blocks;
+}
+
+bool TestHasCallerMemory() {
+    const char there = 'x';
+    char here = 0;
+    const Caller self = {getpid(), sizeof(void *) == 4};
+    return CallerRead(self, reinterpret_cast<uintptr_t>(&there), &here, 1) == 0 && here == there;
 }

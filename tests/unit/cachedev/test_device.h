@@ -52,3 +52,6 @@ std::vector<uint8_t> TestBitmap(const CacheDevice &device, const std::vector<uin
 // The cached blocks and the pinned blocks in ascending order.
 std::vector<uint64_t> TestCached(CacheDevice &device);
 std::vector<uint64_t> TestPinned(CacheDevice &device);
+
+// Whether this kernel lets a process read another one's memory; an emulated one may not.
+bool TestHasCallerMemory();

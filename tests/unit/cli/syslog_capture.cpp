@@ -23,7 +23,6 @@ void Record(int priority, const char *format, va_list arguments) {
 
 extern "C" {
 
-// NOLINTBEGIN(bugprone-reserved-identifier)
 void syslog(int priority, const char *format, ...);
 void __syslog_chk(int priority, int flag, const char *format, ...);
 
@@ -40,5 +39,4 @@ void __syslog_chk(int priority, int /*flag*/, const char *format, ...) {
     Record(priority, format, arguments);
     va_end(arguments);
 }
-// NOLINTEND(bugprone-reserved-identifier)
 }

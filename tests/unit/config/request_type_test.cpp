@@ -30,6 +30,14 @@ TEST_F(RequestTypeTest, ValuesOutsideTheTableGiveNullAndAMessage) {
               Messages{"RequestTypeToString() [N] : ***** Convert request type to string errror"});
 }
 
+TEST_F(RequestTypeTest, LogLinesShowANameOrNull) {
+    CapturedLog log;
+    EXPECT_STREQ(RequestTypeForLog(6), "reloadPinBlocks");
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_STREQ(RequestTypeForLog(7), "(null)");
+    EXPECT_EQ(log.Messages(), Messages{"Convert request type to string errror"});
+}
+
 TEST_F(RequestTypeTest, EveryNameHasItsValue) {
     for (int type = 0; type <= 6; ++type) {
         EXPECT_EQ(StringToRequestType(RequestTypeToString(type)), type);

@@ -7,8 +7,9 @@
 #include "support/temp_dir.h"
 
 #include <algorithm>
-#include <functional>
+#include <cstdio>
 #include <string>
+#include <sys/inotify.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -41,6 +42,26 @@ protected:
         struct stat status {};
         EXPECT_EQ(lstat(file.c_str(), &status), 0) << file;
         return status;
+    }
+
+    // Takes the next `count` names that this process would give its temporary files, as whatever
+    // had its number before may have left them.
+    void TakeTemporaryNames(unsigned count) const {
+        const int watch = inotify_init1(IN_NONBLOCK);
+        inotify_add_watch(watch, folder.Path().c_str(), IN_CREATE);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), old), FileReplaceResult::Done);
+        alignas(inotify_event) char buffer[1000] = {};
+        EXPECT_GT(read(watch, buffer, sizeof(buffer)), 0);
+        close(watch);
+        int process = 0;
+        unsigned last = 0;
+        const char *name = reinterpret_cast<const inotify_event *>(buffer)->name;
+        EXPECT_EQ(sscanf(name, ".veskcachepinfile.%d.%u.tmp", &process, &last), 2) << name;
+        for (unsigned i = 1; i <= count; ++i) {
+            WriteWhole(folder.Path(".veskcachepinfile." + std::to_string(process) + "." +
+                                   std::to_string(last + i) + ".tmp"),
+                       "left");
+        }
     }
 
     // Replaces the file in a process of its own, as the user nobody.

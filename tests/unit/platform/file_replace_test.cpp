@@ -110,14 +110,10 @@ TEST_F(FileReplaceTest, RelativePathIsTakenFromTheWorkingFolder) {
 }
 
 TEST_F(FileReplaceTest, LeftoversOfADeadProcessAreNoHindrance) {
-    // Names that this process would use next, taken by whatever had its number before.
-    const std::string prefix = folder.Path(".veskcachepinfile." + std::to_string(getpid()) + ".");
-    for (int i = 0; i < 60; ++i) {
-        WriteWhole(prefix + std::to_string(i) + ".tmp", "left");
-    }
+    TakeTemporaryNames(99);
     EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::Done);
     EXPECT_EQ(ReadWhole(path), fresh);
-    EXPECT_EQ(Names().size(), 61U);
+    EXPECT_EQ(Names().size(), 100U);
 }
 
 TEST_F(FileReplaceTest, ShortWritesAreContinued) {

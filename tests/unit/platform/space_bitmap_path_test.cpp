@@ -8,10 +8,8 @@
 
 // The linker puts these in front of the C library's strdup.
 extern "C" {
-// NOLINTBEGIN(bugprone-reserved-identifier)
 char *__real_strdup(const char *text);
 char *__wrap_strdup(const char *text);
-// NOLINTEND(bugprone-reserved-identifier)
 }
 
 namespace {
@@ -32,7 +30,7 @@ std::string PathBelow(const std::string &referencePath) {
 
 } // namespace
 
-char *__wrap_strdup(const char *text) { // NOLINT(bugprone-reserved-identifier)
+char *__wrap_strdup(const char *text) {
     if (copiesLeft == 0) {
         return nullptr;
     }

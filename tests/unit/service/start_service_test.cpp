@@ -185,13 +185,14 @@ TEST_F(StartServiceTest, WithoutItsQueueTheReceiverEndsAndTheWorkerGoesOn) {
     WriteWhole(config_, R"({"requestQueue" : ["0"], "requests" :
         {"0" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
                             volume_ + R"("}}})");
-    ChildProcess service({1}, Service());
+    ChildProcess service({1, false, true}, Service());
     EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
+    EXPECT_TRUE(service.AwaitOutput("Create server messsage queue by file "
+                                    "(/var/run/veskcachepinfile-msg-server.key) failed\n"));
+    EXPECT_TRUE(service.AwaitOutput("Handle request (type=reloadPinBlocks) OK \n"));
     EXPECT_TRUE(service.Runs());
     service.Signal(SIGTERM);
     EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
-    EXPECT_TRUE(Contains(service.Messages(), "Create server messsage queue by file "
-                                             "(/var/run/veskcachepinfile-msg-server.key) failed"));
 }
 
 TEST_F(StartServiceTest, ASelectionErrorEndsTheWorkerAndTheReceiverGoesOn) {

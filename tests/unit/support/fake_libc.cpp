@@ -192,7 +192,14 @@ ssize_t read(int fd, void *data, size_t size) {
 }
 
 off_t lseek64(int fd, off_t offset, int whence) noexcept {
-    PASS_OR_FAIL(-1, lseek, off_t(*)(int, off_t, int), fd, offset, whence);
+    const int error = FailureOf("lseek");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    // Not "lseek", whose offset has 32 bits on a 32-bit platform.
+    static const auto real = Real<off_t (*)(int, off_t, int)>("lseek64");
+    return real(fd, offset, whence);
 }
 
 // Under whatever name the platform's 64-bit variant has; the real answer comes by another call.

@@ -17,7 +17,7 @@ struct BitRun {
 std::vector<BitRun> RunsOf(const std::string &bytes) {
     std::vector<BitRun> runs;
     bool open = false;
-    for (uint64_t bit = 0; bit < bytes.size() * 8; ++bit) {
+    for (size_t bit = 0; bit < bytes.size() * 8; ++bit) {
         const bool set = ((static_cast<unsigned char>(bytes[bit / 8]) >> (bit % 8)) & 1) != 0;
         if (set && !open) {
             runs.push_back({bit, 0});
@@ -182,7 +182,7 @@ TEST_F(ReloadBlocksTest, AVolumeThatTurnsPendingIsLeftAfterTheRangeBeingRead) {
         const bool lastBitSet = runs.back().start + runs.back().length == bytes.size() * 8;
         for (size_t call = 1; call <= calls; ++call) {
             std::vector<BitRun> expected;
-            size_t counted = 0;
+            uint64_t counted = 0;
             for (const BitRun &run : runs) {
                 if (counted < call) {
                     expected.push_back(run);

@@ -1,0 +1,189 @@
+#!/usr/bin/env bats
+# The private worlds in which these tests run: apart from each other, and gone without a trace,
+# whatever ends them.
+
+load lib
+
+WORLD=$BATS_TEST_DIRNAME/../../scripts/lib/private-world
+RUN_BATS=$BATS_TEST_DIRNAME/run-bats
+
+# A program for a world: a volume, whose device lies below /run/ID, is written to without end.
+write_program() {
+    ID=world-$BATS_TEST_NUMBER-$RANDOM$RANDOM
+    # A world sees the folder it is called in, wherever that lies.
+    cd "$BATS_TEST_TMPDIR" || return
+    PROGRAM=$BATS_TEST_TMPDIR/program
+    cat >"$PROGRAM" <<END
+set -e
+BIN=$BIN
+. "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+volume_device() { echo "/run/$ID/cachedev_\$1"; }
+volume_make 1 64M 16M ext4
+echo ready
+while :; do dd if=/dev/urandom of=/volume1/a bs=1M count=20 status=none; done
+END
+}
+
+# Leaves the world's process id in WORLD_PID, and the world at work.
+start_world() {
+    write_program
+    : >"$BATS_TEST_TMPDIR/log"
+    (
+        close_descriptors
+        exec "$WORLD" bash "$PROGRAM"
+    ) >"$BATS_TEST_TMPDIR/log" 2>&1 &
+    WORLD_PID=$!
+    wait_until grep -q ready "$BATS_TEST_TMPDIR/log"
+    [ -n "$(processes_of_world)" ]
+    losetup --list --noheadings --output BACK-FILE | grep -q "$ID"
+}
+
+teardown() {
+    [ -z "${WORLD_PID:-}" ] || kill -KILL "$WORLD_PID" 2>/dev/null || true
+}
+
+# The processes that have the program or the device on their command line.
+processes_of_world() {
+    local folder line
+    for folder in /proc/[0-9]*; do
+        line=$(tr '\0' ' ' <"$folder/cmdline" 2>/dev/null) || continue
+        case "$line" in *"$ID"* | *"$PROGRAM"*) echo "${folder#/proc/} $line" ;; esac
+    done
+}
+
+nothing_is_left() {
+    [ -z "$(processes_of_world)" ] &&
+        ! losetup --list --noheadings --output BACK-FILE | grep -q "$ID" &&
+        ! grep -q "$ID" /proc/self/mountinfo
+}
+
+# end_world SIGNAL STATUS: the world ends so, and the machine can still write back everything.
+end_world() {
+    local status=0
+    kill -s "$1" "$WORLD_PID"
+    wait "$WORLD_PID" || status=$?
+    WORLD_PID=
+    same "$2" "$status"
+    wait_until nothing_is_left
+    timeout 20 sync
+}
+
+@test "nothing is left after kill -9, with a volume being written to" {
+    start_world
+    end_world KILL 137
+}
+
+@test "nothing is left after kill -9, again and again" {
+    for _ in 1 2 3; do
+        start_world
+        end_world KILL 137
+    done
+}
+
+@test "nothing is left after SIGTERM" {
+    start_world
+    end_world TERM 143
+}
+
+@test "nothing is left after SIGHUP" {
+    start_world
+    end_world HUP 143
+}
+
+@test "nothing is left when the command ends" {
+    write_program
+    sed -i '/^while/d' "$PROGRAM"
+    same ready "$("$WORLD" bash "$PROGRAM")"
+    wait_until nothing_is_left
+}
+
+@test "nothing is left when the cache device is killed under a mounted volume" {
+    write_program
+    # shellcheck disable=SC2016
+    sed -i 's/^while.*/kill -KILL "$(volume_state 1 pid)"; ls \/volume1 >\/dev\/null || true/' "$PROGRAM"
+    same ready "$("$WORLD" bash "$PROGRAM")"
+    wait_until nothing_is_left
+    timeout 20 sync
+}
+
+@test "two worlds at once have each their own volume 1, their own queue and their own log" {
+    write_program
+    cat >"$PROGRAM" <<END
+set -e
+BIN=$BIN
+. "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+volume_make 1 64M 16M ext4
+echo "\$1" >/volume1/name
+"$BIN/veskcachepinfiletool" --reload-blocks --mount-path /volume1
+# Both are there now.
+for i in \$(seq \$1); do "$BIN/veskcachepinfiletool" --reload-blocks --mount-path /volume1; done
+sleep 0.5
+cat /volume1/name
+awk 'NR > 1 { print \$5 }' /proc/sysvipc/msg
+ls -A /dev/log 2>/dev/null || echo none
+END
+    "$WORLD" bash "$PROGRAM" 1 >"$BATS_TEST_TMPDIR/one" &
+    local one=$!
+    "$WORLD" bash "$PROGRAM" 2 >"$BATS_TEST_TMPDIR/two"
+    wait "$one"
+    same $'1\n2\nnone' "$(cat "$BATS_TEST_TMPDIR/one")"
+    same $'2\n3\nnone' "$(cat "$BATS_TEST_TMPDIR/two")"
+}
+
+@test "what a world writes below /run, /tmp, /dev and the volumes stays in it" {
+    # shellcheck disable=SC2016
+    "$WORLD" sh -c 'for f in /run /tmp /dev /dev/shm /volume1 /volume2; do : >$f/from-the-world; done'
+    same "" "$(ls -d /run/from-* /tmp/from-* /dev/from-* /dev/shm/from-* /volume?/from-* 2>/dev/null)"
+    same "" "$("$WORLD" sh -c 'cd /run && ls -A; cd /tmp && ls -A; cd /volume1 && ls -A' | grep -v '^mount$')"
+}
+
+@test "the command's status and arguments come through" {
+    local status=0
+    # shellcheck disable=SC2016
+    same '<a b><*><>' "$("$WORLD" sh -c 'printf "<%s>" "$@"' sh 'a b' '*' '')"
+    "$WORLD" sh -c 'exit 3' || status=$?
+    same 3 "$status"
+    same "$BATS_TEST_DIRNAME" "$(cd "$BATS_TEST_DIRNAME" && "$WORLD" pwd)"
+}
+
+# missing REASON COMMAND...: it ends with 77 and the reason.
+missing() {
+    local status=0 reason=$1
+    shift
+    "$@" >/dev/null 2>"$BATS_TEST_TMPDIR/errors" || status=$?
+    same 77 "$status"
+    same "private-world: $reason" "$(cat "$BATS_TEST_TMPDIR/errors")"
+}
+
+@test "without root, FUSE or loop devices it says so and ends with 77" {
+    missing "root is needed (namespaces, mounts, loop devices)" \
+        setpriv --reuid=65534 --clear-groups "$WORLD" true
+    # shellcheck disable=SC2016
+    missing "/dev/fuse is missing: this kernel has no FUSE" \
+        unshare --mount sh -c 'mount -t tmpfs tmpfs /dev && mknod /dev/null c 1 3 &&
+            exec "$0" true' "$WORLD"
+    # shellcheck disable=SC2016
+    missing "/dev/loop-control is missing: no loop devices" \
+        unshare --mount sh -c 'mount -t tmpfs tmpfs /dev && mknod /dev/fuse c 10 229 &&
+            mknod /dev/null c 1 3 && exec "$0" true' "$WORLD"
+    missing "root is needed (namespaces, mounts, loop devices)" \
+        setpriv --reuid=65534 --clear-groups "$RUN_BATS" "$BATS_TEST_FILENAME"
+}
+
+@test "run-bats tells passed, failed and skipped files apart" {
+    local file=$BATS_TEST_TMPDIR/sample.bats status
+    cd "$BATS_TEST_TMPDIR"
+    run_sample() {
+        status=0
+        printf '%s\n' "$@" >"$file"
+        "$RUN_BATS" "$file" >"$BATS_TEST_TMPDIR/tap" 2>&1 || status=$?
+    }
+    run_sample '@test "x" { true; }' '@test "y" { skip "no"; }'
+    same 0 "$status"
+    run_sample '@test "x" { true; }' '@test "y" { false; }'
+    same 1 "$status"
+    run_sample '@test "x" { skip "no"; }' '@test "y" { skip "neither"; }'
+    same 77 "$status"
+    run_sample 'setup_file() { false; }' '@test "x" { true; }'
+    same 1 "$status"
+}

@@ -1,0 +1,145 @@
+#!/usr/bin/env bats
+# The messages as they arrive at the system log, datagram by datagram.
+
+load lib
+
+setup_file() {
+    make_volume 1 64M 16M ext4
+    UUID=$(volume_uuid 1)
+    export UUID
+}
+
+setup() {
+    fresh_volume
+    rm -f /run/syslog
+    (
+        close_descriptors
+        exec "$HELPERS/system_syslog" /dev/log /run/syslog
+    ) &
+    LOG_PID=$!
+    wait_until test -e /run/syslog
+}
+
+teardown() {
+    end_service
+    kill "$LOG_PID"
+    wait "$LOG_PID" || true
+    rm -f /dev/log
+}
+
+# logged: the datagrams so far are the lines of standard input. Each begins with the priority, the
+# time, the program and the source file, which are checked here and left out there. The line's number
+# is N where it is the same at both places of a long form.
+logged() {
+    cat >"$BATS_TEST_TMPDIR/expected"
+    local prefix='<11>[A-Z][a-z]{2} [ 0-9][0-9] [0-9:]{8} veskcachepinfiletool: veskcachepinfiletool\.cpp:'
+    sed -E -e "s/^${prefix}([0-9]+) ([A-Za-z]+\(\)) \[\1\] : /\2 [N] : /" -e "s/^${prefix}[0-9]+ //" \
+        /run/syslog | diff -u "$BATS_TEST_TMPDIR/expected" -
+}
+
+@test "level 1: priority 11, the source file, a line number and the text" {
+    answers 0 --unpin-all --mount-path /volume1 </dev/null
+    answers 255 --handle-mount --mount-path /nowhere --config-path /run < /dev/null
+    logged <<END
+Start to unpin all blocks of volume (/volume1)
+Unpin all blocks of volume (/volume1) finish
+Can't get space uuid from mount path (/nowhere)
+Prase file /run error
+Can't read data from config file (/run)
+Can't remove pin files in volume (/nowhere)
+Handle space (/nowhere) mount failed
+END
+}
+
+@test "level 2: function and line again, the marker of errors, the trace" {
+    answers 0 --verbose --support-pin --mount-path /nowhere <<<"No"
+    logged <<END
+Verbose mode is enable
+main() [N] : +++++
+SpaceGetUUID() [N] : Get UUID = (null)
+SpaceHasCacheAndSupportPin() [N] : ***** Can't get space uuid from mount path (/nowhere)
+main() [N] : -----
+END
+}
+
+@test "level 3: debug messages in the same form; a line feed at the end is part of the text" {
+    answers 0 --debug --verbose --set-bitmap --mount-path /volume1 --start-sector 0 --num-sectors 128 \
+        </dev/null
+    logged <<END
+Debug mode is enable
+Verbose mode is enable
+main() [N] : +++++
+SpaceGetUUID() [N] : Get UUID = $UUID
+SpaceGetReferencePath() [N] : Get reference path = /volume1
+SpaceGetReferencePath() [N] : Get reference path = /volume1
+BitmapGetNeededSizeByte() [N] : Disk size = 67108864 byte
+BitmapAllocateAndInitialize() [N] : Allocate 128 bytes bitmap
+BitmapAllocateAndInitialize() [N] : Bitmap files (/volume1/veskcachepinfile.bitmap) doesn't exist
+BitmapOperation() [N] : Disk start sector=0 num sectors=128\n
+BitmapWriteToFile() [N] : Bytes to write = 128
+BitmapWriteToFile() [N] : Write to bitmap file (/volume1/veskcachepinfile.bitmap) size (128) Finish
+BitmapSendToDriver() [N] : +++++
+DoIoctl() [N] : +++++
+DoIoctl() [N] : -----
+BitmapSendToDriver() [N] : -----
+main() [N] : Set bitmap on volume (/volume1) OK (Start sector = 0 Num of sector = 128)
+main() [N] : -----
+END
+}
+
+@test "no command and a failed parse" {
+    answers 0 < <(usage)
+    answers 255 --verbose --get-uuid < <(usage)
+    answers 134 -d </dev/null
+    logged <<END
+Invalid input
+Verbose mode is enable
+Mount path must be set
+Check parameter failed
+Get unhandled option = d
+END
+}
+
+@test "with --stdout nothing reaches the system log, what stood before it does" {
+    says 0 --get-uuid --mount-path /volume1 <<<"$UUID"
+    expect_output 255 /dev/null tool --verbose --stdout --get-uuid < <(
+        printf ': %s\n' "Mount path must be set" "Check parameter failed"
+        usage
+    )
+    logged <<<"Verbose mode is enable"
+}
+
+@test "the service logs there" {
+    random a 8K conv=fsync
+    run_service >"$SERVICE_LOG"
+    pin 1 /volume1/a
+    stop_service
+    same "" "$(cat "$SERVICE_LOG")"
+    logged <<END
+Service starts (Build time: 2018-06-08-15:24)
+Send pin file request, files = /volume1/a
+Send pin file request OK
+Handle request (type=pinFiles files=a#$(inode a)) OK 
+END
+}
+
+@test "conversion characters and long paths in messages" {
+    local path
+    path=/%s%n%d%%$(printf 'p%.0s' {1..1500})
+    answers 0 --handle-umount --mount-path "$path" </dev/null
+    logged <<END
+Can't get space uuid from mount path ($path)
+Space ($path) doesn't support pin
+END
+}
+
+@test "without a system log every command works all the same" {
+    kill "$LOG_PID"
+    wait "$LOG_PID" || true
+    answers 0 --support-pin --mount-path /volume1 <<<"Yes"
+    rm /dev/log
+    answers 0 --support-pin --mount-path /volume1 <<<"Yes"
+    answers 255 --add-pending --mount-path /nowhere </dev/null
+    (exec "$HELPERS/system_syslog" /dev/log /run/syslog) &
+    LOG_PID=$!
+}
