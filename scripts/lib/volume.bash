@@ -46,7 +46,7 @@ volume_serve() {
 volume_loop() { cat "/tmp/volume$1/loop"; }
 volume_uuid() { blkid -p -o value -s UUID "$(volume_loop "$1")"; }
 
-# Writes the cache configuration for all volumes made so far.
+# Writes the cache configuration for all volumes made so far; a running service sees the old or the new.
 volume_configure() {
     local folder n separator=
     {
@@ -59,7 +59,8 @@ volume_configure() {
             separator=,
         done
         printf ']}\n'
-    } >"$VESK_FLASHCACHE_CONFIG"
+    } >"$VESK_FLASHCACHE_CONFIG.new"
+    mv "$VESK_FLASHCACHE_CONFIG.new" "$VESK_FLASHCACHE_CONFIG"
 }
 
 # volume_state N MEMBER: one number or word of the cache device's state.

@@ -107,7 +107,8 @@ inode() { stat -c %i "$1"; }
 # map_cache UUID DEVICE: from now on this cache device is the one of the space.
 map_cache() {
     printf '{"caches":[{"spaceUuid":"%s","ssdPath":"/tmp/some-ssd","cachePath":"%s"}]}\n' \
-        "$1" "$2" >"$VESK_FLASHCACHE_CONFIG"
+        "$1" "$2" >"$VESK_FLASHCACHE_CONFIG.new"
+    mv "$VESK_FLASHCACHE_CONFIG.new" "$VESK_FLASHCACHE_CONFIG"
 }
 
 # spare_device NAME SIZE [veskcachedev option...]: a cache device that no volume lies on, with SSD_SIZE

@@ -89,6 +89,8 @@ stops_at_once() {
 }
 
 @test "a full pipe that nobody reads does not hold the end up" {
+    # ThreadSanitizer delivers no signal while the C library itself is in a blocking call.
+    ! ldd "$BIN/veskcachepinfiletool" | grep -q libtsan || skip "not with ThreadSanitizer"
     mkfifo "${CONF%/*}/pipe"
     exec 8<>"${CONF%/*}/pipe"
     dd if=/dev/zero of=/proc/self/fd/8 bs=4096 count=64 oflag=nonblock status=none 2>/dev/null || true

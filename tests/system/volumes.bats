@@ -21,8 +21,8 @@ lose_cache() {
     local uuid
     uuid=$(volume_uuid "$1")
     jq -c --arg uuid "$uuid" '.caches |= map(select(.spaceUuid != $uuid))' \
-        "$VESK_FLASHCACHE_CONFIG" >/tmp/flashcache.json
-    cp /tmp/flashcache.json "$VESK_FLASHCACHE_CONFIG"
+        "$VESK_FLASHCACHE_CONFIG" >"$VESK_FLASHCACHE_CONFIG.new"
+    mv "$VESK_FLASHCACHE_CONFIG.new" "$VESK_FLASHCACHE_CONFIG"
 }
 
 @test "each volume has its bitmap file, its driver's bitmap and its records" {

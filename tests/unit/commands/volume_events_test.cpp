@@ -110,11 +110,13 @@ TEST_F(VolumeEventsTest, MountThatCannotDeleteTheBitmapHasRemovedTheRecords) {
     WriteWhole(bitmapFile_, "ab");
     chmod(folder_.Path().c_str(), 0777);
     chmod(config_.c_str(), 0666);
+    chmod(Volume(), 0555); // nothing goes out of it
     CapturedLog log;
     {
         const OrdinaryUser user;
         EXPECT_EQ(Mount(), -1);
     }
+    chmod(Volume(), 0755);
     EXPECT_EQ(log.Messages(), (Messages{
                                   recordsRemoved_,
                                   "Can't delete bitmap file (" + bitmapFile_ + ")",

@@ -84,6 +84,13 @@ TEST_F(MessageQueueSendTest, AnInvalidQueueFailsAfterThreeSeconds) {
               }));
 }
 
+TEST_F(MessageQueueSendTest, TheReasonIsThatOfTheLastTryAndNotOfThePauseBehindIt) {
+    FakeLibc::onSleep = [] { errno = EINTR; };
+    const CapturedLog log;
+    EXPECT_EQ(Send(-1), -1);
+    EXPECT_EQ(errno, EINVAL);
+}
+
 TEST_F(MessageQueueSendTest, RoomThatComesMeanwhileIsUsed) {
     FillQueue();
     FakeLibc::onSleep = [this] { TakeMessage(queueId_); };
