@@ -1,5 +1,5 @@
-// Linked into the program in coverage builds only: the service ends without running destructors, which
-// would write the counters.
+// Linked into the program in coverage builds only: the service ends without running destructors,
+// which would write the counters.
 #include <cstdlib>
 
 extern "C" void __gcov_dump(void);

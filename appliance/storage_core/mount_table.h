@@ -9,8 +9,8 @@
 #include <string>
 #include <vector>
 
-// The table of the calling thread's mount namespace. Not the process's: a process whose first thread
-// has ended, as the pin service's can, has no readable table of its own.
+// The table of the calling thread's mount namespace. Not the process's: a process whose first
+// thread has ended, as the pin service's can, has no readable table of its own.
 constexpr char kMountTablePath[] = "/proc/thread-self/mountinfo";
 
 // One mount. Texts are decoded: a blank is a blank, not \040.

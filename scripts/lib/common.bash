@@ -48,7 +48,7 @@ with_build_folder() {
     mkdir -p "$folder"
     (
         flock 8
-        cd "$TREE"
+        cd "$TREE" || exit
         "$@" >"$folder/last.log" 2>&1 || {
             tail -n 60 "$folder/last.log" >&2
             die "\"$*\" failed; the whole output is in $folder/last.log"

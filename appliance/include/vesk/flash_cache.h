@@ -1,8 +1,8 @@
 // The appliance's flash-cache library (libveskflashcache.so): which SSD caches which space, and the
 // state of that cache.
 //
-// The tool is compiled against these declarations only; see storage_core.h. On the 32-bit target the
-// queries are six words and two words long.
+// The tool is compiled against these declarations only; see storage_core.h. On the 32-bit target
+// the queries are six words and two words long.
 //
 // Thread rule: no function keeps state between calls; calls from several threads are independent.
 #ifndef VESK_FLASH_CACHE_H
@@ -34,7 +34,8 @@ struct VESKFlashCacheStat {
     int32_t reserved3[19];
     int32_t supportPin; // 1: the cache driver supports pinning
 };
-static_assert(sizeof(VESKFlashCacheStat) == 23 * sizeof(int32_t), "supportPin is the record's 23rd word");
+static_assert(sizeof(VESKFlashCacheStat) == 23 * sizeof(int32_t),
+              "supportPin is the record's 23rd word");
 
 // What the 32-bit target needs: the sizes below are the vendor library's there.
 static_assert(sizeof(void *) != 4 || sizeof(VESKFlashCacheConfigQuery) == 24, "six words");

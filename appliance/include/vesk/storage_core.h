@@ -1,9 +1,10 @@
-// The appliance's storage-core library (libveskstoragecore.so): the mounted storage spaces and where
-// a file's data lies on a space's block device.
+// The appliance's storage-core library (libveskstoragecore.so): the mounted storage spaces and
+// where a file's data lies on a space's block device.
 //
-// The tool is compiled against these declarations only. On the appliance the vendor's library answers
-// them; on an ordinary Linux machine the stand-in in appliance/storage_core/ does. Layouts, names and
-// the order of virtual functions are a binary interface: changing one breaks the other library.
+// The tool is compiled against these declarations only. On the appliance the vendor's library
+// answers them; on an ordinary Linux machine the stand-in in appliance/storage_core/ does. Layouts,
+// names and the order of virtual functions are a binary interface: changing one breaks the other
+// library.
 //
 // Thread rule: no function keeps state between calls; calls from several threads are independent as
 // long as each uses its own list, device and table.
