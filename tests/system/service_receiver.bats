@@ -78,12 +78,12 @@ END
     send_record 6 "" ""
     wait_until request_is_done 1
     same 2 "$(config '.volumes["/volume1"].files | length')"
-    service_said <<END
-: Handle request (type=pinFiles files=a#$(inode a)) OK 
-: Space UUID is not set
-: Get wrong message format
-: Handle request (type=pinFiles files=b#$(inode b)) OK 
-END
+    stop_service
+    # Two threads write.
+    same "Get wrong message format
+Handle request (type=pinFiles files=a#$(inode a)) OK 
+Handle request (type=pinFiles files=b#$(inode b)) OK 
+Space UUID is not set" "$(sed -n '2,$s/^veskcachepinfiletool: //p' "$SERVICE_LOG" | sort)"
 }
 
 @test "types that are no request's end the receiver: negative, 7 and the largest" {

@@ -115,11 +115,13 @@ END
     pin 1 /volume1/a
     stop_service
     same "" "$(cat "$SERVICE_LOG")"
+    # The client and the service may both be writing.
+    LC_ALL=C sort -k 6 -o /run/syslog /run/syslog
     logged <<END
-Service starts (Build time: 2018-06-08-15:24)
-Send pin file request, files = /volume1/a
-Send pin file request OK
 Handle request (type=pinFiles files=a#$(inode a)) OK 
+Send pin file request OK
+Send pin file request, files = /volume1/a
+Service starts (Build time: 2018-06-08-15:24)
 END
 }
 

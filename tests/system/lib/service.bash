@@ -32,12 +32,20 @@ stop_service() { stop_service_by TERM; }
 stop_service_by() {
     local status=0
     kill -s "$1" "$SERVICE_PID"
+    wait_until service_has_ended
     wait "$SERVICE_PID" || status=$?
     SERVICE_PID=
     [ "$status" -eq 0 ] || {
         echo "the service ended with status $status"
         return 1
     }
+}
+
+# Every thread of it: its first one may have ended long before. The shell may have noticed already.
+service_has_ended() {
+    local threads=(/proc/"$SERVICE_PID"/task/*)
+    [ "${#threads[@]}" -eq 1 ] || return 1
+    [ ! -e "/proc/$SERVICE_PID" ] || grep -qs '^State:.Z' "/proc/$SERVICE_PID/status"
 }
 
 # Ends what a failed test left running, and shows what it wrote.
