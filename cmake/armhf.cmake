@@ -4,6 +4,8 @@ set(CMAKE_SYSTEM_PROCESSOR armv7l)
 set(VESK_ARM_SYSROOT ${CMAKE_CURRENT_LIST_DIR}/../build-armhf-sysroot CACHE PATH "armhf sysroot")
 list(APPEND CMAKE_TRY_COMPILE_PLATFORM_VARIABLES VESK_ARM_SYSROOT)
 set(CMAKE_CXX_COMPILER arm-linux-gnueabihf-g++)
+# Not a word about what GCC 7 changed: everything here is built by one compiler.
+set(CMAKE_CXX_FLAGS_INIT -Wno-psabi)
 set(CMAKE_SYSROOT ${VESK_ARM_SYSROOT})
 set(CMAKE_CROSSCOMPILING_EMULATOR qemu-arm-static -L ${VESK_ARM_SYSROOT})
 set(CMAKE_FIND_ROOT_PATH_MODE_PROGRAM NEVER)

@@ -239,7 +239,7 @@ void Ioctl(fuse_req_t request, fuse_ino_t inode, unsigned number, void *argument
         pin.number = number;
         pin.argument = reinterpret_cast<uintptr_t>(argument);
         pin.caller = {fuse_req_ctx(request)->pid,
-                      sizeof(void *) == 4 || (flags & (FUSE_IOCTL_COMPAT | kIoctlFrom32Bit)) != 0};
+                      (flags & (FUSE_IOCTL_COMPAT | kIoctlFrom32Bit)) != 0};
         pin.data = answer.data();
         const int result = PinRequestHandle(Served(request).device, pin);
         if (result != 0) {

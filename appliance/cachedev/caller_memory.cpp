@@ -15,6 +15,10 @@ int Transfer(TransferCall call, const Caller &caller, uint64_t address, void *bu
     if (caller.pid <= 0) {
         return -EFAULT;
     }
+    // The address has lost its upper half on the way here; the lower half is somewhere else.
+    if (!caller.is32bit && sizeof(void *) == 4) {
+        return -EOVERFLOW;
+    }
     constexpr size_t kMostBytes = 1U << 30U;
     for (size_t done = 0; done < size;) {
         const uint64_t remoteAddress = address + done;

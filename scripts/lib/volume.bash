@@ -9,7 +9,8 @@ export VESK_FLASHCACHE_CONFIG=/run/veskflashcache.json
 volume_device() { echo "/run/vesk$1/cachedev_$1"; }
 volume_state_file() { echo "/run/vesk$1/cachedev_$1.json"; }
 
-# volume_make N SIZE SSD_SIZE FSTYPE [veskcachedev option...]: sizes as truncate takes them.
+# volume_make N SIZE SSD_SIZE FSTYPE [veskcachedev option...]: sizes as truncate takes them;
+# MKFS_OPTIONS, words, go to mkfs.
 volume_make() {
     local n=$1 size=$2 ssd_size=$3 fstype=$4 device loop
     shift 4
@@ -18,17 +19,36 @@ volume_make() {
     truncate -s "$size" "/tmp/volume$n/backing"
     truncate -s "$ssd_size" "/tmp/volume$n/ssd"
     volume_serve --device "$device" --backing "/tmp/volume$n/backing" --ssd "/tmp/volume$n/ssd" "$@"
-    loop=$(losetup --find --show "$device")
+    loop=$(volume_attach "$device")
+    # shellcheck disable=SC2086
     case "$fstype" in
-    ext*) "mkfs.$fstype" -q -b 4096 "$loop" ;;
-    xfs) mkfs.xfs -q "$loop" ;;
-    *) "mkfs.$fstype" -q "$loop" ;;
+    ext*) "mkfs.$fstype" -q -b 4096 ${MKFS_OPTIONS:-} "$loop" ;;
+    *) "mkfs.$fstype" -q ${MKFS_OPTIONS:-} "$loop" ;;
     esac
     mount "$loop" "/volume$n"
     # Detaching a loop device in use only makes it go with its last user: no exit path can forget it.
     losetup --detach "$loop"
     echo "$loop" >"/tmp/volume$n/loop"
+    blkid -p -o value -s UUID "$loop" >"/tmp/volume$n/uuid"
     volume_configure
+}
+
+# volume_attach FILE: prints the loop device. The devices are the machine's, which makes new ones as they
+# are asked for; the nodes are the world's own. Another world may be faster with the device, once or twice.
+volume_attach() {
+    local loop tries=0
+    while [ "$tries" -lt 20 ]; do
+        loop=$(losetup --find)
+        [ -b "$loop" ] || mknod "$loop" b 7 "${loop#/dev/loop}"
+        if losetup "$loop" "$1" 2>/tmp/losetup.errors; then
+            echo "$loop"
+            return
+        fi
+        tries=$((tries + 1))
+        sleep 0.1
+    done
+    cat /tmp/losetup.errors >&2
+    return 1
 }
 
 # volume_serve VESKCACHEDEV_OPTION...: a cache device below /run.
@@ -44,18 +64,18 @@ volume_serve() {
 }
 
 volume_loop() { cat "/tmp/volume$1/loop"; }
-volume_uuid() { blkid -p -o value -s UUID "$(volume_loop "$1")"; }
+volume_uuid() { cat "/tmp/volume$1/uuid"; }
 
 # Writes the cache configuration for all volumes made so far; a running service sees the old or the new.
 volume_configure() {
-    local folder n separator=
+    local folder uuid separator=
     {
         printf '{"caches":['
         for folder in /tmp/volume[0-9]; do
-            n=${folder#/tmp/volume}
-            [ -e "$folder/loop" ] || continue
+            [ -e "$folder/uuid" ] || continue
+            read -r uuid <"$folder/uuid"
             printf '%s{"spaceUuid":"%s","ssdPath":"%s/ssd","cachePath":"%s"}' "$separator" \
-                "$(volume_uuid "$n")" "$folder" "$(volume_device "$n")"
+                "$uuid" "$folder" "$(volume_device "${folder#/tmp/volume}")"
             separator=,
         done
         printf ']}\n'

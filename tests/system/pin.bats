@@ -8,33 +8,6 @@ setup_file() { make_volume 1 "$SIZE" 16M "$FSTYPE"; }
 
 setup() { fresh_volume; }
 
-# The files are all that is pinned on volume 1: in the bitmap file, in the driver, in the records,
-# and their written blocks on the SSD.
-check_pinned() {
-    local file blocks written records=
-    blocks=$(blocks_of "$@")
-    written=$(written_blocks_of "$@")
-    [ -n "$blocks" ]
-    same "$blocks" "$(bitmap_blocks 1)"
-    same "$blocks" "$(driver_blocks 1)"
-    is_subset "$written" "$(pinned_blocks 1)"
-    is_subset "$(pinned_blocks 1)" "$blocks"
-    ssd_holds_the_data 1
-    for file in "$@"; do
-        device_holds_the_file 1 "$file"
-        records+="\"$(inode "$file")\":\"${file#/volume1/}\","
-    done
-    same "$(jq -cS . <<<"{${records%,}}")" "$(config '.volumes["/volume1"].files' | jq -cS .)"
-}
-
-check_nothing_pinned() {
-    same "" "$(bitmap_blocks 1)"
-    same "" "$(driver_blocks 1)"
-    same "" "$(pinned_blocks 1)"
-    same null "$(config '.volumes["/volume1"]')"
-    same '"Yes"' "$(jq -R . <<<"$(tool --is-all-unpin "$(volume_device 1)")")"
-}
-
 @test "a fragmented file is marked, sent, loaded and recorded" {
     fragmented a 12
     start_service
@@ -117,7 +90,7 @@ END
 
 @test "unpinning clears the blocks and releases the extents in their order" {
     fragmented a 8
-    fragmented b 3
+    fragmented_apart b 3 a
     start_service
     pin 1 /volume1/a /volume1/b
     unpin 1 /volume1/a

@@ -35,25 +35,27 @@ start_world() {
     WORLD_PID=$!
     wait_until grep -q ready "$BATS_TEST_TMPDIR/log"
     [ -n "$(processes_of_world)" ]
-    losetup --list --noheadings --output BACK-FILE | grep -q "$ID"
+    loop_devices_of_world
 }
 
 teardown() {
     [ -z "${WORLD_PID:-}" ] || kill -KILL "$WORLD_PID" 2>/dev/null || true
 }
 
+# Of the whole machine, whose nodes this world need not have.
+loop_devices_of_world() {
+    cat /sys/block/loop*/loop/backing_file 2>/dev/null | grep -q "$ID"
+}
+
 # The processes that have the program or the device on their command line.
 processes_of_world() {
-    local folder line
-    for folder in /proc/[0-9]*; do
-        line=$(tr '\0' ' ' <"$folder/cmdline" 2>/dev/null) || continue
-        case "$line" in *"$ID"* | *"$PROGRAM"*) echo "${folder#/proc/} $line" ;; esac
-    done
+    # The list of files is older than the process that looks, which so does not find itself.
+    grep -las -e "$ID" -e "$PROGRAM" /proc/[0-9]*/cmdline || true
 }
 
 nothing_is_left() {
     [ -z "$(processes_of_world)" ] &&
-        ! losetup --list --noheadings --output BACK-FILE | grep -q "$ID" &&
+        ! loop_devices_of_world &&
         ! grep -q "$ID" /proc/self/mountinfo
 }
 

@@ -8,13 +8,10 @@ load lib
 EXTENTS=1030
 
 setup_file() {
-    local i
     make_volume 1 192M 96M ext4
     # 4 KiB of every 128 KiB: each extent lies in a block of its own.
     dd if=/dev/urandom of=/volume1/a bs=128K count=$EXTENTS conv=fsync status=none
-    for ((i = 0; i < EXTENTS; i++)); do
-        fallocate --punch-hole -o $((i * 131072 + 4096)) -l $((131072 - 4096)) /volume1/a
-    done
+    "$HELPERS/system_fallocate" /volume1/a punch-hole 4096 131072 $((131072 - 4096)) $EXTENTS
     sync /volume1/a
 }
 

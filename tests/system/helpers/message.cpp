@@ -1,8 +1,11 @@
 // system_message send KEY_FILE TYPE [COUNT] <TEXT
 // system_message receive KEY_FILE TYPE >TEXT
+// system_message record TYPE MOUNT_PATH DATA >TEXT
 //
 // Puts messages of any type and text on the queue that the key file names, or takes one off it.
-// Ends with 1 where the queue refuses: it is full, or holds no message of that type.
+// The third prints a request record: 4 bytes of type, then the texts, each cut or filled with NUL
+// bytes to its field of 512 and 1024 bytes. Ends with 1 where the queue refuses: it is full, or
+// holds no message of that type.
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -66,12 +69,28 @@ int Receive(int queue, Message &message) {
                : Fail("write");
 }
 
+int PrintRecord(const char *type, const std::string &mountPath, const std::string &data) {
+    const auto value = static_cast<unsigned long>(strtol(type, nullptr, 10));
+    std::string record(4 + 512 + 1024, '\0');
+    for (unsigned i = 0; i < 4; ++i) {
+        record[i] = static_cast<char>(value >> (8 * i) & 255);
+    }
+    mountPath.copy(&record[4], 512);
+    data.copy(&record[4 + 512], 1024);
+    return fwrite(record.data(), 1, record.size(), stdout) == record.size() ? 0 : 1;
+}
+
 } // namespace
 
 int main(int argc, char **argv) {
     if (argc < 4) {
-        fputs("usage: system_message send|receive KEY_FILE TYPE [COUNT]\n", stderr);
+        fputs("usage: system_message send|receive KEY_FILE TYPE [COUNT]\n"
+              "       system_message record TYPE MOUNT_PATH DATA\n",
+              stderr);
         return 2;
+    }
+    if (strcmp(argv[1], "record") == 0 && argc == 5) {
+        return PrintRecord(argv[2], argv[3], argv[4]);
     }
     const int queue = OpenQueue(argv[2]);
     if (queue < 0) {

@@ -7,8 +7,10 @@
 extents() {
     local file
     for file in "$@"; do
-        filefrag -v -b512 "$file" | sed -n 's/^ *[0-9]*: *//p' | tr -d '.:' |
-            awk '$NF !~ /delalloc|inline/ { print $1, $3, $5, $NF }'
+        filefrag -v -b512 "$file" | awk '/^ *[0-9]+:/ && !/delalloc|inline/ {
+            gsub(/\.\.|:/, " ")
+            print $2, $4, $6, $NF
+        }'
     done
 }
 
@@ -21,20 +23,32 @@ blocks_of() { extents "$@" | awk '{ print $2, $3 }' | sectors_to_blocks; }
 written_blocks_of() { extents "$@" | awk '!/unwritten/ { print $2, $3 }' | sectors_to_blocks; }
 
 # ranges_of FILE...: the extents as the unpin request lists them, in JSON.
-ranges_of() { extents "$@" | jq -c -n -R '[inputs | split(" ") | [(.[1:3][] | tonumber)]]'; }
+ranges_of() {
+    extents "$@" | awk '
+        { ranges = ranges separator "[" $2 "," $3 "]"; separator = "," }
+        END { print "[" ranges "]" }'
+}
 
 # bits_of FILE: the set bits of a bitmap file, least significant bit of each byte first.
-bits_of() {
-    od -An -v -w1 -tu1 "$1" |
-        awk '{ for (i = 0; i < 8; i++) if (int($1 / 2 ^ i) % 2) print (NR - 1) * 8 + i }'
-}
+bits_of() { "$HELPERS/system_bits" "$1"; }
 
 bitmap_file() { echo "/volume$1/veskcachepinfile.bitmap"; }
 bitmap_blocks() { bits_of "$(bitmap_file "$1")"; }
 
 # What the cache device of volume N says. state N JQ_FILTER.
 state() { jq -c "$2" "$(volume_state_file "$1")"; }
-expand_runs() { jq ".$2[] | range(.[0]; .[0] + .[1])" "$(volume_state_file "$1")"; }
+# The blocks of a member that lists runs, [first, number].
+expand_runs() {
+    awk -v name="\"$2\":" '{
+        rest = substr($0, index($0, name) + length(name))
+        end = index(rest, "\"")
+        if (end) rest = substr(rest, 1, end - 1)
+        gsub(/[^0-9]+/, " ", rest)
+        count = split(rest, run, " ")
+        for (i = 1; i < count; i += 2)
+            for (block = run[i]; block < run[i] + run[i + 1]; block++) print block
+    }' "$(volume_state_file "$1")"
+}
 driver_blocks() { expand_runs "$1" bitmapBits; }
 pinned_blocks() { expand_runs "$1" pinned; }
 cached_blocks() { jq '.slotBlocks[] | select(. >= 0)' "$(volume_state_file "$1")" | sort -n; }
@@ -53,26 +67,16 @@ common() { comm -12 <(sort -u <<<"$1") <(sort -u <<<"$2"); }
 
 # Every cached block's slot on the SSD of volume N holds the bytes of the backing image.
 ssd_holds_the_data() {
-    local slot=0 block folder=/tmp/volume$1
-    for block in $(jq '.slotBlocks[]' "$(volume_state_file "$1")"); do
-        if [ "$block" -ge 0 ]; then
-            cmp -n 65536 -i "$((slot * 65536)):$((block * 65536))" "$folder/ssd" "$folder/backing" || {
-                echo "slot $slot, block $block"
-                return 1
-            }
-        fi
-        slot=$((slot + 1))
-    done
+    jq '.slotBlocks[]' "$(volume_state_file "$1")" |
+        awk '$1 >= 0 { printf "%d %.0f 65536\n", (NR - 1) * 65536, $1 * 65536 }' |
+        "$HELPERS/system_compare" "/tmp/volume$1/ssd" "/tmp/volume$1/backing"
 }
 
 # The written extents of FILE lie on the device of volume N where the file system says they do.
 device_holds_the_file() {
-    local start device count flags
-    while read -r start device count flags; do
-        case "$flags" in *unwritten*) continue ;; esac
-        cmp -n "$((count * 512))" -i "$((start * 512)):$((device * 512))" "$2" \
-            "/tmp/volume$1/backing" || return 1
-    done < <(trim_to_size "$2")
+    trim_to_size "$2" |
+        awk '!/unwritten/ { printf "%.0f %.0f %d\n", $1 * 512, $2 * 512, $3 * 512 }' |
+        "$HELPERS/system_compare" "$2" "/tmp/volume$1/backing"
 }
 
 # The extents of FILE without what lies behind its end.
@@ -90,11 +94,47 @@ random() { dd if=/dev/urandom of="$1" bs="$2" count=1 status=none "${@:3}"; }
 # fragmented FILE PIECES: a file without holes whose pieces of 64 KiB, and 4 KiB behind them, are
 # extents of their own: what lay between them is cut out.
 fragmented() {
-    local i
     random "$1" $(($2 * 128 + 4))K conv=fsync
-    for ((i = $2 - 1; i >= 0; i--)); do
-        fallocate --collapse-range -o $((i * 131072 + 65536)) -l 65536 "$1"
-    done
+    "$HELPERS/system_fallocate" "$1" collapse-range 65536 131072 65536 "$2"
     sync "$1"
     [ "$(extents "$1" | wc -l)" -gt "$2" ]
+}
+
+# fragmented_apart FILE PIECES OTHER: the same, sharing no block with the other file.
+fragmented_apart() {
+    local spare=0
+    fragmented "$1" "$2"
+    while [ -n "$(common "$(blocks_of "$1")" "$(blocks_of "$3")")" ]; do
+        spare=$((spare + 1))
+        [ "$spare" -lt 10 ]
+        mv "$1" "$1.spare$spare"
+        fragmented "$1" "$2"
+    done
+}
+
+# The files are all that is pinned on volume 1: in the bitmap file, in the driver, in the records,
+# and their written blocks on the SSD.
+check_pinned() {
+    local file blocks written records=
+    blocks=$(blocks_of "$@")
+    written=$(written_blocks_of "$@")
+    [ -n "$blocks" ]
+    same "$blocks" "$(bitmap_blocks 1)"
+    same "$blocks" "$(driver_blocks 1)"
+    is_subset "$written" "$(pinned_blocks 1)"
+    is_subset "$(pinned_blocks 1)" "$blocks"
+    ssd_holds_the_data 1
+    for file in "$@"; do
+        device_holds_the_file 1 "$file"
+        records+="\"$(inode "$file")\":\"${file#/volume1/}\","
+    done
+    same "$(jq -cS . <<<"{${records%,}}")" "$(config '.volumes["/volume1"].files' | jq -cS .)"
+}
+
+check_nothing_pinned() {
+    same "" "$(bitmap_blocks 1)"
+    same "" "$(driver_blocks 1)"
+    same "" "$(pinned_blocks 1)"
+    same null "$(config '.volumes["/volume1"]')"
+    same '"Yes"' "$(jq -R . <<<"$(tool --is-all-unpin "$(volume_device 1)")")"
 }

@@ -20,9 +20,11 @@ start_service() { run_service --stdout "$@" >"$SERVICE_LOG" 2>&1; }
 
 # It handles SIGTERM and its queue is there.
 service_is_ready() {
-    local caught
-    caught=$(sed -n 's/^SigCgt:\t//p' "/proc/$SERVICE_PID/status") || return 1
-    [ -n "$caught" ] && ((0x$caught & 0x4000)) && [ -s "$KEY_FILE" ]
+    local key value
+    while read -r key value; do
+        [ "$key" != SigCgt: ] || break
+    done <"/proc/$SERVICE_PID/status" || return 1
+    [ -n "$value" ] && ((0x$value & 0x4000)) && [ -s "$KEY_FILE" ]
 }
 
 # The service must end with status 0.
@@ -71,19 +73,34 @@ service_said() {
         diff -u "$BATS_TEST_TMPDIR/expected" -
 }
 
-# The number that the next request will get.
-next_number() { jq -r '.nextRequestNum // 0' "$CONF" 2>/dev/null || echo 0; }
+# What is asked again and again is read from the document's text, without a process.
 
-# Request NUMBER is in the configuration file / is not in it any more.
+# Sets NEXT_NUMBER, the number that the next request will get, and QUEUE, the queue as it is written.
+look_at_requests() {
+    local text='' rest
+    NEXT_NUMBER=0 QUEUE=
+    [ ! -e "$CONF" ] || IFS= read -rd '' text <"$CONF" || true
+    [[ ! $text =~ \"nextRequestNum\"[[:space:]]*:[[:space:]]*([0-9]+) ]] ||
+        NEXT_NUMBER=${BASH_REMATCH[1]}
+    [[ $text =~ \"requestQueue\"[[:space:]]*:[[:space:]]*\[ ]] || return 0
+    rest=${text#*"${BASH_REMATCH[0]}"}
+    QUEUE=${rest%%]*}
+}
+
+# Request NUMBER is in the configuration file / is not in it any more / was never.
 request_is_stored() {
-    jq -e --argjson n "$1" '.nextRequestNum > $n' "$CONF" >/dev/null 2>&1
+    look_at_requests
+    [ "$NEXT_NUMBER" -gt "$1" ]
 }
 request_is_done() {
-    jq -e --argjson n "$1" '.nextRequestNum > $n and
-        (.requestQueue | index($n | tostring) | not)' "$CONF" >/dev/null 2>&1
+    look_at_requests
+    [ "$NEXT_NUMBER" -gt "$1" ] && [[ $QUEUE != *"\"$1\""* ]]
 }
 config_has() { jq -e "$1" "$CONF" >/dev/null 2>&1; }
-queue_is_empty() { jq -e '.requestQueue | length == 0' "$CONF" >/dev/null 2>&1; }
+queue_is_empty() {
+    look_at_requests
+    [ -e "$CONF" ] && [[ $QUEUE != *[0-9]* ]]
+}
 
 # join FILE...: the form of the files argument.
 join() {
@@ -97,7 +114,8 @@ unpin() { request_and_wait --unpin-files "$(join "${@:2}")" --mount-path "/volum
 reload() { request_and_wait --reload-blocks --mount-path "/volume$1"; }
 request_and_wait() {
     local number
-    number=$(next_number)
+    look_at_requests
+    number=$NEXT_NUMBER
     tool "$@"
     wait_until request_is_done "$number"
 }

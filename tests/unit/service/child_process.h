@@ -7,6 +7,7 @@
 #define TESTS_SERVICE_CHILD_PROCESS_H
 
 #include <chrono>
+#include <cstdlib>
 #include <functional>
 #include <string>
 #include <sys/types.h>
@@ -20,6 +21,14 @@
 #else
 #define SKIP_WHERE_SIGNALS_COME_LATE() static_assert(true, "a semicolon follows")
 #endif
+
+// User-mode emulation catches signals itself, so the kernel does not tell which ones the test's
+// process catches.
+#define SKIP_WHERE_SIGNALS_ARE_EMULATED()                                                          \
+    if (getenv("VESK_USER_EMULATION") != nullptr) {                                                \
+        GTEST_SKIP() << "the emulator, not the process, catches the signals here";                 \
+    }                                                                                              \
+    static_assert(true, "a semicolon follows")
 
 class ChildProcess {
 public:

@@ -59,6 +59,7 @@ TEST_F(SignalHandlerTest, AFailureEndsItAndLeavesTheHandlersBeforeIt) {
 }
 
 TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten) {
+    SKIP_WHERE_SIGNALS_ARE_EMULATED();
     for (const int number : endingSignals) {
         ChildProcess child({2}, [] {
             SetSignalHandler();
@@ -116,6 +117,7 @@ TEST_F(SignalHandlerTest, OtherSignalsKeepTheirActions) {
 
 TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheHandlerRunsWhereItIsInterrupted) {
     SKIP_WHERE_SIGNALS_COME_LATE();
+    SKIP_WHERE_SIGNALS_ARE_EMULATED();
     ChildProcess child({2}, [] {
         RefuseThreads();
         if (SetSignalHandler() != 0 || SignalState() != 0b000111) {

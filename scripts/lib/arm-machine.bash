@@ -1,0 +1,105 @@
+# The emulated ARM machine: Debian's armhf kernel and programs, with this tree at its own place, so that
+# CTest's files hold there too. To be sourced after foreign.bash and
+# foreign_use armhf.
+
+ARM_MACHINE=$TREE/build-armhf-machine
+
+ARM_MACHINE_PACKAGES="bash coreutils util-linux util-linux-extra mount fdisk e2fsprogs xfsprogs procps
+    kmod libc-bin grep sed mawk findutils diffutils gzip tar hostname debianutils perl-base dash busybox-static
+    bats jq python3-minimal cmake libjsoncpp25 libmount1 libblkid1 libfuse3-3 libstdc++6 libgtest-dev"
+ARM_KERNEL=linux-image-armmp
+
+# What the packages' set-up scripts would have made and the tests need.
+arm_configure() { # ROOT
+    printf 'root:x:0:0:root:/root:/bin/bash\nnobody:x:65534:65534:nobody:/nonexistent:/bin/false\n' \
+        >"$1/etc/passwd"
+    printf 'root:x:0:\nnogroup:x:65534:\n' >"$1/etc/group"
+    printf '127.0.0.1 localhost\n' >"$1/etc/hosts"
+    [ -e "$1/bin/sh" ] || ln -s dash "$1/bin/sh"
+    [ -e "$1/usr/bin/awk" ] || ln -s mawk "$1/usr/bin/awk"
+    ln -sfn /proc/self/mounts "$1/etc/mtab"
+    rm -rf "$1/var/run"
+    mkdir -p "$1/var" "$1/root" "$1/mnt" "$1/tmp" "$1/run" "$1/proc" "$1/sys" "$1/dev"
+    ln -sfn /run "$1/var/run"
+}
+
+# The kernel that the newest package of Debian's stands for.
+arm_kernel_package() {
+    foreign_apt apt-cache show "$ARM_KERNEL" |
+        sed -n 's/^Depends: \(linux-image-[^ ,]*\).*/\1/p' | head -n 1
+}
+
+arm_make_kernel() {
+    local work=$ARM_MACHINE/kernel version module modules package
+    package=$(arm_kernel_package)
+    rm -rf "$work"
+    mkdir -p "$work/initramfs/bin" "$work/initramfs/root"
+    (cd "$work" && foreign_apt apt-get -q download "$package")
+    dpkg-deb -x "$work/$package"_*.deb "$work"
+    version=$(basename "$work"/lib/modules/*)
+    depmod -b "$work" "$version"
+    cp "$ARM_MACHINE/root/bin/busybox" "$work/initramfs/bin/"
+    modules=$(modprobe -d "$work" -S "$version" --show-depends -a virtio_mmio virtio_blk ext4 |
+        sed -n 's/^insmod //p' | awk '!seen[$1]++ { print $1 }')
+    {
+        printf '#!/bin/busybox sh\n'
+        for module in $modules; do
+            cp "$module" "$work/initramfs/"
+            printf '/bin/busybox insmod /%s\n' "$(basename "$module")"
+        done
+        printf '/bin/busybox mkdir -p /dev; /bin/busybox mount -t devtmpfs devtmpfs /dev\n'
+        printf '/bin/busybox mount -t ext4 /dev/vda /root\n'
+        printf '/bin/busybox umount /dev\n'
+        printf 'exec /bin/busybox switch_root /root %s/tests/system/arm-init %s\n' "$TREE" "$TREE"
+    } >"$work/initramfs/init"
+    chmod +x "$work/initramfs/init"
+    (cd "$work/initramfs" && find . | cpio -o -H newc --quiet | gzip -1) >"$ARM_MACHINE/initrd.gz"
+    cp "$work"/boot/vmlinuz-* "$ARM_MACHINE/vmlinuz"
+    cp -a "$work/lib/modules" "$ARM_MACHINE/root/lib/"
+    rm -rf "$work"
+}
+
+# Everything that does not change with this tree.
+arm_make_machine() {
+    # shellcheck disable=SC2086
+    foreign_download "$FOREIGN_APT/machine" $ARM_MACHINE_PACKAGES
+    foreign_unpack "$ARM_MACHINE/root" "$FOREIGN_APT"/machine/archives/*.deb
+    rm -rf "$ARM_MACHINE"/root/usr/share/{doc,man,locale,info} "$ARM_MACHINE/root/usr/include"
+    arm_configure "$ARM_MACHINE/root"
+    arm_make_kernel
+}
+
+arm_make_machine_if_needed() {
+    local made_of=$ARM_MACHINE/.packages
+    [ "$(cat "$made_of" 2>/dev/null)" != "$ARM_MACHINE_PACKAGES" ] || return 0
+    with_build_folder armhf-machine arm_make_machine
+    echo "$ARM_MACHINE_PACKAGES" >"$made_of"
+}
+
+# The root disk: the machine's programs, and this tree without what only building needs.
+arm_make_disk() {
+    local stage=$ARM_MACHINE/stage
+    rm -rf "$stage" "$ARM_MACHINE/disk.img"
+    mkdir -p "$stage"
+    cp -al "$ARM_MACHINE/root/." "$stage/"
+    mkdir -p "$stage$TREE"
+    tar -c -C "$TREE" --exclude '*.o' --exclude '*.a' --exclude CMakeFiles \
+        scripts tests docs build-armhf | tar -x -C "$stage$TREE"
+    # The unit tests are registered with the emulator in front, which is not needed there.
+    printf '#!/bin/bash\nshift 2\nexec "$@"\n' >"$stage/usr/bin/qemu-arm-static"
+    chmod +x "$stage/usr/bin/qemu-arm-static"
+    truncate -s 2G "$ARM_MACHINE/disk.img"
+    /sbin/mke2fs -q -F -t ext4 -b 4096 -d "$stage" "$ARM_MACHINE/disk.img"
+    rm -rf "$stage"
+}
+
+# arm_boot SECONDS FIRST STEP: boots a machine that runs every STEP-th test from the FIRST on and
+# switches itself off; its console goes to standard output. Nothing is kept of what it writes.
+arm_boot() {
+    timeout --foreground "$1" qemu-system-arm -M virt -cpu cortex-a15 -smp 1 -m 1536 -accel tcg \
+        -nographic -no-reboot -nodefaults -serial stdio -snapshot \
+        -kernel "$ARM_MACHINE/vmlinuz" -initrd "$ARM_MACHINE/initrd.gz" \
+        -append "console=ttyAMA0 quiet panic=-1 vesk_share=$2,$3" \
+        -drive "if=none,file=$ARM_MACHINE/disk.img,format=raw,id=root" \
+        -device virtio-blk-device,drive=root </dev/null
+}
