@@ -27,6 +27,9 @@ add_library(vesk::options ALIAS vesk_options)
 target_compile_definitions(vesk_options INTERFACE _GNU_SOURCE _FILE_OFFSET_BITS=64)
 target_compile_options(vesk_options INTERFACE
   -Wall -Wextra -Wconversion -Wshadow -ffunction-sections -fdata-sections)
+if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+  target_compile_options(vesk_options INTERFACE -Wthread-safety)
+endif()
 # A run path that LD_LIBRARY_PATH overrides: an appliance puts its own libraries in place that way.
 target_link_options(vesk_options INTERFACE -Wl,--gc-sections -Wl,--enable-new-dtags -Wl,--as-needed)
 

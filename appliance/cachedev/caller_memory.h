@@ -26,8 +26,8 @@ constexpr size_t kDescriptorBytes32 = 8;  // {u32 address, u32 length}
 constexpr size_t kDescriptorBytes64 = 16; // {u64 address, u32 length, 4 bytes of padding}
 
 // Copies `size` bytes from `address` in the caller's memory into `buffer`. 0, or -EFAULT when not
-// all of them can be had (the content of `buffer` is then undefined), or -EOVERFLOW when the caller's
-// pointers are wider than this process's.
+// all of them can be had (the content of `buffer` is then undefined), or -EOVERFLOW when the
+// caller's pointers are wider than this process's.
 int CallerRead(const Caller &caller, uint64_t address, void *buffer, size_t size);
 
 // Copies `size` bytes from `buffer` to `address` in the caller's memory. 0, or -EFAULT when not all

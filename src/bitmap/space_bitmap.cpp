@@ -62,7 +62,8 @@ int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool 
     record->size = static_cast<uint32_t>(memoryBytes);
     LogVerbose("Allocate %zu bytes bitmap", static_cast<size_t>(memoryBytes));
 
-    if (!PathExists(bitmapPath.get())) {
+    // A file that cannot be looked up is not taken for a missing one: it holds the volume's pins.
+    if (PathIsMissing(bitmapPath.get())) {
         LogVerbose("Bitmap files (%s) doesn't exist", bitmapPath.get());
         return 0;
     }

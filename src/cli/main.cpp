@@ -17,7 +17,9 @@
 #include "service/start_service.h"
 
 #include <cstdio>
+#include <json/value.h>
 #include <libgen.h>
+#include <new>
 
 namespace {
 
@@ -28,7 +30,7 @@ ToolParameters parameters;
 
 } // namespace
 
-int main(int argc, char *argv[]) {
+int main(int argc, char *argv[]) try {
     ProgramName = basename(argv[0]);
     LogVerbose("Process name = %s", ProgramName);
     if (GetOptions(argc, argv, &parameters) < 0) {
@@ -247,4 +249,10 @@ int main(int argc, char *argv[]) {
 
     LogTraceExit();
     return exitValue;
+} catch (const std::bad_alloc &) {
+    LogError("Out of memory");
+    return -1;
+} catch (const Json::Exception &) { // which the JSON library throws for want of memory, too
+    LogError("Out of memory");
+    return -1;
 }

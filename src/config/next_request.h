@@ -9,6 +9,7 @@
 #define CONFIG_NEXT_REQUEST_H
 
 #include "config/request_record.h"
+#include "service/service_state.h"
 
 #include <string>
 
@@ -19,6 +20,6 @@ const int nextRequestError = 3; // after an error message; the file is as it was
 // Fills `*out` and `*num` when a request was taken. `*out` must be zeroed. Blocks, without a time
 // limit, while the file is missing or the queue is empty.
 int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
-                                          std::string *num);
+                                          std::string *num) NEEDS_NO_LOCK(serviceLock);
 
 #endif

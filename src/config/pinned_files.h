@@ -10,6 +10,7 @@
 #define CONFIG_PINNED_FILES_H
 
 #include "config/request_record.h"
+#include "service/service_state.h"
 
 #include <json/value.h>
 #include <string>
@@ -24,7 +25,7 @@ int JsonRemovePinFileVolume(Json::Value &root, const char *mountPath);
 // Records a request that succeeded and removes it from the queue, in one write. 0, or -1 after an
 // error message with the file as it was.
 int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *record,
-                                   const std::string &num);
+                                   const std::string &num) NEEDS_NO_LOCK(serviceLock);
 
 // Removes the volume's records from the file. A missing file or volume is success and writes
 // nothing. 0, or -1 after an error message with the file as it was.

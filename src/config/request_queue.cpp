@@ -61,7 +61,9 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
 int ConfigAddRequest(const char *configPath, const RequestRecord *record) {
     const ServiceLockGuard lock;
     Json::Value root;
-    if (PathExists(configPath) && ConfigReadDocument(configPath, &root) < 0) {
+    // A file that cannot be looked up is not taken for a missing one: writing a new document over
+    // it would lose every record.
+    if (!PathIsMissing(configPath) && ConfigReadDocument(configPath, &root) < 0) {
         LogError("Can't read data from config file (%s)", configPath);
         return -1;
     }

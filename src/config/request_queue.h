@@ -10,6 +10,7 @@
 #define CONFIG_REQUEST_QUEUE_H
 
 #include "config/request_record.h"
+#include "service/service_state.h"
 
 #include <json/value.h>
 #include <string>
@@ -20,7 +21,8 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record);
 
 // Adds the request to the file; creates the file if it is missing. 0, or -1 after an error message
 // with the file as it was.
-int ConfigAddRequest(const char *configPath, const RequestRecord *record);
+int ConfigAddRequest(const char *configPath, const RequestRecord *record)
+    NEEDS_NO_LOCK(serviceLock);
 
 // Removes the request from the queue and the requests. 0, or -1 after an error message; then the
 // tree may be half changed.
@@ -28,11 +30,12 @@ int JsonRemoveRequest(Json::Value &root, const std::string &num);
 
 // Reads the document and counts its queued requests. 0, or -1 when it cannot be used. Takes no
 // lock: the caller holds it.
-int ConfigGetJsonAndNumRequest(const char *configPath, Json::Value *root, int *count);
+int ConfigGetJsonAndNumRequest(const char *configPath, Json::Value *root, int *count)
+    NEEDS_LOCK(serviceLock);
 
 // Removes a request that failed. The record is not used. 0, or -1 after an error message with the
 // file as it was.
 int ConfigDropErrorRequest(const char *configPath, const RequestRecord *record,
-                           const std::string &num);
+                           const std::string &num) NEEDS_NO_LOCK(serviceLock);
 
 #endif

@@ -36,7 +36,11 @@ bool IsFolderRefusal(int error) {
     return error == EACCES || error == EPERM || error == EROFS || error == EBUSY || error == EXDEV;
 }
 
+// A full disk is as unreported here as it is when the content is written.
 Attempt AttemptFromErrno() {
+    if (errno == ENOSPC || errno == EDQUOT) {
+        return Attempt::NotWritten;
+    }
     return IsFolderRefusal(errno) ? Attempt::NotAllowed : Attempt::NotCreated;
 }
 
@@ -126,11 +130,12 @@ FileReplaceResult ReplaceExisting(const char *path, const struct stat &old,
     }
     const MallocText target(realpath(path, nullptr));
     if (!target) {
-        return WriteInPlace(path, content);
+        // A file without a name any more can only be written in place.
+        return errno == ENOENT ? WriteInPlace(path, content) : FileReplaceResult::CannotOpen;
     }
     switch (ReplaceByRename(target.get(), &old, content)) {
     case Attempt::Done: return FileReplaceResult::Done;
-    case Attempt::NotCreated:
+    case Attempt::NotCreated: return FileReplaceResult::CannotOpen;
     case Attempt::NotWritten: return FileReplaceResult::NotWritten;
     case Attempt::NotAllowed: break;
     }

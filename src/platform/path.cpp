@@ -2,6 +2,7 @@
 
 #include "cli/log.h"
 
+#include <cerrno>
 #include <sys/stat.h>
 
 namespace {
@@ -34,6 +35,14 @@ int FileGetInodeNumber(const char *path, uint32_t *inode) {
 int PathExists(const char *path) {
     struct stat status {};
     return stat(path, &status) == 0 ? 1 : 0;
+}
+
+int PathIsMissing(const char *path) {
+    struct stat status {};
+    return stat(path, &status) < 0 &&
+                   (errno == ENOENT || errno == ENOTDIR || errno == ELOOP || errno == ENAMETOOLONG)
+               ? 1
+               : 0;
 }
 
 int PathIsFile(const char *path) {

@@ -10,8 +10,10 @@
 
 #include <cerrno>
 #include <cstring>
+#include <exception>
 #include <pthread.h>
 #include <sys/msg.h>
+#include <unistd.h>
 
 int ServerMsgQueueId = -1;
 
@@ -23,6 +25,19 @@ void CompleteRecord(RequestRecord *record, size_t received) {
     memset(reinterpret_cast<char *>(record) + received, 0, sizeof(*record) - received);
     record->mountPath[sizeof(record->mountPath) - 1] = '\0';
     record->data[sizeof(record->data) - 1] = '\0';
+}
+
+// What a taken message asks for, tried until there is memory for it: the message is off the queue,
+// and nobody would send it again.
+template <typename Operation> int DoPatiently(Operation operation) {
+    for (;;) {
+        try {
+            return operation();
+        } catch (const std::exception &error) {
+            LogError("Message is held back: %s", error.what());
+            sleep(1);
+        }
+    }
 }
 
 } // namespace
@@ -53,7 +68,9 @@ void GetRequests(const char *configPath) {
             if (record.type == requestAddPendingSpace) {
                 if (ServiceIsPendingSpace(record.mountPath)) {
                     LogVerbose("Space (%s) is already in pending list", record.mountPath);
-                } else if (ServiceAddPendingSpaceAtomic(record.mountPath) < 0) {
+                } else if (DoPatiently([&] {
+                               return ServiceAddPendingSpaceAtomic(record.mountPath);
+                           }) < 0) {
                     LogError("Add spend space error");
                     break;
                 }
@@ -63,7 +80,9 @@ void GetRequests(const char *configPath) {
                 if (!ServiceIsPendingSpace(record.mountPath)) {
                     LogNotice("Space (%s) is not in pending list. Could be a new space",
                               record.mountPath);
-                } else if (ServiceRemovePendingSpaceAtomic(record.mountPath) < 0) {
+                } else if (DoPatiently([&] {
+                               return ServiceRemovePendingSpaceAtomic(record.mountPath);
+                           }) < 0) {
                     LogError("Remove pending space error");
                     break;
                 }
@@ -73,7 +92,7 @@ void GetRequests(const char *configPath) {
                 LogError("Get wrong message format");
                 break;
             }
-            if (ConfigAddRequest(configPath, &record) < 0) {
+            if (DoPatiently([&] { return ConfigAddRequest(configPath, &record); }) < 0) {
                 LogError("Can't add request to config (%s)", configPath);
                 break;
             }

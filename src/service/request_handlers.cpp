@@ -26,11 +26,19 @@ std::string FullPath(const char *mountPath, const FileInfo &file) {
     return std::string(mountPath) + "/" + file.szRelativePath;
 }
 
+// What the load leaves, also where it fails, belongs to the holder.
+int LoadBitmap(const char *uuid, BitmapHolder *bitmap, bool *sizeChanged) {
+    PinBitmap *loaded = nullptr;
+    const int result = BitmapAllocateAndInitialize(uuid, &loaded, sizeChanged);
+    bitmap->reset(loaded);
+    return result;
+}
+
 } // namespace
 
 int HandleRequest(const RequestRecord *record) {
     int result = handleFailed;
-    PinBitmap *bitmap = nullptr;
+    BitmapHolder bitmap;
     bool sizeChanged = false;
     MallocText uuid;
     MallocText cachePath;
@@ -45,18 +53,18 @@ int HandleRequest(const RequestRecord *record) {
         LogError("Can't get cache path");
     } else if (bitmapPath.reset(SpaceGetBitmapPath(uuid.get())); !bitmapPath) {
         LogError("Can't get bitmap path");
-    } else if (BitmapAllocateAndInitialize(uuid.get(), &bitmap, &sizeChanged) < 0) {
+    } else if (LoadBitmap(uuid.get(), &bitmap, &sizeChanged) < 0) {
         LogError("Allocate bitmap failed");
     } else if (record->type == requestReloadPinBlocks) {
-        result = ReloadPinBlocksToCache(bitmap, cachePath.get(), record->mountPath);
+        result = ReloadPinBlocksToCache(bitmap.get(), cachePath.get(), record->mountPath);
     } else if (RequestDataGetFileInfos(record->data, &files) < 0) {
         LogError("Can't parse file inodes from request's data (%s)", record->data);
     } else if (record->type == requestPinFiles) {
-        result =
-            HandlePinRequest(files, bitmap, record->mountPath, cachePath.get(), bitmapPath.get());
+        result = HandlePinRequest(files, bitmap.get(), record->mountPath, cachePath.get(),
+                                  bitmapPath.get());
     } else {
-        result =
-            HandleUnpinRequest(files, bitmap, record->mountPath, cachePath.get(), bitmapPath.get());
+        result = HandleUnpinRequest(files, bitmap.get(), record->mountPath, cachePath.get(),
+                                    bitmapPath.get());
     }
 
     if (result == handleFailed) {
@@ -68,7 +76,7 @@ int HandleRequest(const RequestRecord *record) {
     }
     // Also where there is none: its message then tells that the request ended before the bitmap was
     // loaded.
-    BitmapFree(bitmap);
+    BitmapFree(bitmap.release());
     return result;
 }
 

@@ -9,6 +9,7 @@
 #include "service/request_handlers.h"
 #include "service/signal_handler.h"
 
+#include <exception>
 #include <pthread.h>
 #include <unistd.h>
 
@@ -17,30 +18,37 @@ void *DoRequests(void *options) {
         LogTraceScope();
         const char *configPath = static_cast<const ToolParameters *>(options)->configPath;
         for (;;) {
-            RequestRecord record{};
-            std::string num;
-            const int taken = ConfigParseAndGetNextAvailableRequest(configPath, &record, &num);
-            if (taken == nextRequestError) {
-                break;
-            }
-            if (taken != nextRequestTaken) {
+            try {
+                RequestRecord record{};
+                std::string num;
+                const int taken = ConfigParseAndGetNextAvailableRequest(configPath, &record, &num);
+                if (taken == nextRequestError) {
+                    break;
+                }
+                if (taken != nextRequestTaken) {
+                    sleep(1);
+                    continue;
+                }
+                const int handled = HandleRequestAndModifyConfig(configPath, &record, num);
+                if (handled == handleFailed) {
+                    continue;
+                }
+                if (handled == handleInterrupted) {
+                    LogNotice("Handle request (%s). Get interrupted !", num.c_str());
+                } else if (record.type == requestPinFiles || record.type == requestUnpinFiles) {
+                    LogNotice("Handle request (type=%s files=%s) OK ",
+                              RequestTypeToString(record.type), record.data);
+                } else {
+                    LogNotice("Handle request (type=%s) OK ", RequestTypeToString(record.type));
+                }
+                // Also what makes a held-back request run: the end of a pending state signals
+                // nothing.
                 sleep(1);
-                continue;
+            } catch (const std::exception &error) {
+                // Memory is short. Whatever was going on, the request is still queued.
+                LogError("Request is put off: %s", error.what());
+                sleep(1);
             }
-            const int handled = HandleRequestAndModifyConfig(configPath, &record, num);
-            if (handled == handleFailed) {
-                continue;
-            }
-            if (handled == handleInterrupted) {
-                LogNotice("Handle request (%s). Get interrupted !", num.c_str());
-            } else if (record.type == requestPinFiles || record.type == requestUnpinFiles) {
-                LogNotice("Handle request (type=%s files=%s) OK ", RequestTypeToString(record.type),
-                          record.data);
-            } else {
-                LogNotice("Handle request (type=%s) OK ", RequestTypeToString(record.type));
-            }
-            // Also what makes a held-back request run: the end of a pending state signals nothing.
-            sleep(1);
         }
         LogError("Get request error");
     }

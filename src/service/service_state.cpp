@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+ServiceLockName serviceLock;
+
 namespace {
 
 using PendingSpaces = std::vector<std::string>;
@@ -17,7 +19,7 @@ using PendingSpaces = std::vector<std::string>;
 struct ServiceState {
     pthread_mutex_t lock = PTHREAD_MUTEX_INITIALIZER;
     pthread_cond_t requestArrived = PTHREAD_COND_INITIALIZER; // waited for with `lock`
-    int state = 0;                                            // guarded by `lock`
+    int state GUARDED_BY_LOCK(serviceLock) = 0;
     // The list is replaced as a whole, under `lock`; readers take the pointer atomically and keep
     // the snapshot they got.
     std::shared_ptr<const PendingSpaces> pending = std::make_shared<PendingSpaces>();
@@ -29,8 +31,7 @@ ServiceState &State() {
     return *state;
 }
 
-// The lock is held.
-void PublishPending(PendingSpaces spaces) {
+void PublishPending(PendingSpaces spaces) NEEDS_LOCK(serviceLock) {
     const bool any = !spaces.empty();
     std::atomic_store(&State().pending, std::shared_ptr<const PendingSpaces>(
                                             std::make_shared<PendingSpaces>(std::move(spaces))));
@@ -43,7 +44,8 @@ PendingSpaces CopyPending() {
 
 } // namespace
 
-int ServiceStateInitialize() {
+// There is one thread only.
+int ServiceStateInitialize() NOT_ANALYSED {
     State().state = 2;
     const int result = pthread_mutex_init(&State().lock, nullptr);
     if (result != 0) {
@@ -54,11 +56,12 @@ int ServiceStateInitialize() {
     return 0;
 }
 
-void ServiceLock() {
+// The lock behind the name cannot be seen by the analysis.
+void ServiceLock() NOT_ANALYSED {
     pthread_mutex_lock(&State().lock);
 }
 
-void ServiceUnlock() {
+void ServiceUnlock() NOT_ANALYSED {
     pthread_mutex_unlock(&State().lock);
 }
 
@@ -91,7 +94,8 @@ bool ServiceIsPendingSpace(const char *mountPath) {
     return std::find(spaces->begin(), spaces->end(), mountPath) != spaces->end();
 }
 
-int ServiceAddPendingSpaceAtomic(char *mountPath) {
+// Not analysed for the failure that keeps the lock.
+int ServiceAddPendingSpaceAtomic(char *mountPath) NOT_ANALYSED {
     ServiceLock();
     if (ServiceIsPendingSpace(mountPath)) {
         // The lock is kept: whoever gets here has raced with another addition, and the list must
@@ -99,10 +103,12 @@ int ServiceAddPendingSpaceAtomic(char *mountPath) {
         LogError("Space (%s) is already pending", mountPath);
         return -1;
     }
-    PendingSpaces spaces = CopyPending();
-    spaces.emplace_back(mountPath);
-    PublishPending(std::move(spaces));
-    ServiceUnlock();
+    {
+        const ServiceLockGuard lock(ServiceLockGuard::adopt);
+        PendingSpaces spaces = CopyPending();
+        spaces.emplace_back(mountPath);
+        PublishPending(std::move(spaces));
+    }
     LogVerbose("Add pending space = %s", mountPath);
     return 0;
 }
@@ -119,9 +125,11 @@ int ServiceRemovePendingSpaceLocked(const char *mountPath) {
 }
 
 int ServiceRemovePendingSpaceAtomic(char *mountPath) {
-    ServiceLock();
-    const int result = ServiceRemovePendingSpaceLocked(mountPath);
-    ServiceUnlock();
+    int result = 0;
+    {
+        const ServiceLockGuard lock;
+        result = ServiceRemovePendingSpaceLocked(mountPath);
+    }
     if (result < 0) {
         LogError("Space (%s) is not pending", mountPath);
         return -1;

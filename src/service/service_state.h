@@ -12,23 +12,29 @@
 #ifndef SERVICE_SERVICE_STATE_H
 #define SERVICE_SERVICE_STATE_H
 
+#include "service/thread_annotations.h"
+
+// The service lock's name for the annotations below; the lock itself is nobody else's business.
+struct LOCK_KIND("service lock") ServiceLockName {};
+extern ServiceLockName serviceLock;
+
 // Sets the state word to 2, makes the lock and the condition, empties the list. To be called before
 // any thread is started. 0, or what pthread_mutex_init returned; nothing else may be used then.
 int ServiceStateInitialize();
 
-void ServiceLock();
-void ServiceUnlock();
+void ServiceLock() TAKES_LOCK(serviceLock);
+void ServiceUnlock() GIVES_LOCK_BACK(serviceLock);
 
 // Waits for the request-arrived condition; the caller holds the service lock, which is released
 // while waiting and held again on return. Wake-ups without a request happen.
-void ServiceWaitForRequest();
+void ServiceWaitForRequest() NEEDS_LOCK(serviceLock);
 
 // Wakes a waiting worker; called without the lock.
-void ServiceSignalRequest();
+void ServiceSignalRequest() NEEDS_NO_LOCK(serviceLock);
 
 // The state word, read and written under the lock.
-int ServiceGetState();
-void ServiceSetState(const int *state);
+int ServiceGetState() NEEDS_NO_LOCK(serviceLock);
+void ServiceSetState(const int *state) NEEDS_NO_LOCK(serviceLock);
 
 // Whether the mount path is in the list, compared whole. Callable with or without the lock, from
 // any thread; cheap when nothing is pending.
@@ -36,19 +42,22 @@ bool ServiceIsPendingSpace(const char *mountPath);
 
 // 0 when added; -1 after an error message when it was there already, and then the service lock
 // stays held: callers ask ServiceIsPendingSpace first.
-int ServiceAddPendingSpaceAtomic(char *mountPath);
+int ServiceAddPendingSpaceAtomic(char *mountPath) NEEDS_NO_LOCK(serviceLock);
 
 // 0 when removed; -1 after an error message when it was not there. Takes the lock.
-int ServiceRemovePendingSpaceAtomic(char *mountPath);
+int ServiceRemovePendingSpaceAtomic(char *mountPath) NEEDS_NO_LOCK(serviceLock);
 
 // The same for a caller that holds the lock; logs nothing.
-int ServiceRemovePendingSpaceLocked(const char *mountPath);
+int ServiceRemovePendingSpaceLocked(const char *mountPath) NEEDS_LOCK(serviceLock);
 
 // Holds the service lock for a scope.
-class ServiceLockGuard {
+class LOCK_SCOPE ServiceLockGuard {
 public:
-    ServiceLockGuard() { ServiceLock(); }
-    ~ServiceLockGuard() { ServiceUnlock(); }
+    ServiceLockGuard() TAKES_LOCK(serviceLock) { ServiceLock(); }
+    // For a caller that has taken the lock already.
+    enum Adopt { adopt };
+    explicit ServiceLockGuard(Adopt /*taken*/) NEEDS_LOCK(serviceLock) {}
+    ~ServiceLockGuard() GIVES_LOCK_BACK() { ServiceUnlock(); }
     ServiceLockGuard(const ServiceLockGuard &) = delete;
     ServiceLockGuard &operator=(const ServiceLockGuard &) = delete;
 };

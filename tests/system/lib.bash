@@ -11,6 +11,10 @@
 # shellcheck source=lib/messages.bash
 . "$BATS_TEST_DIRNAME/lib/messages.bash"
 
+# bats traces every command to tell where a test failed, which takes many times longer than most
+# commands. On a slow machine that is too much.
+[ -z "${VESK_NO_TRACE:-}" ] || set +o functrace
+
 CONF=/run/pin/config.json
 # shellcheck disable=SC2034
 KEY_FILE=/var/run/veskcachepinfile-msg-server.key

@@ -63,5 +63,5 @@ needs_32_bit_device() { [ "$DEVICE_BITS" -eq 32 ] || skip "the device reaches ev
 END
     same "" "$(driver_blocks 1)"
     refute tool --unpin-range --mount-path /volume1 --start-sector 128 --num-sectors 384
-    same null "$(state 1 .lastUnpin)"
+    same '[]' "$(state 1 .lastUnpin)"
 }

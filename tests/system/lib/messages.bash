@@ -17,6 +17,7 @@ receive_raw() { "$HELPERS/system_message" receive "$KEY_FILE" "$1"; }
 count_messages() {
     local key id permissions bytes number rest
     WAITING=0
+    # shellcheck disable=SC2034
     while read -r key id permissions bytes number rest; do
         [ "$key" = key ] || WAITING=$((WAITING + number))
     done </proc/sysvipc/msg

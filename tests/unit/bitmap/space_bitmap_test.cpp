@@ -5,15 +5,11 @@
 #include "support/temp_dir.h"
 
 #include <cerrno>
+#include <cstdlib>
+#include <cstring>
 #include <gtest/gtest.h>
 #include <linux/fs.h>
 #include <sys/stat.h>
-
-// The linker puts these in front of the C library's calloc.
-extern "C" {
-void *__real_calloc(size_t count, size_t size);
-void *__wrap_calloc(size_t count, size_t size);
-}
 
 namespace {
 
@@ -66,12 +62,14 @@ protected:
 
 } // namespace
 
-void *__wrap_calloc(size_t count, size_t size) {
+// Takes the place of the C library's.
+extern "C" void *calloc(size_t count, size_t size) noexcept {
     if (callocsLeft == 0) {
         return nullptr;
     }
     --callocsLeft;
-    return __real_calloc(count, size);
+    void *memory = malloc(count * size);
+    return memory == nullptr ? nullptr : memset(memory, 0, count * size);
 }
 
 TEST_F(SpaceBitmapTest, NeededSizeIsTheDevicesDividedBy512KiB) {
@@ -212,6 +210,14 @@ TEST_F(SpaceBitmapTest, NoMemoryForTheBytesIsAnErrorAndLeavesTheRecordToTheCalle
     EXPECT_EQ(Load(-1), Messages{"Can't allocate bitmap memory"});
     ASSERT_NE(bitmap, nullptr);
     EXPECT_EQ(bitmap->data, nullptr);
+}
+
+TEST_F(SpaceBitmapTest, FileThatCannotBeLookedUpIsNotTakenForAMissingOne) {
+    const std::string content(100, '\x5A');
+    WriteWhole(path, content);
+    FakeLibc::Fail("stat", EIO);
+    EXPECT_EQ(Load(0), Messages{});
+    EXPECT_EQ(Content(), content);
 }
 
 TEST_F(SpaceBitmapTest, FileThatVanishesBeforeItIsSizedIsAnError) {

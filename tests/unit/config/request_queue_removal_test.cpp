@@ -63,6 +63,7 @@ TEST_F(RequestRemovalTest, CountingGivesTheDocumentAndTheQueuesLength) {
     Json::Value root;
     int count = -1;
     Store(exampleDocument);
+    const ServiceLockGuard lock;
     EXPECT_EQ(ConfigGetJsonAndNumRequest(path_.c_str(), &root, &count), 0);
     EXPECT_EQ(count, 2);
     EXPECT_EQ(root, ParseDocument(exampleDocument));

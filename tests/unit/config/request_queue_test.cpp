@@ -149,6 +149,13 @@ TEST_F(RequestQueueTest, AnUnreadableFileRefusesTheRequest) {
                               }));
 }
 
+TEST_F(RequestQueueTest, AFileThatCannotBeLookedUpIsNotTakenForAMissingOne) {
+    Store(exampleDocument);
+    FakeLibc::Fail("stat", EIO);
+    EXPECT_EQ(AddReload(), 0);
+    EXPECT_EQ(StoredDocument()["volumes"], ParseDocument(exampleDocument)["volumes"]);
+}
+
 TEST_F(RequestQueueTest, AFileThatCannotBeWrittenRefusesTheRequest) {
     Store(exampleDocument);
     chmod(folder_.Path().c_str(), 0755);

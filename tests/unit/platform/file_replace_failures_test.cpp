@@ -66,7 +66,8 @@ TEST_F(FileReplaceFailureTest, FolderThatCannotBeSyncedIsLeftToItsOwnWays) {
 TEST_F(FileReplaceFailureTest, FailedRenameLeavesTheOldContent) {
     for (const int error : {ENOSPC, EIO, ENOMEM}) {
         FakeLibc::Fail("rename", error);
-        EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::NotWritten);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), fresh),
+                  error == ENOSPC ? FileReplaceResult::NotWritten : FileReplaceResult::CannotOpen);
         ExpectOldWhole();
     }
 }
@@ -123,7 +124,7 @@ TEST_F(FileReplaceFailureTest, NewFileThatCannotBeRenamedIsWrittenInPlaceOrNotAt
 
 TEST_F(FileReplaceFailureTest, GivesUpAfterAHundredTemporaryNamesThatAreTaken) {
     TakeTemporaryNames(200);
-    EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::NotWritten);
+    EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::CannotOpen);
     EXPECT_EQ(ReadWhole(path), old);
     EXPECT_EQ(FileReplaceContent(folder.Path("new").c_str(), fresh), FileReplaceResult::CannotOpen);
     EXPECT_EQ(Names().size(), 201U);

@@ -4,6 +4,7 @@
 #include "support/leak_checked_test.h"
 #include "support/temp_dir.h"
 
+#include <cerrno>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
@@ -155,6 +156,19 @@ TEST_F(PathTest, BlockDeviceCountsAsAFolder) {
     }
     EXPECT_EQ(PathIsFile(path.c_str()), 0);
     EXPECT_EQ(PathIsDir(path.c_str()), 1);
+}
+
+TEST_F(PathTest, OnlyWhatIsNotThereIsMissing) {
+    CapturedLog log(3);
+    EXPECT_EQ(PathIsMissing("/no/such"), 1);
+    EXPECT_EQ(PathIsMissing("/dev/null/below"), 1);
+    EXPECT_EQ(PathIsMissing(("/" + std::string(300, 'x')).c_str()), 1);
+    EXPECT_EQ(PathIsMissing("/"), 0);
+    for (const int error : {EIO, ENOMEM, EACCES}) {
+        FakeLibc::Fail("stat", error);
+        EXPECT_EQ(PathIsMissing("/no/such"), 0);
+    }
+    EXPECT_EQ(log.Messages(), std::vector<std::string>{});
 }
 
 TEST_F(PathTest, NothingIsNeitherAndSaysSo) {

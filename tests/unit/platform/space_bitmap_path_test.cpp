@@ -4,13 +4,9 @@
 #include "support/captured_log.h"
 #include "support/leak_checked_test.h"
 
+#include <cstdlib>
+#include <cstring>
 #include <gtest/gtest.h>
-
-// The linker puts these in front of the C library's strdup.
-extern "C" {
-char *__real_strdup(const char *text);
-char *__wrap_strdup(const char *text);
-}
 
 namespace {
 
@@ -30,12 +26,15 @@ std::string PathBelow(const std::string &referencePath) {
 
 } // namespace
 
-char *__wrap_strdup(const char *text) {
+// Takes the place of the C library's.
+extern "C" char *strdup(const char *text) noexcept {
     if (copiesLeft == 0) {
         return nullptr;
     }
     --copiesLeft;
-    return __real_strdup(text);
+    const size_t size = strlen(text) + 1;
+    auto *copy = static_cast<char *>(malloc(size));
+    return copy == nullptr ? nullptr : static_cast<char *>(memcpy(copy, text, size));
 }
 
 TEST_F(SpaceBitmapPathTest, LiesInTheTopDirectoryOfTheVolume) {

@@ -1,0 +1,123 @@
+#include "faults/child.h"
+
+#include "faults/world.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <dirent.h>
+#include <fcntl.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace {
+
+const char outputPath[] = "/run/faults/output";
+const char reportPath[] = "/run/faults/report";
+const int reportFd = 9;
+const int pollMicroseconds = 2000;
+
+void Redirect(const char *path, int fd) {
+    const int opened = open(path, O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0600);
+    if (opened != fd) {
+        dup2(opened, fd);
+        close(opened);
+    }
+}
+
+[[noreturn]] void Become(const Program &program, const std::vector<std::string> &arguments,
+                         const Fault &fault) {
+    Redirect(outputPath, STDOUT_FILENO);
+    dup2(STDOUT_FILENO, STDERR_FILENO);
+    Redirect(reportPath, reportFd);
+    setenv("LD_PRELOAD", program.preload.c_str(), 1);
+    if (!fault.kind.empty()) {
+        setenv("VESK_FAIL_CALL", fault.kind.c_str(), 1);
+        setenv("VESK_FAIL_NUMBER", std::to_string(fault.number).c_str(), 1);
+        setenv("VESK_FAIL_ERRNO", std::to_string(fault.error).c_str(), 1);
+    }
+    std::vector<char *> words = {const_cast<char *>("veskcachepinfiletool"),
+                                 const_cast<char *>("--stdout")};
+    for (const std::string &argument : arguments) {
+        words.push_back(const_cast<char *>(argument.c_str()));
+    }
+    words.push_back(nullptr);
+    execv(program.tool.c_str(), words.data());
+    _exit(127);
+}
+
+int CountDescriptors(pid_t pid) {
+    int count = 0;
+    if (DIR *folder = opendir(("/proc/" + std::to_string(pid) + "/fd").c_str())) {
+        while (readdir(folder) != nullptr) {
+            ++count;
+        }
+        closedir(folder);
+    }
+    return count;
+}
+
+} // namespace
+
+Child::Child(const Program &program, const std::vector<std::string> &arguments, const Fault &fault)
+    : pid_(fork()) {
+    if (pid_ == 0) {
+        Become(program, arguments, fault);
+    }
+}
+
+Child::~Child() {
+    if (pid_ > 0) {
+        kill(pid_, SIGKILL);
+        waitpid(pid_, nullptr, 0);
+    }
+}
+
+bool Child::HasEnded() const {
+    siginfo_t info = {};
+    return waitid(P_PID, static_cast<id_t>(pid_), &info, WEXITED | WNOHANG | WNOWAIT) != 0 ||
+           info.si_pid == pid_;
+}
+
+void Child::AwaitQuiet(const char *config) const {
+    for (int waited = 0; waited < 300000 && !HasEnded(); waited += pollMicroseconds) {
+        if (WorldIsDone(config)) {
+            return;
+        }
+        usleep(pollMicroseconds);
+    }
+}
+
+int Child::Descriptors() const {
+    int lowest = CountDescriptors(pid_);
+    for (int i = 0; i < 5; ++i) {
+        usleep(pollMicroseconds);
+        lowest = std::min(lowest, CountDescriptors(pid_));
+    }
+    return lowest;
+}
+
+void Child::Signal(int number) const {
+    kill(pid_, number);
+}
+
+int Child::AwaitEnd() {
+    for (int waited = 0; waited < 5000000 && !HasEnded(); waited += pollMicroseconds) {
+        usleep(pollMicroseconds / 4);
+    }
+    if (!HasEnded()) {
+        return -1;
+    }
+    int status = 0;
+    waitpid(pid_, &status, 0);
+    pid_ = -1;
+    return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+}
+
+bool Child::FaultReached() const {
+    return !WorldRead(reportPath).empty();
+}
+
+std::string Child::Output() const {
+    return WorldRead(outputPath);
+}

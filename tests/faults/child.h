@@ -1,0 +1,35 @@
+// The tool as a child process with one call that fails.
+#ifndef TESTS_FAULTS_CHILD_H
+#define TESTS_FAULTS_CHILD_H
+
+#include "faults/scenario.h"
+
+#include <string>
+#include <sys/types.h>
+#include <vector>
+
+class Child {
+public:
+    // Starts it; messages go to its standard output.
+    Child(const Program &program, const std::vector<std::string> &arguments, const Fault &fault);
+    ~Child();
+    Child(const Child &) = delete;
+    Child &operator=(const Child &) = delete;
+
+    // Returns when the service has nothing more to do, has ended or gets nowhere for 300 ms.
+    void AwaitQuiet(const char *config) const;
+    // The lowest number seen in a few looks: requests open and close their own.
+    int Descriptors() const;
+    void Signal(int number) const;
+    // Exit status, 128 + the signal, or -1 when it has not ended within five seconds; it is killed
+    // then.
+    int AwaitEnd();
+    bool FaultReached() const;
+    std::string Output() const;
+
+private:
+    bool HasEnded() const;
+    pid_t pid_ = -1;
+};
+
+#endif

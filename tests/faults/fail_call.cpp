@@ -1,0 +1,199 @@
+// Loaded before the C library: lets the n-th call of one kind that the program makes fail.
+//
+// VESK_FAIL_CALL names the kind, VESK_FAIL_NUMBER the call counted from 1, VESK_FAIL_ERRNO the
+// error; 0 halves the length of a read or write instead. Counting begins when main looks at its
+// options, and covers the program and its libraries, but not what the C library calls inside
+// itself. When the call is reached, a byte goes to descriptor 9. Sleeping takes a thousandth of its
+// time.
+#include <atomic>
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <dlfcn.h>
+#include <fcntl.h>
+#include <getopt.h>
+#include <pthread.h>
+#include <sys/msg.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+// The C library's own names for what is replaced here.
+extern "C" void *__libc_malloc(size_t size);
+extern "C" void *__libc_calloc(size_t number, size_t size);
+extern "C" void *__libc_memalign(size_t alignment, size_t size);
+
+namespace {
+
+const int reportFd = 9;
+
+std::atomic<bool> armed{false};
+std::atomic<long> calls{0};
+char failingKind[32];
+long failingNumber = 0;
+int failingErrno = 0;
+
+void Arm() {
+    const char *kind = getenv("VESK_FAIL_CALL");
+    const char *number = getenv("VESK_FAIL_NUMBER");
+    const char *error = getenv("VESK_FAIL_ERRNO");
+    if (kind == nullptr || number == nullptr || error == nullptr) {
+        return;
+    }
+    strncpy(failingKind, kind, sizeof(failingKind) - 1);
+    failingNumber = strtol(number, nullptr, 10);
+    failingErrno = static_cast<int>(strtol(error, nullptr, 10));
+    armed = true;
+}
+
+// Whether this is the call that must fail; sets errno then.
+bool Fails(const char *kind) {
+    if (!armed || strcmp(kind, failingKind) != 0 || ++calls != failingNumber) {
+        return false;
+    }
+    syscall(SYS_write, reportFd, "x", 1);
+    errno = failingErrno;
+    return true;
+}
+
+template <typename Function> Function Real(const char *name) {
+    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+#define REAL(name) (Real<decltype(&(name))>(#name))
+
+mode_t ModeOf(int flags, va_list arguments) {
+    return (flags & O_CREAT) != 0 ? static_cast<mode_t>(va_arg(arguments, int)) : 0;
+}
+
+// A transfer of half the length, or the failure.
+template <typename Call> ssize_t Transfer(const char *kind, size_t size, Call call) {
+    if (!Fails(kind)) {
+        return call(size);
+    }
+    return failingErrno == 0 ? call(size > 1 ? size / 2 : size) : -1;
+}
+
+} // namespace
+
+extern "C" {
+
+int getopt_long(int argc, char *const *argv, const char *shortOptions, const option *longOptions,
+                int *index) {
+    static const auto real = REAL(getopt_long);
+    if (!armed) {
+        Arm();
+    }
+    return real(argc, argv, shortOptions, longOptions, index);
+}
+
+void *malloc(size_t size) {
+    return Fails("malloc") ? nullptr : __libc_malloc(size);
+}
+void *calloc(size_t number, size_t size) {
+    return Fails("malloc") ? nullptr : __libc_calloc(number, size);
+}
+void *aligned_alloc(size_t alignment, size_t size) {
+    return Fails("malloc") ? nullptr : __libc_memalign(alignment, size);
+}
+
+#define OPEN(name)                                                                                 \
+    int name(const char *path, int flags, ...) {                                                   \
+        static const auto real = REAL(name);                                                       \
+        va_list arguments;                                                                         \
+        va_start(arguments, flags);                                                                \
+        const mode_t mode = ModeOf(flags, arguments);                                              \
+        va_end(arguments);                                                                         \
+        return Fails("open") ? -1 : real(path, flags, mode);                                       \
+    }
+OPEN(open64)
+#define OPEN_AT(name)                                                                              \
+    int name(int folder, const char *path, int flags, ...) {                                       \
+        static const auto real = REAL(name);                                                       \
+        va_list arguments;                                                                         \
+        va_start(arguments, flags);                                                                \
+        const mode_t mode = ModeOf(flags, arguments);                                              \
+        va_end(arguments);                                                                         \
+        return Fails("open") ? -1 : real(folder, path, flags, mode);                               \
+    }
+OPEN_AT(openat64)
+FILE *fopen64(const char *path, const char *mode) {
+    static const auto real = REAL(fopen64);
+    return Fails("open") ? nullptr : real(path, mode);
+}
+ssize_t read(int fd, void *buffer, size_t size) {
+    static const auto real = REAL(read);
+    return Transfer("read", size, [&](size_t part) { return real(fd, buffer, part); });
+}
+ssize_t write(int fd, const void *buffer, size_t size) {
+    static const auto real = REAL(write);
+    return Transfer("write", size, [&](size_t part) { return real(fd, buffer, part); });
+}
+size_t fwrite(const void *buffer, size_t size, size_t number, FILE *stream) {
+    static const auto real = REAL(fwrite);
+    return stream != stdout && Fails("write") ? 0 : real(buffer, size, number, stream);
+}
+int fsync(int fd) {
+    static const auto real = REAL(fsync);
+    return Fails("fsync") ? -1 : real(fd);
+}
+int renameat(int oldFolder, const char *oldName, int newFolder, const char *newName) noexcept {
+    static const auto real = REAL(renameat);
+    return Fails("rename") ? -1 : real(oldFolder, oldName, newFolder, newName);
+}
+int unlink(const char *path) noexcept {
+    static const auto real = REAL(unlink);
+    return Fails("unlink") ? -1 : real(path);
+}
+int stat64(const char *path, struct stat64 *status) noexcept {
+    static const auto real = REAL(stat64);
+    return Fails("stat") ? -1 : real(path, status);
+}
+int fstat64(int fd, struct stat64 *status) noexcept {
+    static const auto real = REAL(fstat64);
+    return Fails("stat") ? -1 : real(fd, status);
+}
+off64_t lseek64(int fd, off64_t offset, int origin) noexcept {
+    static const auto real = REAL(lseek64);
+    return Fails("lseek") ? -1 : real(fd, offset, origin);
+}
+int ioctl(int fd, unsigned long request, ...) noexcept {
+    static const auto real = REAL(ioctl);
+    va_list arguments;
+    va_start(arguments, request);
+    void *argument = va_arg(arguments, void *);
+    va_end(arguments);
+    return Fails("ioctl") ? -1 : real(fd, request, argument);
+}
+key_t ftok(const char *path, int project) noexcept {
+    static const auto real = REAL(ftok);
+    return Fails("ftok") ? -1 : real(path, project);
+}
+int msgget(key_t key, int flags) noexcept {
+    static const auto real = REAL(msgget);
+    return Fails("msgget") ? -1 : real(key, flags);
+}
+int msgctl(int queue, int command, struct msqid_ds *data) noexcept {
+    static const auto real = REAL(msgctl);
+    return Fails("msgctl") ? -1 : real(queue, command, data);
+}
+int msgsnd(int queue, const void *message, size_t size, int flags) {
+    static const auto real = REAL(msgsnd);
+    return Fails("msgsnd") ? -1 : real(queue, message, size, flags);
+}
+ssize_t msgrcv(int queue, void *message, size_t size, long type, int flags) {
+    static const auto real = REAL(msgrcv);
+    return Fails("msgrcv") ? -1 : real(queue, message, size, type, flags);
+}
+int pthread_create(pthread_t *thread, const pthread_attr_t *attributes, void *(*start)(void *),
+                   void *argument) noexcept {
+    static const auto real = REAL(pthread_create);
+    return Fails("thread") ? failingErrno : real(thread, attributes, start, argument);
+}
+unsigned sleep(unsigned seconds) {
+    usleep(seconds * 1000);
+    return 0;
+}
+
+} // extern "C"

@@ -1,0 +1,165 @@
+#include "faults/scenario.h"
+
+#include "faults/child.h"
+#include "faults/world.h"
+
+#include <json/reader.h>
+#include <json/value.h>
+#include <memory>
+#include <signal.h>
+
+namespace {
+
+const char config[] = "/run/faults/config.json";
+
+const Scenario scenarios[] = {
+    {"pin-files", {"--pin-files", "/volume1/a", "--mount-path", "/volume1"}, 0, false, {}},
+    {"reload-blocks", {"--reload-blocks", "--mount-path", "/volume1"}, 0, false, {}},
+    {"add-pending", {"--add-pending", "--mount-path", "/volume1"}, 255, false, {}},
+    {"support-pin", {"--support-pin", "--mount-path", "/volume1"}, 0, false, {}},
+    {"check-bitmap", {"--check-bitmap", "--mount-path", "/volume1"}, 0, false, {}},
+    {"get-uuid", {"--get-uuid", "--mount-path", "/volume1"}, 0, false, {}},
+    {"send-bitmap", {"--send-bitmap", "--mount-path", "/volume1"}, 0, false, {}},
+    {"handle-mount",
+     {"--handle-mount", "--mount-path", "/gone", "--config-path", config},
+     0,
+     false,
+     {}},
+    {"handle-umount", {"--handle-umount", "--mount-path", "/volume1"}, 0, false, {}},
+    {"delete-bitmap", {"--delete-bitmap", "--mount-path", "/volume1"}, 0, false, {}},
+    {"check-pin", {"--check-pin", "/volume1/b", "--config-path", config}, 0, false, {}},
+    {"unpin-all", {"--unpin-all", "--mount-path", "/volume1"}, 0, false, {}},
+    {"is-all-unpin", {"--is-all-unpin", "/run/vesk1/cachedev_1"}, 0, false, {}},
+    {"set-bitmap",
+     {"--set-bitmap", "--mount-path", "/volume1", "--start-sector", "0", "--num-sectors", "128"},
+     0,
+     false,
+     {}},
+    {"unset-bitmap",
+     {"--unset-bitmap", "--mount-path", "/volume1", "--start-sector", "1024", "--num-sectors",
+      "128"},
+     0,
+     false,
+     {}},
+    {"unpin-range",
+     {"--unpin-range", "--mount-path", "/volume1", "--start-sector", "0", "--num-sectors", "128"},
+     0,
+     false,
+     {}},
+    {"get-bitmap-size", {"--get-bitmap-size-byte", "--mount-path", "/volume1"}, 0, false, {}},
+    {"service", {"--start-service", "--config-path", config}, 0, true, {'a', 'u'}},
+};
+
+bool Contains(const std::string &text, const std::string &part) {
+    return text.find(part) != std::string::npos;
+}
+
+// Every queued number has its request and the reverse.
+std::string DocumentComplaint(const std::string &text) {
+    if (text.empty()) {
+        return "";
+    }
+    Json::Value root;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    if (!reader->parse(text.data(), text.data() + text.size(), &root, nullptr)) {
+        return "the configuration file is damaged";
+    }
+    if (root["requestQueue"].size() != root["requests"].size()) {
+        return "queue and requests differ in number";
+    }
+    for (const Json::Value &number : root["requestQueue"]) {
+        if (!root["requests"].isMember(number.asString())) {
+            return "a queued number has no request";
+        }
+    }
+    return "";
+}
+
+// A document that cannot be written stays as it was, which is reported to nobody: what was to be
+// added is not stored.
+bool IsWriteFault(const std::string &kind) {
+    return kind == "write" || kind == "fsync" || kind == "rename";
+}
+
+// Each request of the messages is still on the queue, stored, carried out, or told to be given up;
+// the drop of a volume that cannot be seen to support pinning tells of all its requests at once.
+std::string LossComplaint(const Outcome &outcome) {
+    if (IsWriteFault(outcome.faultKind) || Contains(outcome.log, ": Drop requests finish")) {
+        return "";
+    }
+    const auto given = static_cast<int>(WorldMessages());
+    int accounted = outcome.messagesLeft;
+    for (const char *end : {"drop it.", ") OK ", "Can't add request to config"}) {
+        for (size_t at = outcome.log.find(end); at != std::string::npos;
+             at = outcome.log.find(end, at + 1)) {
+            ++accounted;
+        }
+    }
+    Json::Value root;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    const std::string &text = outcome.document;
+    if (!text.empty()) {
+        reader->parse(text.data(), text.data() + text.size(), &root, nullptr);
+        accounted += static_cast<int>(root["requestQueue"].size());
+    }
+    return accounted < given ? "a request is lost" : "";
+}
+
+} // namespace
+
+const Scenario *ScenarioFind(const std::string &name) {
+    for (const Scenario &scenario : scenarios) {
+        if (name == scenario.name) {
+            return &scenario;
+        }
+    }
+    return nullptr;
+}
+
+Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Fault &fault) {
+    WorldReset(config, scenario.messages);
+    Outcome outcome;
+    outcome.faultKind = fault.kind;
+    Child child(program, scenario.arguments, fault);
+    if (scenario.isService) {
+        child.AwaitQuiet(config);
+        outcome.descriptors = child.Descriptors();
+        child.Signal(SIGTERM);
+    }
+    outcome.status = child.AwaitEnd();
+    outcome.faultReached = child.FaultReached();
+    outcome.log = child.Output();
+    outcome.document = WorldRead(config);
+    outcome.bitmap = WorldRead("/volume1/veskcachepinfile.bitmap");
+    outcome.messagesLeft = WorldMessagesLeft();
+    if (outcome.status != 0 && outcome.status != 255) {
+        outcome.complaint = "it ended with status " + std::to_string(outcome.status);
+    }
+    return outcome;
+}
+
+std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const Outcome &outcome) {
+    if (const std::string complaint = DocumentComplaint(outcome.document); !complaint.empty()) {
+        return complaint;
+    }
+    if (WorldLeftovers(config)) {
+        return "a temporary file is left beside the configuration file";
+    }
+    if (scenario.isService) {
+        if (outcome.descriptors > good.descriptors) {
+            return "the service holds more descriptors than without the fault";
+        }
+        return outcome.status == 255 ? "" : LossComplaint(outcome);
+    }
+    if (outcome.document != good.document && outcome.document != WorldDocument()) {
+        return "the configuration file is neither the old nor the new one";
+    }
+    if (outcome.bitmap != good.bitmap && outcome.bitmap != WorldBitmap()) {
+        return "the bitmap file is neither the old nor the new one";
+    }
+    if (outcome.status == 255 && scenario.goodStatus == 0 &&
+        !Contains(outcome.log, "veskcachepinfiletool: ") && !Contains(outcome.log, "failed")) {
+        return "it failed without a word";
+    }
+    return "";
+}

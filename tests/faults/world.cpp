@@ -1,0 +1,128 @@
+#include "faults/world.h"
+
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <json/value.h>
+#include <sys/ipc.h>
+#include <sys/msg.h>
+#include <sys/stat.h>
+
+namespace {
+
+const char keyFile[] = "/run/veskcachepinfile-msg-server.key";
+const char bitmapFile[] = "/volume1/veskcachepinfile.bitmap";
+const size_t bitmapBytes = 128; // of the 64 MiB volume
+
+size_t messagesSent = 0;
+
+struct Message {
+    long type = 1;
+    struct {
+        int32_t type = 0;
+        char mountPath[512] = {};
+        char data[1024] = {};
+    } record;
+};
+
+std::string Inode(const char *path) {
+    struct stat status = {};
+    stat(path, &status);
+    return std::to_string(status.st_ino);
+}
+
+void Write(const std::string &path, const std::string &content) {
+    std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
+}
+
+int Queue() {
+    const key_t key = ftok(keyFile, 'x');
+    return key == -1 ? -1 : msgget(key, 0);
+}
+
+void RemoveQueue() {
+    const int queue = Queue();
+    if (queue != -1) {
+        msgctl(queue, IPC_RMID, nullptr);
+    }
+    std::filesystem::remove(keyFile);
+}
+
+void Send(const std::vector<char> &messages) {
+    Write(keyFile, "");
+    const key_t key = ftok(keyFile, 'x');
+    const int queue = msgget(key, IPC_CREAT | 0644);
+    Write(keyFile, std::to_string(key));
+    for (const char kind : messages) {
+        Message message;
+        message.record.type = kind == 'a' ? 1 : 2;
+        strcpy(message.record.mountPath, "/volume1");
+        strcpy(message.record.data, kind == 'a' ? "/volume1/a" : "/volume1/b");
+        msgsnd(queue, &message, sizeof(message.record), 0);
+    }
+}
+
+} // namespace
+
+std::string WorldDocument() {
+    Json::Value root;
+    root["nextRequestNum"] = 1;
+    root["volumes"]["/volume1"]["files"][Inode("/volume1/b")] = "b";
+    root["volumes"]["/gone"]["files"]["5"] = "x";
+    return root.toStyledString();
+}
+
+std::string WorldBitmap() {
+    std::string bitmap(bitmapBytes, '\0');
+    bitmap[1] = 1; // sectors 1024 to 1151
+    return bitmap;
+}
+
+void WorldReset(const char *config, const std::vector<char> &messages) {
+    const std::filesystem::path folder = std::filesystem::path(config).parent_path();
+    std::filesystem::remove_all(folder);
+    std::filesystem::create_directories(folder);
+    Write(config, WorldDocument());
+    Write(bitmapFile, WorldBitmap());
+    RemoveQueue();
+    messagesSent = messages.size();
+    if (!messages.empty()) {
+        Send(messages);
+    }
+}
+
+size_t WorldMessages() {
+    return messagesSent;
+}
+
+int WorldMessagesLeft() {
+    msqid_ds state = {};
+    const int queue = Queue();
+    return queue == -1 || msgctl(queue, IPC_STAT, &state) != 0 ? 0
+                                                               : static_cast<int>(state.msg_qnum);
+}
+
+bool WorldIsDone(const char *config) {
+    const std::string text = WorldRead(config);
+    return WorldMessagesLeft() == 0 &&
+           text.find("\"nextRequestNum\" : " + std::to_string(1 + messagesSent)) !=
+               std::string::npos &&
+           text.find("\"requestQueue\" : null") != std::string::npos;
+}
+
+std::string WorldRead(const std::string &path) {
+    std::ifstream file(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+}
+
+bool WorldLeftovers(const std::string &path) {
+    for (const auto &entry :
+         std::filesystem::directory_iterator(std::filesystem::path(path).parent_path())) {
+        const std::string name = entry.path().filename();
+        if (entry.path() != path && name != "output" && name != "report") {
+            return true;
+        }
+    }
+    return false;
+}

@@ -1,0 +1,26 @@
+// What the runs begin with and leave behind: configuration file, bitmap file, message queue.
+#ifndef TESTS_FAULTS_WORLD_H
+#define TESTS_FAULTS_WORLD_H
+
+#include <string>
+#include <vector>
+
+// The known beginning: the document and the bitmap below, no queue; with messages ('a': pin file a,
+// 'u': unpin file b) a queue that holds them.
+void WorldReset(const char *config, const std::vector<char> &messages);
+
+std::string WorldDocument(); // the configuration file that WorldReset writes
+std::string WorldBitmap();   // the bitmap file that it writes
+size_t WorldMessages();      // the messages that it has sent
+int WorldMessagesLeft();     // those that are still on the queue
+
+// All messages were taken and no request is queued any more.
+bool WorldIsDone(const char *config);
+
+// The file's content; empty where there is none.
+std::string WorldRead(const std::string &path);
+
+// Whether anything but the file is in its folder, beside the runs' own output.
+bool WorldLeftovers(const std::string &path);
+
+#endif
