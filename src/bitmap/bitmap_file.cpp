@@ -6,11 +6,21 @@
 
 #include <algorithm>
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 namespace {
 
 const int64_t chunkBytes = 4096;
+
+// The file lies where a volume's users may write. A link planted in its place must not lead to
+// another file, and neither a FIFO nor a device may hold the service up or take its writes.
+const int cautiously = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+
+bool IsSpecial(int fd) {
+    struct stat status {};
+    return fstat(fd, &status) < 0 || !(S_ISREG(status.st_mode) || S_ISDIR(status.st_mode));
+}
 
 } // namespace
 
@@ -24,8 +34,8 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
         LogError("Get the size of file (%s) error", path);
         return -1;
     }
-    const ScopedFd file(open(path, O_RDONLY | O_CLOEXEC));
-    if (!file.IsOpen()) {
+    const ScopedFd file(open(path, O_RDONLY | cautiously));
+    if (!file.IsOpen() || IsSpecial(file.Get())) {
         LogError("Can't open bitmap file (%s)\n", path);
         return -1;
     }
@@ -52,8 +62,8 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
 
 int BitmapWriteToFile(PinBitmap *bitmap, const char *path) {
     LogVerbose("Bytes to write = %d", static_cast<int>(bitmap->size));
-    const ScopedFd file(open(path, O_RDWR | O_CREAT | O_CLOEXEC, 0644));
-    if (!file.IsOpen()) {
+    const ScopedFd file(open(path, O_RDWR | O_CREAT | cautiously, 0644));
+    if (!file.IsOpen() || IsSpecial(file.Get())) {
         LogError("Can't open bitmap file (%s) \n", path);
         return -1;
     }

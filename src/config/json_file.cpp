@@ -5,7 +5,13 @@
 
 #include <exception>
 #include <fstream>
+#include <iterator>
 #include <json/reader.h>
+#include <json/writer.h>
+#include <memory>
+#include <new>
+#include <sstream>
+#include <sys/stat.h>
 
 namespace {
 
@@ -17,18 +23,46 @@ bool ParseStream(std::istream &stream, Json::Value *root) {
     builder["allowTrailingCommas"] = false;
     builder["skipBom"] = false;
     try {
-        std::string errors;
-        return Json::parseFromStream(builder, stream, root, &errors);
+        // Read by the iterator and not by the library, whose stream hides that memory has run out.
+        const std::string text((std::istreambuf_iterator<char>(stream)),
+                               std::istreambuf_iterator<char>());
+        const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+        return reader->parse(text.data(), text.data() + text.size(), root, nullptr);
+    } catch (const std::bad_alloc &) {
+        throw;
     } catch (const std::exception &) {
         return false;
     }
+}
+
+// What toStyledString gives. That one writes to a stream which swallows a lack of memory, and would
+// give a document that is cut.
+std::string StyledText(const Json::Value &root) {
+    std::ostringstream stream;
+    stream.exceptions(std::ios::badbit | std::ios::failbit);
+    if (root.hasComment(Json::commentBefore)) {
+        stream << '\n';
+    }
+    const std::unique_ptr<Json::StreamWriter> writer(Json::StreamWriterBuilder().newStreamWriter());
+    writer->write(root, &stream);
+    stream << '\n';
+    return stream.str();
+}
+
+// Opening a FIFO waits for a writer, and the service lock would be held meanwhile.
+bool IsFifo(const std::string &path) {
+    struct stat status {};
+    return stat(path.c_str(), &status) == 0 && S_ISFIFO(status.st_mode);
 }
 
 } // namespace
 
 int ReadFileToJson(const std::string &path, Json::Value *root) {
     LogTraceScope();
-    std::ifstream stream(path, std::ios::in);
+    std::ifstream stream;
+    if (!IsFifo(path)) {
+        stream.open(path, std::ios::in);
+    }
     if (!stream.is_open()) {
         LogError("Can't open file %s", path.c_str());
         return -1;
@@ -42,7 +76,7 @@ int ReadFileToJson(const std::string &path, Json::Value *root) {
 
 int WriteJsonToFile(const Json::Value &root, const char *path) {
     LogTraceScope();
-    if (FileReplaceContent(path, root.toStyledString()) == FileReplaceResult::CannotOpen) {
+    if (FileReplaceContent(path, StyledText(root)) == FileReplaceResult::CannotOpen) {
         LogError("Can't open config file (%s)", path);
         return -1;
     }

@@ -2,6 +2,7 @@
 
 #include "platform/malloc_text.h"
 #include "platform/scoped_fd.h"
+#include "platform/temporary_name.h"
 
 #include <atomic>
 #include <cerrno>
@@ -49,8 +50,8 @@ int CreateTemporary(int folder, mode_t mode, std::string *name) {
     static std::atomic<unsigned> counter{0};
     const int tries = 100;
     for (int i = 0; i < tries; ++i) {
-        *name = ".veskcachepinfile." + std::to_string(getpid()) + "." +
-                std::to_string(counter.fetch_add(1)) + ".tmp";
+        *name = temporaryPrefix + std::to_string(getpid()) + "." +
+                std::to_string(counter.fetch_add(1)) + temporarySuffix;
         const int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
         const int fd = openat(folder, name->c_str(), flags, mode);
         if (fd >= 0 || errno != EEXIST) {

@@ -2,6 +2,7 @@
 
 #include "cli/log.h"
 #include "cli/tool_parameters.h"
+#include "platform/file_leftovers.h"
 #include "service/receiver.h"
 #include "service/request_worker.h"
 #include "service/service_state.h"
@@ -22,6 +23,7 @@ int StartService(const ToolParameters *parameters) {
         LogError("Initialize mutex failed");
         return -1;
     }
+    FileRemoveLeftovers(parameters->configPath);
     SetServiceThreads(2);
     pthread_t worker{};
     if (pthread_create(&worker, nullptr, DoRequests, const_cast<ToolParameters *>(parameters)) !=

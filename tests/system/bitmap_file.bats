@@ -119,6 +119,40 @@ END
     same false "$(state 1 .bitmapSet)"
 }
 
+@test "a link planted in the bitmap file's place is not followed" {
+    local target
+    for target in /volume1/target /dev/zero; do
+        : >/volume1/target
+        ln -s "$target" "$BITMAP"
+        says 255 --set-bitmap --mount-path /volume1 --start-sector 0 --num-sectors 1 <<END
+: Bitmap size changed. Could be due to volume expansion
+: Can't open bitmap file ($BITMAP)
+
+: Read bitmap file to bitmap memory error
+: Allocate bitmap failed
+: Set bitmap failed
+: Set bitmap on volume (/volume1) failed (Start sector = 0 Num of sector = 1)
+END
+        same 0 "$(stat -c %s /volume1/target)"
+        [ -L "$BITMAP" ]
+        rm "$BITMAP"
+    done
+}
+
+@test "a FIFO planted in the bitmap file's place holds nobody up" {
+    mkfifo "$BITMAP"
+    refute timeout 20 "$BIN/veskcachepinfiletool" --stdout --set-bitmap --mount-path /volume1 \
+        --start-sector 0 --num-sectors 1
+    # Neither with somebody at its other end.
+    exec {OTHER_END}<>"$BITMAP"
+    refute timeout 20 "$BIN/veskcachepinfiletool" --stdout --set-bitmap --mount-path /volume1 \
+        --start-sector 0 --num-sectors 1
+    refute read -rt 0.1 -u "$OTHER_END"
+    exec {OTHER_END}>&-
+    [ -p "$BITMAP" ]
+    rm "$BITMAP"
+}
+
 @test "a new bitmap file has mode 0644 under the umask" {
     (umask 027 && tool --set-bitmap --mount-path /volume1 --start-sector 0 --num-sectors 1)
     same 640 "$(stat -c %a "$BITMAP")"

@@ -117,10 +117,19 @@ END
 END
 }
 
-@test "a FIFO in its place blocks nobody's end" {
+@test "a FIFO in its place is refused and holds nobody up" {
     mkfifo "$CONF"
-    start_service
-    stop_service
+    says 0 --check-pin /volume1/a --config-path "$CONF" <<END
+: Can't open file $CONF
+: Can't read data from config file ($CONF)
+Error
+END
+    tool --reload-blocks --mount-path /volume1
+    # Both threads end, and with them the process.
+    tool --stdout --start-service --config-path "$CONF" >/run/log
+    grep -q ": Can't add request to config ($CONF)" /run/log
+    grep -q ": Get request error" /run/log
+    [ -p "$CONF" ]
 }
 
 @test "a file removed while the service runs is made anew by the next request" {

@@ -229,12 +229,22 @@ TEST_F(BitmapWriteToFileTest, FailedWriteIsAnErrorAndLeavesWhatWasWritten) {
     EXPECT_TRUE(ReadWhole(path) == Pattern(4096) + std::string(1904, '#'));
 }
 
-TEST_F(BitmapWriteToFileTest, FullDiskIsAnError) {
+TEST_F(BitmapWriteToFileTest, DevicesAreRefused) {
     SKIP_WITHOUT_PRIVATE_MOUNTS();
     ASSERT_TRUE(MakeCharacterDevice(path, 1, 7));
     CapturedLog log;
     EXPECT_EQ(Write("a"), -1);
-    EXPECT_EQ(log.Text(), "tool: Write bitmap file (" + path + ") error\n\n");
+    EXPECT_EQ(log.Text(), "tool: Can't open bitmap file (" + path + ") \n\n");
+}
+
+TEST_F(BitmapWriteToFileTest, LinksAreNotFollowed) {
+    const std::string target = folder.Path("target");
+    WriteWhole(target, "old");
+    ASSERT_EQ(symlink(target.c_str(), path.c_str()), 0);
+    CapturedLog log;
+    EXPECT_EQ(Write("a"), -1);
+    EXPECT_EQ(log.Text(), "tool: Can't open bitmap file (" + path + ") \n\n");
+    EXPECT_EQ(ReadWhole(target), "old");
 }
 
 TEST_F(BitmapWriteToFileTest, FileThatCannotBeOpenedIsAnError) {

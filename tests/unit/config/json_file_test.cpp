@@ -118,6 +118,17 @@ TEST_F(JsonFileTest, WritingCreatesAMissingFile) {
     EXPECT_EQ(StoredDocument(), ParseDocument("{\"a\" : 1}"));
 }
 
+TEST_F(JsonFileTest, TheTextIsTheLibrarysStyledOne) {
+    for (const char *text : {"{}", "null", "[]", "{\"a\":[1,2,[3,{\"b\":\"\\u00e9\"}]],\"c\":1.5}",
+                             "// before\n{\"a\":1 // behind\n}\n", exampleDocument}) {
+        WriteWhole(path_, text);
+        Json::Value root;
+        ASSERT_EQ(ReadFileToJson(path_, &root), 0) << text;
+        ASSERT_EQ(WriteJsonToFile(root, path_.c_str()), 0);
+        EXPECT_EQ(ReadWhole(path_), root.toStyledString());
+    }
+}
+
 TEST_F(JsonFileTest, EmptyVolumesStayInTheFile) {
     ASSERT_EQ(WriteJsonToFile(ParseDocument("{\"volumes\" : {}}"), path_.c_str()), 0);
     EXPECT_EQ(StoredDocument(), ParseDocument("{\"volumes\" : {}}"));
