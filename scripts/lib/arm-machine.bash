@@ -69,11 +69,12 @@ arm_make_machine() {
     arm_make_kernel
 }
 
+# The tree's place is part of what the machine starts with.
 arm_make_machine_if_needed() {
-    local made_of=$ARM_MACHINE/.packages
-    [ "$(cat "$made_of" 2>/dev/null)" != "$ARM_MACHINE_PACKAGES" ] || return 0
+    local made_of=$ARM_MACHINE/.made-of wanted="$TREE $ARM_MACHINE_PACKAGES"
+    [ "$(cat "$made_of" 2>/dev/null)" != "$wanted" ] || return 0
     with_build_folder armhf-machine arm_make_machine
-    echo "$ARM_MACHINE_PACKAGES" >"$made_of"
+    echo "$wanted" >"$made_of"
 }
 
 # The root disk: the machine's programs, and this tree without what only building needs.

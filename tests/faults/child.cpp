@@ -79,6 +79,20 @@ bool Child::HasEnded() const {
            info.si_pid == pid_;
 }
 
+bool Child::AwaitHandler() const {
+    const std::string path = "/proc/" + std::to_string(pid_) + "/status";
+    while (!HasEnded()) {
+        const std::string status = WorldRead(path);
+        const size_t at = status.find("SigCgt:\t");
+        if (at != std::string::npos &&
+            (strtoull(status.c_str() + at + 8, nullptr, 16) & 1ULL << (SIGTERM - 1)) != 0) {
+            return true;
+        }
+        usleep(pollMicroseconds);
+    }
+    return false;
+}
+
 void Child::AwaitQuiet(const char *config) const {
     for (int waited = 0; waited < 300000 && !HasEnded(); waited += pollMicroseconds) {
         if (WorldIsDone(config)) {

@@ -16,6 +16,8 @@ public:
     Child(const Child &) = delete;
     Child &operator=(const Child &) = delete;
 
+    // True once it catches SIGTERM; false when it has ended before.
+    bool AwaitHandler() const;
     // Returns when the service has nothing more to do, has ended or gets nowhere for 300 ms.
     void AwaitQuiet(const char *config) const;
     // The lowest number seen in a few looks: requests open and close their own.

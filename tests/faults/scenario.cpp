@@ -54,27 +54,6 @@ bool Contains(const std::string &text, const std::string &part) {
     return text.find(part) != std::string::npos;
 }
 
-// Every queued number has its request and the reverse.
-std::string DocumentComplaint(const std::string &text) {
-    if (text.empty()) {
-        return "";
-    }
-    Json::Value root;
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    if (!reader->parse(text.data(), text.data() + text.size(), &root, nullptr)) {
-        return "the configuration file is damaged";
-    }
-    if (root["requestQueue"].size() != root["requests"].size()) {
-        return "queue and requests differ in number";
-    }
-    for (const Json::Value &number : root["requestQueue"]) {
-        if (!root["requests"].isMember(number.asString())) {
-            return "a queued number has no request";
-        }
-    }
-    return "";
-}
-
 // A document that cannot be written stays as it was, which is reported to nobody: what was to be
 // added is not stored.
 bool IsWriteFault(const std::string &kind) {
@@ -139,7 +118,7 @@ Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Faul
 }
 
 std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const Outcome &outcome) {
-    if (const std::string complaint = DocumentComplaint(outcome.document); !complaint.empty()) {
+    if (const std::string complaint = WorldComplaint(outcome.document); !complaint.empty()) {
         return complaint;
     }
     if (WorldLeftovers(config)) {

@@ -1,10 +1,13 @@
 #include "faults/world.h"
 
+#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <json/reader.h>
 #include <json/value.h>
+#include <memory>
 #include <sys/ipc.h>
 #include <sys/msg.h>
 #include <sys/stat.h>
@@ -104,11 +107,40 @@ int WorldMessagesLeft() {
 }
 
 bool WorldIsDone(const char *config) {
+    return WorldIsIdle(config) && WorldNextNumber(config) == 1 + static_cast<long>(messagesSent);
+}
+
+std::string WorldComplaint(const std::string &text) {
+    if (text.empty()) {
+        return "";
+    }
+    Json::Value root;
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    if (!reader->parse(text.data(), text.data() + text.size(), &root, nullptr)) {
+        return "the configuration file is damaged";
+    }
+    if (root["requestQueue"].size() != root["requests"].size()) {
+        return "queue and requests differ in number";
+    }
+    for (const Json::Value &number : root["requestQueue"]) {
+        if (!root["requests"].isMember(number.asString())) {
+            return "a queued number has no request";
+        }
+    }
+    return "";
+}
+
+long WorldNextNumber(const char *config) {
+    const std::string key = "\"nextRequestNum\" : ";
     const std::string text = WorldRead(config);
-    return WorldMessagesLeft() == 0 &&
-           text.find("\"nextRequestNum\" : " + std::to_string(1 + messagesSent)) !=
-               std::string::npos &&
-           text.find("\"requestQueue\" : null") != std::string::npos;
+    const size_t at = text.find(key);
+    return at == std::string::npos ? 0 : strtol(text.c_str() + at + key.size(), nullptr, 10);
+}
+
+bool WorldIsIdle(const char *config) {
+    const std::string text = WorldRead(config);
+    return WorldMessagesLeft() == 0 && (text.find("\"requestQueue\" : null") != std::string::npos ||
+                                        text.find("\"requestQueue\"") == std::string::npos);
 }
 
 std::string WorldRead(const std::string &path) {

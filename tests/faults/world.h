@@ -17,6 +17,14 @@ int WorldMessagesLeft();     // those that are still on the queue
 // All messages were taken and no request is queued any more.
 bool WorldIsDone(const char *config);
 
+// Nothing is queued, neither as a message nor in the document.
+bool WorldIsIdle(const char *config);
+long WorldNextNumber(const char *config); // the number that the next request will get
+
+// What is wrong with a document: it must be one, and every queued number must have its request and
+// the reverse. Empty: nothing, also where there is no document.
+std::string WorldComplaint(const std::string &document);
+
 // The file's content; empty where there is none.
 std::string WorldRead(const std::string &path);
 

@@ -1,0 +1,93 @@
+// kill_runner TOOL PRELOAD KILLS SEED
+//
+// Ends a busy service KILLS times at random moments, by SIGKILL and SIGTERM in turn, while three
+// clients send it requests; the next service goes on with what is left. Runs in the same world as
+// fault_runner. SIGTERM must end it with status 0 within a second, the document must be whole after
+// every end, and in the end every stored request must have been carried out. Ends with 1 where that
+// does not hold.
+#include "faults/child.h"
+#include "faults/world.h"
+
+#include <algorithm>
+#include <chrono>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+#include <random>
+#include <unistd.h>
+#include <vector>
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+const char config[] = "/run/faults/config.json";
+const std::vector<std::string> serve = {"--start-service", "--config-path", config};
+const std::vector<std::string> requests[] = {
+    {"--pin-files", "/volume1/a", "--mount-path", "/volume1"},
+    {"--unpin-files", "/volume1/a;/volume1/b", "--mount-path", "/volume1"},
+    {"--reload-blocks", "--mount-path", "/volume1"},
+};
+
+int Fail(int kills, const char *what, const std::string &detail) {
+    printf("after %d kills: %s %s\n", kills, what, detail.c_str());
+    return 1;
+}
+
+} // namespace
+
+int main(int argc, char *argv[]) {
+    if (argc != 5) {
+        fprintf(stderr, "usage: kill_runner TOOL PRELOAD KILLS SEED\n");
+        return 2;
+    }
+    const Program program{argv[1], argv[2]};
+    const int kills = static_cast<int>(strtol(argv[3], nullptr, 10));
+    std::mt19937 random(static_cast<unsigned>(strtoul(argv[4], nullptr, 10)));
+    WorldReset(config, {});
+    long sent = 0;
+    Clock::duration slowest{};
+    for (int i = 1; i <= kills; ++i) {
+        Child service(program, serve, Fault{});
+        std::vector<std::unique_ptr<Child>> clients;
+        for (const auto &request : requests) {
+            clients.push_back(std::make_unique<Child>(program, request, Fault{}));
+        }
+        usleep(static_cast<useconds_t>(random() % 40000));
+        const bool gently = i % 2 == 0;
+        const Clock::time_point signalled = Clock::now();
+        // The program has its handler only once it has looked at its options.
+        if (gently && !service.AwaitHandler()) {
+            return Fail(i, "the service did not start:", service.Output());
+        }
+        service.Signal(gently ? SIGTERM : SIGKILL);
+        const int status = service.AwaitEnd();
+        slowest = std::max(slowest, Clock::now() - signalled);
+        if (status != (gently ? 0 : 128 + SIGKILL)) {
+            return Fail(i, "wrong status", std::to_string(status));
+        }
+        for (const auto &client : clients) {
+            sent += client->AwaitEnd() == 0 ? 1 : 0;
+        }
+        if (const std::string complaint = WorldComplaint(WorldRead(config)); !complaint.empty()) {
+            return Fail(i, "the document:", complaint);
+        }
+    }
+    Child last(program, serve, Fault{});
+    for (int i = 0; i < 600 && !WorldIsIdle(config); ++i) {
+        usleep(100000);
+    }
+    last.Signal(SIGTERM);
+    if (last.AwaitEnd() != 0 || !WorldIsIdle(config)) {
+        return Fail(kills, "requests are left:", WorldRead(config));
+    }
+    const long stored = WorldNextNumber(config) - 1; // the document began with 1
+    const auto milliseconds =
+        std::chrono::duration_cast<std::chrono::milliseconds>(slowest).count();
+    printf(
+        "seed %s: %d kills, slowest end %lld ms, %ld requests sent, %ld stored and carried out\n",
+        argv[4], kills, static_cast<long long>(milliseconds), sent, stored);
+    // Each end may take the one message with it that was just off the queue.
+    return milliseconds <= 1000 && stored <= sent && stored >= sent - kills ? 0 : 1;
+}
