@@ -75,7 +75,7 @@ int main(int argc, char *argv[]) {
         }
     }
     Child last(program, serve, Fault{});
-    for (int i = 0; i < 600 && !WorldIsIdle(config); ++i) {
+    for (int i = 0; i < 3000 && !WorldIsIdle(config); ++i) { // up to five minutes
         usleep(100000);
     }
     last.Signal(SIGTERM);

@@ -93,6 +93,7 @@ TEST_F(SignalHandlerTest, ASignalIsSilentAtLevel1) {
 
 TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
     SKIP_WHERE_SIGNALS_COME_LATE();
+    SKIP_WHERE_SIGNALS_ARE_EMULATED();
     ChildProcess child({2, true}, [] {
         SetSignalHandler();
         for (;;) {
