@@ -129,7 +129,11 @@ int Child::AwaitEnd() {
 }
 
 bool Child::FaultReached() const {
-    return !WorldRead(reportPath).empty();
+    return !Report().empty();
+}
+
+std::string Child::Report() const {
+    return WorldRead(reportPath);
 }
 
 std::string Child::Output() const {

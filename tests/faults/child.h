@@ -27,6 +27,7 @@ public:
     // then.
     int AwaitEnd();
     bool FaultReached() const;
+    std::string Report() const; // what the preloaded object wrote
     std::string Output() const;
 
 private:

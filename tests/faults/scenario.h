@@ -22,7 +22,7 @@ struct Scenario {
     std::vector<std::string> arguments;
     int goodStatus;             // exit status without a fault
     bool isService;             // ended by SIGTERM when its requests are done
-    std::vector<char> messages; // requests put on the queue: 'a' or 'b' pins that file
+    std::vector<char> messages; // requests put on the queue, as WorldReset has them
 };
 
 struct Outcome {

@@ -59,9 +59,12 @@ void Send(const std::vector<char> &messages) {
     Write(keyFile, std::to_string(key));
     for (const char kind : messages) {
         Message message;
-        message.record.type = kind == 'a' ? 1 : 2;
-        strcpy(message.record.mountPath, "/volume1");
-        strcpy(message.record.data, kind == 'a' ? "/volume1/a" : "/volume1/b");
+        message.record.type = kind == 'u' ? 2 : kind == 'r' || kind == 'g' ? 6 : 1;
+        strcpy(message.record.mountPath, kind == 'g' ? "/gone" : "/volume1");
+        strcpy(message.record.data, kind == 'a'   ? "/volume1/a"
+                                    : kind == 'c' ? "/volume1/c"
+                                    : kind == 'u' ? "/volume1/b"
+                                                  : "");
         msgsnd(queue, &message, sizeof(message.record), 0);
     }
 }

@@ -5,8 +5,9 @@
 #include <string>
 #include <vector>
 
-// The known beginning: the document and the bitmap below, no queue; with messages ('a': pin file a,
-// 'u': unpin file b) a queue that holds them.
+// The known beginning: the document and the bitmap below, no queue; with messages a queue that
+// holds them: 'a' pins file a, 'c' file c, 'u' unpins file b, 'r' reloads, 'g' reloads a volume
+// that is not there.
 void WorldReset(const char *config, const std::vector<char> &messages);
 
 std::string WorldDocument(); // the configuration file that WorldReset writes
