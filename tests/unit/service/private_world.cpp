@@ -32,7 +32,7 @@ bool LargeQueuesAllowed() {
     return msgctl(queueId, IPC_RMID, nullptr) == 0 && allowed;
 }
 
-std::string EnterPrivateWorld() {
+std::string Enter() {
     if (geteuid() != 0) {
         return "private message queues need root";
     }
@@ -53,7 +53,7 @@ std::string EnterPrivateWorld() {
 
 class PrivateWorld : public ::testing::Environment {
 public:
-    void SetUp() override { missing = EnterPrivateWorld(); }
+    void SetUp() override { EnterPrivateWorld(); }
 };
 
 // The identifiers of all queues of this world.
@@ -71,6 +71,10 @@ std::vector<int> QueueIds() {
 }
 
 } // namespace
+
+void EnterPrivateWorld() {
+    missing = Enter();
+}
 
 bool UsePrivateWorld() {
     ::testing::AddGlobalTestEnvironment(new PrivateWorld);

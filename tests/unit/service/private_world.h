@@ -15,6 +15,9 @@
 // Sets it up before the program's first test. Always true.
 bool UsePrivateWorld();
 
+// Sets it up now, for programs that are not run by GoogleTest.
+void EnterPrivateWorld();
+
 // Why the program has none; empty when it has one.
 const std::string &PrivateWorldMissing();
 
