@@ -42,7 +42,9 @@ template <typename Move> int ForEachGroup(const CacheRun &run, const Span &span,
         const uint64_t start = CacheRunBlockStart(run, first);
         Span part = {std::max(span.offset, start),
                      std::min(span.end, CacheRunBlockStart(run, next)), nullptr};
-        part.buffer = span.buffer + (part.offset - span.offset);
+        if (span.buffer != nullptr) {
+            part.buffer = span.buffer + (part.offset - span.offset);
+        }
         const int result = move(part, run.slots[first], static_cast<size_t>(part.offset - start));
         if (result != 0) {
             return result;

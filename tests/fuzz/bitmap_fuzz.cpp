@@ -14,6 +14,8 @@
 
 namespace {
 
+const uint64_t bitmapBytesMax = 9000; // three chunks of a file
+
 struct Range {
     bool set;
     uint64_t start; // sectors
@@ -27,18 +29,18 @@ PinBitmap *NewBitmap(uint32_t bytes) {
     return bitmap;
 }
 
-void ApplyToModel(const Range &range, std::vector<bool> *bits) {
+void ApplyToModel(const Range &range, std::vector<char> *bits) {
     const uint64_t last = (range.start + range.count - 1) >> bitmapSectorShift;
     for (uint64_t bit = range.start >> bitmapSectorShift; bit <= last && bit < bits->size();
          ++bit) {
-        (*bits)[bit] = range.set;
+        (*bits)[bit] = range.set ? 1 : 0;
     }
 }
 
-std::vector<bool> BitsOf(const PinBitmap *bitmap) {
-    std::vector<bool> bits;
+std::vector<char> BitsOf(const PinBitmap *bitmap) {
+    std::vector<char> bits;
     for (size_t i = 0; i < size_t{bitmap->size} * 8; ++i) {
-        bits.push_back((bitmap->data[i / 8] >> (i % 8) & 1) != 0);
+        bits.push_back(static_cast<char>(bitmap->data[i / 8] >> (i % 8) & 1));
     }
     return bits;
 }
@@ -49,7 +51,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     LogToSyslog = 0;
     LogLevel = 0;
     FuzzInput input(data, size);
-    PinBitmap *bitmap = NewBitmap(static_cast<uint32_t>(input.Number(2)));
+    PinBitmap *bitmap = NewBitmap(static_cast<uint32_t>(input.Number(2) % bitmapBytesMax));
     std::vector<Range> ranges(input.Byte() % 16);
     for (Range &range : ranges) {
         range.set = (input.Byte() & 1) != 0;
@@ -65,7 +67,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
         std::equal(content.begin(), content.begin() + static_cast<long>(loaded), bitmap->data,
                    [](char a, unsigned char b) { return static_cast<unsigned char>(a) == b; }),
         "the bitmap has the file's bytes");
-    std::vector<bool> model = BitsOf(bitmap);
+    std::vector<char> model = BitsOf(bitmap);
     for (const Range &range : ranges) {
         ApplyToModel(range, &model);
         if (range.set) {
