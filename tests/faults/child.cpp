@@ -111,6 +111,12 @@ int Child::Descriptors() const {
     return lowest;
 }
 
+long Child::MemoryKiB() const {
+    const std::string status = WorldRead("/proc/" + std::to_string(pid_) + "/status");
+    const size_t at = status.find("VmRSS:");
+    return at == std::string::npos ? 0 : strtol(status.c_str() + at + 6, nullptr, 10);
+}
+
 void Child::Signal(int number) const {
     kill(pid_, number);
 }

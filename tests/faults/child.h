@@ -22,6 +22,7 @@ public:
     void AwaitQuiet(const char *config) const;
     // The lowest number seen in a few looks: requests open and close their own.
     int Descriptors() const;
+    long MemoryKiB() const; // resident
     void Signal(int number) const;
     // Exit status, 128 + the signal, or -1 when it has not ended within five seconds; it is killed
     // then.

@@ -1,4 +1,4 @@
-// crash_runner TOOL RECORD PRELOAD
+// crash_runner TOOL PRELOAD RECORD
 //
 // Records what a service does to its files while it adds, carries out, finishes and drops requests,
 // and then starts one on everything that a crash can leave behind, after each of the operations:
@@ -185,7 +185,7 @@ void RunBeginning(const Program &recorded, const Program &program, bool withDocu
 
 int main(int argc, char *argv[]) {
     if (argc != 4) {
-        fprintf(stderr, "usage: crash_runner TOOL RECORD PRELOAD\n");
+        fprintf(stderr, "usage: crash_runner TOOL PRELOAD RECORD\n");
         return 2;
     }
     Write("/volume1/c", std::string(200000, 'c'));
@@ -194,7 +194,7 @@ int main(int argc, char *argv[]) {
     size_t points = 0;
     size_t broken = 0;
     for (const bool withDocument : {true, false}) {
-        RunBeginning({argv[1], argv[2]}, {argv[1], argv[3]}, withDocument, &points, &broken);
+        RunBeginning({argv[1], argv[3]}, {argv[1], argv[2]}, withDocument, &points, &broken);
     }
     printf("%zu crash points replayed, %zu promises broken\n", points, broken);
     return broken == 0 && points > 100 ? 0 : 1;

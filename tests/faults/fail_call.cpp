@@ -3,8 +3,7 @@
 // VESK_FAIL_CALL names the kind, VESK_FAIL_NUMBER the call counted from 1, VESK_FAIL_ERRNO the
 // error; 0 halves the length of a read or write instead. Counting begins when main looks at its
 // options, and covers the program and its libraries, but not what the C library calls inside
-// itself. When the call is reached, a byte goes to descriptor 9. Sleeping takes a thousandth of its
-// time.
+// itself. When the call is reached, a byte goes to descriptor 9.
 #include <atomic>
 #include <cerrno>
 #include <cstdarg>
@@ -190,10 +189,6 @@ int pthread_create(pthread_t *thread, const pthread_attr_t *attributes, void *(*
                    void *argument) noexcept {
     static const auto real = REAL(pthread_create);
     return Fails("thread") ? failingErrno : real(thread, attributes, start, argument);
-}
-unsigned sleep(unsigned seconds) {
-    usleep(seconds * 1000);
-    return 0;
 }
 
 } // extern "C"

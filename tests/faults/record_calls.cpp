@@ -7,7 +7,7 @@
 //
 // "sync" of a folder makes its names durable. Two more lines tell what others know: "driver" when a
 // bitmap was handed over, "receive" when the service asks for its next message. Operations are
-// written down in the order in which they were done. Sleeping takes a thousandth of its time.
+// written down in the order in which they were done.
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
@@ -158,10 +158,6 @@ ssize_t msgrcv(int queue, void *message, size_t size, long type, int flags) {
         Report("receive\n");
     }
     return real(queue, message, size, type, flags);
-}
-unsigned sleep(unsigned seconds) {
-    usleep(seconds * 1000);
-    return 0;
 }
 
 } // extern "C"

@@ -11,6 +11,7 @@
 #include <sys/ipc.h>
 #include <sys/msg.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 namespace {
 
@@ -107,6 +108,27 @@ int WorldMessagesLeft() {
     const int queue = Queue();
     return queue == -1 || msgctl(queue, IPC_STAT, &state) != 0 ? 0
                                                                : static_cast<int>(state.msg_qnum);
+}
+
+bool WorldSendPin(const std::string &paths, bool waiting) {
+    Message message;
+    message.record.type = 1;
+    strcpy(message.record.mountPath, "/volume1");
+    strncpy(message.record.data, paths.c_str(), sizeof(message.record.data) - 1);
+    return msgsnd(Queue(), &message, sizeof(message.record), waiting ? 0 : IPC_NOWAIT) == 0;
+}
+
+void WorldAwaitQueue() {
+    while (Queue() == -1) {
+        usleep(1000);
+    }
+}
+
+long WorldRecords(const char *config) {
+    Json::Value root;
+    std::ifstream file(config);
+    Json::parseFromStream(Json::CharReaderBuilder(), file, &root, nullptr);
+    return static_cast<long>(root["volumes"]["/volume1"]["files"].size());
 }
 
 bool WorldIsDone(const char *config) {

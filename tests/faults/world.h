@@ -15,6 +15,13 @@ std::string WorldBitmap();   // the bitmap file that it writes
 size_t WorldMessages();      // the messages that it has sent
 int WorldMessagesLeft();     // those that are still on the queue
 
+// Sends a request to pin files, paths joined by ";": true, or false when the queue is full and
+// it must not wait. Needs a queue, which WorldAwaitQueue waits for.
+bool WorldSendPin(const std::string &paths, bool waiting);
+void WorldAwaitQueue();
+
+long WorldRecords(const char *config); // pinned files of /volume1 in the document
+
 // All messages were taken and no request is queued any more.
 bool WorldIsDone(const char *config);
 
