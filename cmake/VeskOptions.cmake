@@ -4,6 +4,7 @@ set(VESK_APPLIANCE_PREFIX "" CACHE PATH
     "Folder whose lib/ holds the appliance's own libraries; empty: build the stand-ins")
 option(VESK_WERROR "Treat warnings as errors" OFF)
 set(VESK_SANITIZE "" CACHE STRING "Sanitizers to compile with, for instance address,undefined or thread")
+option(VESK_BENCH "Build the measurements of bench/" OFF)
 option(VESK_COVERAGE "Instrument for gcov" OFF)
 
 if(NOT CMAKE_BUILD_TYPE AND NOT CMAKE_CONFIGURATION_TYPES)

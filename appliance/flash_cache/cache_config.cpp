@@ -10,21 +10,24 @@
 namespace {
 
 constexpr char kDefaultPath[] = "/etc/veskflashcache.json";
-constexpr std::streamsize kMaxBytes = std::streamsize{1024} * 1024;
+constexpr size_t kMaxBytes = size_t{1024} * 1024;
 constexpr int kMaxDepth =
     16; // of nested values: the form needs three, the rest may be ignored members
 
-// The whole text of a file of a configuration's size. False: unreadable or larger.
+// The whole text of a file of a configuration's size, which is commonly a few hundred bytes. False:
+// unreadable or larger.
 bool TextRead(const std::string &path, std::string &text) {
     std::ifstream file(path, std::ios::binary);
-    text.resize(static_cast<size_t>(kMaxBytes) + 1);
-    file.read(text.data(), kMaxBytes + 1);
-    // The end of the file must come first, or the text is too long; a read error sets badbit.
-    if (!file.eof() || file.bad()) {
-        return false;
-    }
-    text.resize(static_cast<size_t>(file.gcount()));
-    return true;
+    char chunk[4096];
+    do {
+        file.read(chunk, sizeof chunk);
+        text.append(chunk, static_cast<size_t>(file.gcount()));
+        if (text.size() > kMaxBytes) {
+            return false;
+        }
+    } while (file);
+    // The end of the file is what must have ended it; a read error sets badbit.
+    return file.eof() && !file.bad();
 }
 
 bool JsonParse(const std::string &text, Json::Value &document) {

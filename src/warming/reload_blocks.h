@@ -2,7 +2,8 @@
 // the cache device; neighbouring blocks in one go.
 //
 // Thread rule: called on the worker's thread, without the service lock. Gives way after each bit
-// when the volume is pending (a stretch of clear bytes counts as one).
+// when the volume is pending (a stretch of clear bytes, or of set ones, of up to 4 KiB counts as
+// one).
 #ifndef WARMING_RELOAD_BLOCKS_H
 #define WARMING_RELOAD_BLOCKS_H
 

@@ -1,0 +1,69 @@
+// Loading and saving a bitmap file, against a plain loop over the same chunks.
+#include "bench_names.h"
+
+#include "bitmap/bitmap_file.h"
+#include "cli/log.h"
+
+#include <cstdio>
+#include <fcntl.h>
+#include <unistd.h>
+#include <vector>
+
+namespace {
+
+const char path[] = "/dev/shm/bitmap";
+const int64_t fullBytes = 32 << 20;
+const size_t chunk = 4096;
+
+void MakeFile(const std::vector<unsigned char> &bytes) {
+    FILE *file = fopen(path, "w");
+    fwrite(bytes.data(), 1, bytes.size(), file);
+    fclose(file);
+}
+
+template <typename Operation> void WithFile(benchmark::State &state, Operation operation) {
+    LogToSyslog = 0;
+    std::vector<unsigned char> bytes(static_cast<size_t>(state.range(0)));
+    MakeFile(bytes);
+    PinBitmap bitmap{bytes.data(), static_cast<uint32_t>(bytes.size())};
+    for (auto _ : state) {
+        operation(&bitmap);
+    }
+    unlink(path);
+}
+
+void Load(benchmark::State &state) {
+    WithFile(state, [](PinBitmap *bitmap) { BitmapInitByFile(path, bitmap); });
+}
+
+void LoadPlainly(benchmark::State &state) {
+    WithFile(state, [](PinBitmap *bitmap) {
+        const int fd = open(path, O_RDONLY);
+        for (size_t at = 0; at < bitmap->size; at += chunk) {
+            benchmark::DoNotOptimize(read(fd, bitmap->data + at, chunk));
+        }
+        close(fd);
+    });
+}
+
+void Save(benchmark::State &state) {
+    WithFile(state, [](PinBitmap *bitmap) { BitmapWriteToFile(bitmap, path); });
+}
+
+void SavePlainly(benchmark::State &state) {
+    WithFile(state, [](PinBitmap *bitmap) {
+        const int fd = open(path, O_RDWR | O_CREAT, 0644);
+        for (size_t at = 0; at < bitmap->size; at += chunk) {
+            benchmark::DoNotOptimize(write(fd, bitmap->data + at, chunk));
+        }
+        close(fd);
+    });
+}
+
+const bool registered = [] {
+    BenchPair("bitmap_load", {fullBytes / 16, fullBytes / 4, fullBytes}, Load, LoadPlainly);
+    BenchPair("bitmap_save", {fullBytes / 16, fullBytes / 4, fullBytes}, Save, SavePlainly);
+    return true;
+}();
+
+} // namespace
