@@ -1,0 +1,50 @@
+#!/usr/bin/env bats
+# The commands of docs/operations.md, as they stand there, one after the other.
+
+load lib
+
+setup_file() { make_volume 1 64M 16M ext4; }
+
+# Prints the document's blocks that are to be run, each with a heading before and time for the service
+# to finish behind.
+script_of() {
+    awk '
+        /^```sh$/ { inside = 1; print "echo \"== " ++block "\""; next }
+        /^```$/ && inside { inside = 0; print "settle"; next }
+        inside
+    ' "$1" | sed 's#/var/lib/veskcachepinfiletool#/run/operations#'
+}
+
+# The output of a block.
+block() { awk -v wanted="== $1" '/^== / { inside = $0 == wanted; next } inside' /tmp/operations.log; }
+
+@test "every recipe of the operations page does what it says" {
+    local i
+    mkdir -p /volume1/photos
+    for i in $(seq 40); do
+        random "/volume1/photos/$i.raw" 4K
+    done
+    touch "/volume1/photos/not this one"
+    sync
+    {
+        # shellcheck disable=SC2016
+        printf '%s\n' 'set -eu' \
+            'idle() { grep -qs "\"requestQueue\" : null" "$CONFIG"; }' \
+            'settle() { [ -z "${CONFIG:-}" ] || [ ! -e "$CONFIG" ] || until idle; do sleep 0.2; done; }'
+        script_of "$BATS_TEST_DIRNAME/../../docs/operations.md"
+    } >/tmp/operations.sh
+    PATH=$BIN:$PATH timeout 120 bash /tmp/operations.sh >/tmp/operations.log 2>&1 3>&- || {
+        cat /tmp/operations.log
+        return 1
+    }
+    same Yes "$(block 3)"
+    same Yes "$(block 5 | sed -n 1p)"
+    same 40 "$(block 5 | grep -c '^photos/')"
+    same 0 "$(block 5 | grep -c 'not this one')"
+    same "$(volume_state 1 pinnedBlocks)" 0
+    [ "$(block 6)" -ge 1 ]
+    same "$(block 8 | sed -n 1p)" "$(block 8 | sed -n 2p)"
+    same No "$(block 9)"
+    same 3 "$(block 11 | wc -l)"
+    same 0 "$(grep -c '"photos/' /run/operations/pins.json)"
+}
