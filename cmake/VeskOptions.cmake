@@ -19,8 +19,15 @@ set(CMAKE_RUNTIME_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/bin)
 set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
 set(CMAKE_ARCHIVE_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
-# Found from the binary's own place, so that a build tree can be moved.
+# Libraries are found from the binary's own place, so that a build tree or an installed one can be moved.
+# Where installing would rewrite the path, CMake pads the one of the build tree with an empty entry, and
+# that stands for the folder in which the program is started; so both are the same. With the appliance's own
+# libraries the build tree needs their folder, which must not be in what is installed.
 set(CMAKE_BUILD_RPATH_USE_ORIGIN ON)
+if(NOT VESK_APPLIANCE_PREFIX)
+  set(CMAKE_BUILD_WITH_INSTALL_RPATH ON)
+  set(CMAKE_INSTALL_RPATH $ORIGIN/../lib)
+endif()
 
 add_library(vesk_options INTERFACE)
 add_library(vesk::options ALIAS vesk_options)
