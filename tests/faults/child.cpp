@@ -135,7 +135,13 @@ int Child::AwaitEnd() {
 }
 
 bool Child::FaultReached() const {
-    return !Report().empty();
+    return Report().find('x') != std::string::npos;
+}
+
+long Child::LiveAllocations() const {
+    const std::string report = Report();
+    const size_t at = report.find(' ');
+    return at == std::string::npos ? 0 : strtol(report.c_str() + at, nullptr, 10);
 }
 
 std::string Child::Report() const {

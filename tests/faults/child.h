@@ -28,7 +28,8 @@ public:
     // then.
     int AwaitEnd();
     bool FaultReached() const;
-    std::string Report() const; // what the preloaded object wrote
+    long LiveAllocations() const; // at its orderly end; 0 where there was none
+    std::string Report() const;   // what the preloaded object wrote
     std::string Output() const;
 
 private:

@@ -107,6 +107,7 @@ Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Faul
     }
     outcome.status = child.AwaitEnd();
     outcome.faultReached = child.FaultReached();
+    outcome.allocations = child.LiveAllocations();
     outcome.log = child.Output();
     outcome.document = WorldRead(config);
     outcome.bitmap = WorldRead("/volume1/veskcachepinfile.bitmap");
@@ -129,6 +130,9 @@ std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const O
             return "the service holds more descriptors than without the fault";
         }
         return outcome.status == 255 ? "" : LossComplaint(outcome);
+    }
+    if (outcome.allocations > good.allocations) {
+        return std::to_string(outcome.allocations - good.allocations) + " allocations are left";
     }
     if (outcome.document != good.document && outcome.document != WorldDocument()) {
         return "the configuration file is neither the old nor the new one";

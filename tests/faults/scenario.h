@@ -33,6 +33,7 @@ struct Outcome {
     std::string document;  // the configuration file; empty: none
     std::string bitmap;    // the bitmap file; empty: none
     int descriptors = 0;   // of the service, when its requests were done
+    long allocations = 0;  // not freed at the command's end
     int messagesLeft = 0;  // on the queue
     std::string complaint; // what must never happen; empty: nothing of it did
 };
