@@ -102,9 +102,9 @@ void Child::AwaitQuiet(const char *config) const {
     }
 }
 
-int Child::Descriptors() const {
+int Child::Descriptors(int enough) const {
     int lowest = CountDescriptors(pid_);
-    for (int i = 0; i < 5; ++i) {
+    for (int looks = 0; looks < 5 || (looks < 200 && lowest > enough); ++looks) {
         usleep(pollMicroseconds);
         lowest = std::min(lowest, CountDescriptors(pid_));
     }

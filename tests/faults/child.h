@@ -20,8 +20,9 @@ public:
     bool AwaitHandler() const;
     // Returns when the service has nothing more to do, has ended or gets nowhere for 300 ms.
     void AwaitQuiet(const char *config) const;
-    // The lowest number seen in a few looks: requests open and close their own.
-    int Descriptors() const;
+    // The lowest number seen in some looks: requests open and close their own. Looks longer while
+    // there are more than `enough`.
+    int Descriptors(int enough) const;
     long MemoryKiB() const; // resident
     void Signal(int number) const;
     // Exit status, 128 + the signal, or -1 when it has not ended within five seconds; it is killed

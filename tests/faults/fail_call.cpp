@@ -5,13 +5,14 @@
 // options, and covers the program and its libraries, but not what the C library calls inside
 // itself. When the call is reached, a byte goes to descriptor 9. At the program's orderly end the
 // number of allocations that are not freed follows there as " N".
+#include "faults/fail_call.h"
+
 #include <atomic>
 #include <cerrno>
 #include <cstdarg>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <dlfcn.h>
 #include <fcntl.h>
 #include <getopt.h>
 #include <pthread.h>
@@ -54,16 +55,6 @@ void Arm() {
     armed = true;
 }
 
-// Whether this is the call that must fail; sets errno then.
-bool Fails(const char *kind) {
-    if (!armed || strcmp(kind, failingKind) != 0 || ++calls != failingNumber) {
-        return false;
-    }
-    syscall(SYS_write, reportFd, "x", 1);
-    errno = failingErrno;
-    return true;
-}
-
 void *Counted(void *memory) {
     live += memory != nullptr ? 1 : 0;
     return memory;
@@ -75,24 +66,28 @@ __attribute__((destructor)) void ReportLive() {
     syscall(SYS_write, reportFd, text, static_cast<size_t>(length));
 }
 
-template <typename Function> Function Real(const char *name) {
-    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
-}
-#define REAL(name) (Real<decltype(&(name))>(#name))
-
 mode_t ModeOf(int flags, va_list arguments) {
     return (flags & O_CREAT) != 0 ? static_cast<mode_t>(va_arg(arguments, int)) : 0;
 }
 
 // A transfer of half the length, or the failure.
 template <typename Call> ssize_t Transfer(const char *kind, size_t size, Call call) {
-    if (!Fails(kind)) {
+    if (!FailsNow(kind)) {
         return call(size);
     }
     return failingErrno == 0 ? call(size > 1 ? size / 2 : size) : -1;
 }
 
 } // namespace
+
+bool FailsNow(const char *kind) {
+    if (!armed || strcmp(kind, failingKind) != 0 || ++calls != failingNumber) {
+        return false;
+    }
+    syscall(SYS_write, reportFd, "x", 1);
+    errno = failingErrno;
+    return true;
+}
 
 extern "C" {
 
@@ -108,13 +103,13 @@ int getopt_long(int argc, char *const *argv, const char *shortOptions, const opt
 }
 
 void *malloc(size_t size) {
-    return Fails("malloc") ? nullptr : Counted(__libc_malloc(size));
+    return FailsNow("malloc") ? nullptr : Counted(__libc_malloc(size));
 }
 void *calloc(size_t number, size_t size) {
-    return Fails("malloc") ? nullptr : Counted(__libc_calloc(number, size));
+    return FailsNow("malloc") ? nullptr : Counted(__libc_calloc(number, size));
 }
 void *realloc(void *memory, size_t size) {
-    if (Fails("malloc")) {
+    if (FailsNow("malloc")) {
         return nullptr;
     }
     void *moved = __libc_realloc(memory, size);
@@ -122,7 +117,7 @@ void *realloc(void *memory, size_t size) {
     return moved;
 }
 void *aligned_alloc(size_t alignment, size_t size) {
-    return Fails("malloc") ? nullptr : Counted(__libc_memalign(alignment, size));
+    return FailsNow("malloc") ? nullptr : Counted(__libc_memalign(alignment, size));
 }
 void free(void *memory) {
     live -= memory != nullptr ? 1 : 0;
@@ -136,7 +131,7 @@ void free(void *memory) {
         va_start(arguments, flags);                                                                \
         const mode_t mode = ModeOf(flags, arguments);                                              \
         va_end(arguments);                                                                         \
-        return Fails("open") ? -1 : real(path, flags, mode);                                       \
+        return FailsNow("open") ? -1 : real(path, flags, mode);                                    \
     }
 OPEN(open64)
 #define OPEN_AT(name)                                                                              \
@@ -146,12 +141,12 @@ OPEN(open64)
         va_start(arguments, flags);                                                                \
         const mode_t mode = ModeOf(flags, arguments);                                              \
         va_end(arguments);                                                                         \
-        return Fails("open") ? -1 : real(folder, path, flags, mode);                               \
+        return FailsNow("open") ? -1 : real(folder, path, flags, mode);                            \
     }
 OPEN_AT(openat64)
 FILE *fopen64(const char *path, const char *mode) {
     static const auto real = REAL(fopen64);
-    return Fails("open") ? nullptr : real(path, mode);
+    return FailsNow("open") ? nullptr : real(path, mode);
 }
 ssize_t read(int fd, void *buffer, size_t size) {
     static const auto real = REAL(read);
@@ -163,31 +158,31 @@ ssize_t write(int fd, const void *buffer, size_t size) {
 }
 size_t fwrite(const void *buffer, size_t size, size_t number, FILE *stream) {
     static const auto real = REAL(fwrite);
-    return stream != stdout && Fails("write") ? 0 : real(buffer, size, number, stream);
+    return stream != stdout && FailsNow("write") ? 0 : real(buffer, size, number, stream);
 }
 int fsync(int fd) {
     static const auto real = REAL(fsync);
-    return Fails("fsync") ? -1 : real(fd);
+    return FailsNow("fsync") ? -1 : real(fd);
 }
 int renameat(int oldFolder, const char *oldName, int newFolder, const char *newName) noexcept {
     static const auto real = REAL(renameat);
-    return Fails("rename") ? -1 : real(oldFolder, oldName, newFolder, newName);
+    return FailsNow("rename") ? -1 : real(oldFolder, oldName, newFolder, newName);
 }
 int unlink(const char *path) noexcept {
     static const auto real = REAL(unlink);
-    return Fails("unlink") ? -1 : real(path);
+    return FailsNow("unlink") ? -1 : real(path);
 }
 int stat64(const char *path, struct stat64 *status) noexcept {
     static const auto real = REAL(stat64);
-    return Fails("stat") ? -1 : real(path, status);
+    return FailsNow("stat") ? -1 : real(path, status);
 }
 int fstat64(int fd, struct stat64 *status) noexcept {
     static const auto real = REAL(fstat64);
-    return Fails("stat") ? -1 : real(fd, status);
+    return FailsNow("stat") ? -1 : real(fd, status);
 }
 off64_t lseek64(int fd, off64_t offset, int origin) noexcept {
     static const auto real = REAL(lseek64);
-    return Fails("lseek") ? -1 : real(fd, offset, origin);
+    return FailsNow("lseek") ? -1 : real(fd, offset, origin);
 }
 int ioctl(int fd, unsigned long request, ...) noexcept {
     static const auto real = REAL(ioctl);
@@ -195,32 +190,32 @@ int ioctl(int fd, unsigned long request, ...) noexcept {
     va_start(arguments, request);
     void *argument = va_arg(arguments, void *);
     va_end(arguments);
-    return Fails("ioctl") ? -1 : real(fd, request, argument);
+    return FailsNow("ioctl") ? -1 : real(fd, request, argument);
 }
 key_t ftok(const char *path, int project) noexcept {
     static const auto real = REAL(ftok);
-    return Fails("ftok") ? -1 : real(path, project);
+    return FailsNow("ftok") ? -1 : real(path, project);
 }
 int msgget(key_t key, int flags) noexcept {
     static const auto real = REAL(msgget);
-    return Fails("msgget") ? -1 : real(key, flags);
+    return FailsNow("msgget") ? -1 : real(key, flags);
 }
 int msgctl(int queue, int command, struct msqid_ds *data) noexcept {
     static const auto real = REAL(msgctl);
-    return Fails("msgctl") ? -1 : real(queue, command, data);
+    return FailsNow("msgctl") ? -1 : real(queue, command, data);
 }
 int msgsnd(int queue, const void *message, size_t size, int flags) {
     static const auto real = REAL(msgsnd);
-    return Fails("msgsnd") ? -1 : real(queue, message, size, flags);
+    return FailsNow("msgsnd") ? -1 : real(queue, message, size, flags);
 }
 ssize_t msgrcv(int queue, void *message, size_t size, long type, int flags) {
     static const auto real = REAL(msgrcv);
-    return Fails("msgrcv") ? -1 : real(queue, message, size, type, flags);
+    return FailsNow("msgrcv") ? -1 : real(queue, message, size, type, flags);
 }
 int pthread_create(pthread_t *thread, const pthread_attr_t *attributes, void *(*start)(void *),
                    void *argument) noexcept {
     static const auto real = REAL(pthread_create);
-    return Fails("thread") ? failingErrno : real(thread, attributes, start, argument);
+    return FailsNow("thread") ? failingErrno : real(thread, attributes, start, argument);
 }
 
 } // extern "C"

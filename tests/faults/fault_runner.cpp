@@ -7,6 +7,7 @@
 #include "faults/scenario.h"
 
 #include <cerrno>
+#include <climits>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -37,6 +38,7 @@ const Kind kinds[] = {
     {"msgsnd", {EAGAIN, EIDRM}},
     {"msgrcv", {EIDRM, EINTR}},
     {"thread", {EAGAIN}},
+    {"library", {EIO}},
 };
 const long callsMax = 100000; // a run that makes more of one kind does not end
 
@@ -58,7 +60,7 @@ int main(int argc, char *argv[]) {
             fprintf(stderr, "fault_runner: no scenario %s\n", argv[i]);
             return 2;
         }
-        const Outcome good = ScenarioRun(program, *scenario, Fault{});
+        const Outcome good = ScenarioRun(program, *scenario, Fault{}, INT_MAX);
         if (!good.complaint.empty() || good.status != scenario->goodStatus) {
             printf("%s without a fault: status %d, %s\n", argv[i], good.status,
                    good.complaint.c_str());
@@ -68,8 +70,8 @@ int main(int argc, char *argv[]) {
             const long stride = strcmp(kind.name, "malloc") == 0 ? step : 1;
             for (const int error : kind.errors) {
                 for (long n = 1; n < callsMax; n += stride) {
-                    const Outcome outcome =
-                        ScenarioRun(program, *scenario, Fault{kind.name, n, error});
+                    const Outcome outcome = ScenarioRun(
+                        program, *scenario, Fault{kind.name, n, error}, good.descriptors);
                     ++runs;
                     std::string complaint = outcome.complaint;
                     if (complaint.empty()) {

@@ -11,6 +11,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <climits>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -130,7 +131,8 @@ int Fail(const std::string &what) {
 
 void Look(const Child &service, Figures *figures) {
     figures->memoryEnd = service.MemoryKiB();
-    figures->descriptorsEnd = service.Descriptors();
+    figures->descriptorsEnd =
+        service.Descriptors(figures->rounds <= 2 ? INT_MAX : figures->descriptors);
     if (figures->rounds == 2) {
         figures->memory = figures->memoryEnd;
         figures->descriptors = figures->descriptorsEnd;

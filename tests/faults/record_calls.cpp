@@ -8,10 +8,11 @@
 // "sync" of a folder makes its names durable. Two more lines tell what others know: "driver" when a
 // bitmap was handed over, "receive" when the service asks for its next message. Operations are
 // written down in the order in which they were done.
+#include "faults/fail_call.h"
+
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
-#include <dlfcn.h>
 #include <fcntl.h>
 #include <mutex>
 #include <string>
@@ -30,11 +31,6 @@ std::mutex &Order() {
     static std::mutex mutex;
     return mutex;
 }
-
-template <typename Function> Function Real(const char *name) {
-    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
-}
-#define REAL(name) (Real<decltype(&(name))>(#name))
 
 void Report(const std::string &line) {
     syscall(SYS_write, reportFd, line.data(), line.size());

@@ -95,14 +95,15 @@ const Scenario *ScenarioFind(const std::string &name) {
     return nullptr;
 }
 
-Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Fault &fault) {
+Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Fault &fault,
+                    int descriptors) {
     WorldReset(config, scenario.messages);
     Outcome outcome;
     outcome.faultKind = fault.kind;
     Child child(program, scenario.arguments, fault);
     if (scenario.isService) {
         child.AwaitQuiet(config);
-        outcome.descriptors = child.Descriptors();
+        outcome.descriptors = child.Descriptors(descriptors);
         child.Signal(SIGTERM);
     }
     outcome.status = child.AwaitEnd();

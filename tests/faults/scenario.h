@@ -41,7 +41,9 @@ struct Outcome {
 // Null where there is none of that name.
 const Scenario *ScenarioFind(const std::string &name);
 
-Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Fault &fault);
+// `descriptors`: those that a service has at rest; it is given time to come to rest.
+Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Fault &fault,
+                    int descriptors);
 
 // What the outcome has wrong, beside the run without a fault; empty: nothing.
 std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const Outcome &outcome);
