@@ -5,6 +5,7 @@
 #include "config/request_type.h"
 #include "service/message_check.h"
 #include "service/message_queue.h"
+#include "service/receiver_rest.h"
 #include "service/service_state.h"
 #include "service/signal_handler.h"
 
@@ -56,8 +57,12 @@ void GetRequests(const char *configPath) {
             LogVerbose("Get server messsage queue id = %d", ServerMsgQueueId);
         }
         while (receiving) {
+            ReceiverTakesNext();
             const ssize_t received =
                 msgrcv(ServerMsgQueueId, &message, requestMessageBytes, requestMessageType, 0);
+            if (received < 0 && errno == EINTR && ReceiverIsCalledToRest()) {
+                continue;
+            }
             if (received < 0) {
                 LogError("Receive messaged failed: %s", strerror(errno));
                 break;
@@ -100,6 +105,7 @@ void GetRequests(const char *configPath) {
             ServiceSignalRequest();
         }
     }
+    ReceiverHasEnded();
     ServiceThreadEnds();
     pthread_exit(nullptr);
 }

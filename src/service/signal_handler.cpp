@@ -1,6 +1,7 @@
 #include "service/signal_handler.h"
 
 #include "cli/log.h"
+#include "service/receiver_rest.h"
 
 #include <atomic>
 #include <csignal>
@@ -13,7 +14,7 @@
 namespace {
 
 const int endingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
-const suseconds_t outputGraceMicroseconds = 500000;
+const suseconds_t endGraceMicroseconds = 500000;
 
 std::atomic<int> serviceThreads{0};
 
@@ -30,11 +31,15 @@ void EndNow(int /*signalNumber*/) {
     _exit(0);
 }
 
-// Whatever the orderly end waits for (a full pipe behind standard output), it waits no longer than
-// this.
+// Whatever the orderly end waits for (the receiver, a full pipe behind standard output), it waits
+// no longer than this from the signal on.
 void LimitEnd() {
+    static std::atomic<bool> limited{false};
+    if (limited.exchange(true)) {
+        return;
+    }
     itimerval limit{};
-    limit.it_value.tv_usec = outputGraceMicroseconds;
+    limit.it_value.tv_usec = endGraceMicroseconds;
     sigset_t alarmSet;
     sigemptyset(&alarmSet);
     sigaddset(&alarmSet, SIGALRM);
@@ -53,6 +58,8 @@ void *WaitForSignals(void * /*argument*/) {
     int signalNumber = 0;
     while (sigwait(&set, &signalNumber) != 0) {
     }
+    LimitEnd();
+    ReceiverAwaitRest();
     SignalHandler(signalNumber);
 }
 

@@ -1,10 +1,10 @@
 // Ending the service: SIGINT, SIGTERM and SIGQUIT end the process at once with status 0, whatever
-// its threads are doing.
+// the worker is doing. Only the message that the receiver has in hand is stored first.
 //
 // The three signals are blocked in every thread and taken by a thread that does nothing else, so
 // that the end never starts inside another thread's malloc or printf. No destructor runs, buffered
-// standard output is written, and half a second later the process ends even if that output finds no
-// reader.
+// standard output is written, and half a second later the process ends even if the message cannot
+// be stored or that output finds no reader.
 #ifndef SERVICE_SIGNAL_HANDLER_H
 #define SERVICE_SIGNAL_HANDLER_H
 

@@ -5,7 +5,9 @@
 #include "service/private_world.h"
 
 #include "cli/tool_parameters.h"
+#include "platform/path.h"
 #include "service/message_queue.h"
+#include "service/service_state.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -15,6 +17,7 @@
 #include <sys/msg.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
+#include <thread>
 #include <unistd.h>
 
 using std::chrono::milliseconds;
@@ -60,6 +63,22 @@ protected:
             }
         }
         return messages;
+    }
+    // Starts a thread that takes the service lock once the service has made it, and gives it back
+    // when the file is there.
+    static void HoldLockUntil(const std::string &file) {
+        std::thread([file] {
+            sigset_t all;
+            sigfillset(&all);
+            pthread_sigmask(SIG_SETMASK, &all, nullptr); // as in all of the service's threads
+            usleep(20000);
+            ServiceLock();
+            LogNotice("The lock is held");
+            while (!PathExists(file.c_str())) {
+                usleep(1000);
+            }
+            ServiceUnlock();
+        }).detach();
     }
     static bool Contains(const Messages &all, const std::string &message) {
         return std::count(all.begin(), all.end(), message) > 0;
@@ -132,6 +151,33 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceInTheMiddleOfARequest) {
     close(marker[0]);
     close(marker[1]);
     EXPECT_NE(ReadWhole(config_).find("reloadPinBlocks"), std::string::npos); // still queued
+}
+
+TEST_F(StartServiceTest, ASignalLetsTheMessageInHandBeStored) {
+    const std::string release = folder_.Path("release");
+    ChildProcess service({1, false, true}, Service([&release] { HoldLockUntil(release); }));
+    EXPECT_TRUE(service.AwaitOutput("The lock is held"));
+    Send(requestReloadPinBlocks, "/volume1");
+    Send(requestReloadPinBlocks, "/volume2");
+    EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 1; }));
+    service.Signal(SIGTERM);
+    usleep(50000);
+    EXPECT_TRUE(service.Runs());
+    WriteWhole(release, "");
+    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_NE(ReadWhole(config_).find("/volume1"), std::string::npos);
+    EXPECT_EQ(ReadWhole(config_).find("/volume2"), std::string::npos);
+    EXPECT_EQ(CountMessages(queueId_), 1); // the other was not taken
+}
+
+TEST_F(StartServiceTest, ASignalDoesNotWaitForAMessageThatCannotBeStored) {
+    ChildProcess service({1, false, true}, Service([] { HoldLockUntil("/never"); }));
+    EXPECT_TRUE(service.AwaitOutput("The lock is held"));
+    Send(requestReloadPinBlocks, "/volume1");
+    EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 0; }));
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(ReadWhole(config_), "");
 }
 
 TEST_F(StartServiceTest, ASignalEndsTheServiceWhoseOutputNobodyReads) {

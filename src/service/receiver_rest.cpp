@@ -1,0 +1,55 @@
+#include "service/receiver_rest.h"
+
+#include <atomic>
+#include <csignal>
+#include <pthread.h>
+#include <unistd.h>
+
+namespace {
+
+const int restTries = 350;
+const useconds_t tryMicroseconds = 1000;
+
+// The receiver clears `atRest` and then looks at `called`; the ending thread sets `called` and then
+// looks at `atRest`: one of them sees the other.
+std::atomic<bool> called{false};
+std::atomic<bool> atRest{true};
+std::atomic<pthread_t> receiver{};
+
+void Interrupt(int /*signalNumber*/) {}
+
+} // namespace
+
+void ReceiverTakesNext() {
+    receiver = pthread_self();
+    atRest = false;
+    if (!called) {
+        return;
+    }
+    atRest = true;
+    for (;;) {
+        pause();
+    }
+}
+
+bool ReceiverIsCalledToRest() {
+    return called;
+}
+
+void ReceiverHasEnded() {
+    atRest = true;
+}
+
+void ReceiverAwaitRest() {
+    called = true;
+    // Installed only now: at any other time the signal has its default action. Other calls than the
+    // wait for messages go on after it.
+    if (signal(SIGUSR1, Interrupt) == SIG_ERR) {
+        return;
+    }
+    // Again and again: the signal may come just before the receiver begins to wait.
+    for (int tries = 0; tries < restTries && !atRest; ++tries) {
+        pthread_kill(receiver, SIGUSR1);
+        usleep(tryMicroseconds);
+    }
+}
