@@ -7,7 +7,6 @@
 #include "cli/tool_parameters.h"
 #include "platform/path.h"
 #include "service/message_queue.h"
-#include "service/service_state.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -17,7 +16,6 @@
 #include <sys/msg.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
-#include <thread>
 #include <unistd.h>
 
 using std::chrono::milliseconds;
@@ -64,26 +62,29 @@ protected:
         }
         return messages;
     }
-    // Starts a thread that takes the service lock once the service has made it, and gives it back
-    // when the file is there.
-    static void HoldLockUntil(const std::string &file) {
-        std::thread([file] {
-            sigset_t all;
-            sigfillset(&all);
-            pthread_sigmask(SIG_SETMASK, &all, nullptr); // as in all of the service's threads
-            usleep(20000);
-            ServiceLock();
-            LogNotice("The lock is held");
-            while (!PathExists(file.c_str())) {
-                usleep(1000);
-            }
-            ServiceUnlock();
-        }).detach();
+    // The worker holds the lock in choosing a request until the file is there.
+    std::function<int()> ServiceThatChoosesUntilReleased() const {
+        return Service([this] {
+            FakeAppliance::onConfigLookup = [this] {
+                LogNotice("Choosing");
+                while (!PathExists(release_.c_str())) {
+                    usleep(1000);
+                }
+            };
+        });
+    }
+    // The receiver has taken a message and waits for the lock to store it.
+    void SendMessageToHold(ChildProcess *service) const {
+        Send(requestReloadPinBlocks, volume_);
+        EXPECT_TRUE(service->AwaitOutput("Choosing"));
+        Send(requestReloadPinBlocks, volume_);
+        EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 0; }));
     }
     static bool Contains(const Messages &all, const std::string &message) {
         return std::count(all.begin(), all.end(), message) > 0;
     }
     const std::string config_ = folder_.Path("conf.json");
+    const std::string release_ = folder_.Path("release");
     int queueId_ = -1;
 };
 
@@ -153,31 +154,25 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceInTheMiddleOfARequest) {
     EXPECT_NE(ReadWhole(config_).find("reloadPinBlocks"), std::string::npos); // still queued
 }
 
-TEST_F(StartServiceTest, ASignalLetsTheMessageInHandBeStored) {
-    const std::string release = folder_.Path("release");
-    ChildProcess service({1, false, true}, Service([&release] { HoldLockUntil(release); }));
-    EXPECT_TRUE(service.AwaitOutput("The lock is held"));
-    Send(requestReloadPinBlocks, "/volume1");
-    Send(requestReloadPinBlocks, "/volume2");
-    EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 1; }));
+TEST_F(StartServiceTest, ASignalLetsTheMessageInHandBeStoredAndNoOtherBeTaken) {
+    ChildProcess service({1, false, true}, ServiceThatChoosesUntilReleased());
+    SendMessageToHold(&service);
+    Send(requestReloadPinBlocks, volume_);
     service.Signal(SIGTERM);
-    usleep(50000);
+    usleep(20000);
     EXPECT_TRUE(service.Runs());
-    WriteWhole(release, "");
+    WriteWhole(release_, "");
     EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
-    EXPECT_NE(ReadWhole(config_).find("/volume1"), std::string::npos);
-    EXPECT_EQ(ReadWhole(config_).find("/volume2"), std::string::npos);
-    EXPECT_EQ(CountMessages(queueId_), 1); // the other was not taken
+    EXPECT_NE(ReadWhole(config_).find("\"nextRequestNum\" : 2"), std::string::npos);
+    EXPECT_EQ(CountMessages(queueId_), 1);
 }
 
 TEST_F(StartServiceTest, ASignalDoesNotWaitForAMessageThatCannotBeStored) {
-    ChildProcess service({1, false, true}, Service([] { HoldLockUntil("/never"); }));
-    EXPECT_TRUE(service.AwaitOutput("The lock is held"));
-    Send(requestReloadPinBlocks, "/volume1");
-    EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 0; }));
+    ChildProcess service({1, false, true}, ServiceThatChoosesUntilReleased());
+    SendMessageToHold(&service);
     service.Signal(SIGTERM);
     EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
-    EXPECT_EQ(ReadWhole(config_), "");
+    EXPECT_NE(ReadWhole(config_).find("\"nextRequestNum\" : 1"), std::string::npos);
 }
 
 TEST_F(StartServiceTest, ASignalEndsTheServiceWhoseOutputNobodyReads) {
