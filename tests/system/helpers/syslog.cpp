@@ -1,16 +1,36 @@
 // system_syslog SOCKET FILE
 //
 // Owns the system log's socket and writes each datagram as one line to the file, with every line
-// feed inside it as \n. The file exists as soon as the socket takes datagrams. Runs until killed.
+// feed inside it as \n. The file exists as soon as the socket takes datagrams. On SIGTERM it writes
+// what has been sent by then and ends with 0.
 #include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstring>
+#include <poll.h>
 #include <string>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <unistd.h>
 
 namespace {
+
+volatile sig_atomic_t ending = 0;
+
+void End(int /*signalNumber*/) {
+    ending = 1;
+}
+
+// Lets SIGTERM come only during the waits with the returned mask.
+sigset_t HoldTermination() {
+    sigset_t termination;
+    sigset_t before;
+    sigemptyset(&termination);
+    sigaddset(&termination, SIGTERM);
+    sigprocmask(SIG_BLOCK, &termination, &before);
+    signal(SIGTERM, End);
+    return before;
+}
 
 int Fail(const char *what) {
     fprintf(stderr, "system_syslog: %s: %s\n", what, strerror(errno));
@@ -38,6 +58,7 @@ int main(int argc, char **argv) {
         fputs("usage: system_syslog SOCKET FILE\n", stderr);
         return 2;
     }
+    const sigset_t whileWaiting = HoldTermination();
     memcpy(address.sun_path, argv[1], strlen(argv[1]));
     unlink(argv[1]);
     const int log = socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0);
@@ -48,10 +69,15 @@ int main(int argc, char **argv) {
     if (file == nullptr) {
         return Fail(argv[2]);
     }
+    pollfd readable = {log, POLLIN, 0};
     char datagram[65536];
     for (;;) {
-        const ssize_t bytes = recv(log, datagram, sizeof(datagram), 0);
-        if (bytes < 0 && errno == EINTR) {
+        const ssize_t bytes = recv(log, datagram, sizeof(datagram), MSG_DONTWAIT);
+        if (bytes < 0 && errno == EAGAIN) {
+            if (ending != 0) {
+                return 0;
+            }
+            ppoll(&readable, 1, nullptr, &whileWaiting);
             continue;
         }
         if (bytes < 0) {
