@@ -63,7 +63,8 @@ void *WaitForSignals(void * /*argument*/) {
     SignalHandler(signalNumber);
 }
 
-// False when there is no thread to be had: then the handler runs on the thread that is interrupted.
+// False when there is no thread to be had: then the handler runs on the thread that is interrupted,
+// which may be the receiver, so nobody is waited for.
 bool StartWaiter() {
     pthread_t waiter{};
     if (pthread_create(&waiter, nullptr, WaitForSignals, nullptr) != 0) {

@@ -6,6 +6,7 @@
 // itself. When the call is reached, a byte goes to descriptor 9. At the program's orderly end the
 // number of allocations that are not freed follows there as " N".
 #include "faults/fail_call.h"
+#include "faults/real_call.h"
 
 #include <atomic>
 #include <cerrno>
