@@ -16,8 +16,8 @@ using Stream = std::unique_ptr<FILE, StreamCloser>;
 
 } // namespace
 
-int FileWriteString(const char *path, const char *text) {
-    Stream stream(fopen(path, "w+e"));
+int FileWriteString(const char *path, const char *text, OldContent old) {
+    Stream stream(fopen(path, old == OldContent::Kept ? "a+e" : "w+e"));
     if (!stream) {
         LogError("Can't open file (%s)", path);
         return -1;

@@ -4,9 +4,12 @@
 
 #include <string>
 
-// Creates or empties the file and writes the text, nothing added. 0, or -1 after an error message
-// when it cannot be opened or not every byte was written.
-int FileWriteString(const char *path, const char *text);
+// What becomes of the content of a file that is there already.
+enum class OldContent { Emptied, Kept };
+
+// Creates or empties the file, or finds its end, and writes the text, nothing added. 0, or -1 after
+// an error message when it cannot be opened or not every byte was written.
+int FileWriteString(const char *path, const char *text, OldContent old = OldContent::Emptied);
 
 // The first line of the file, with its line feed if it has one. 0, or -1 after an error message
 // when the file cannot be opened or is empty.

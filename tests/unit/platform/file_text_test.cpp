@@ -39,6 +39,16 @@ TEST_F(FileTextTest, EmptiesALongerFileFirst) {
     EXPECT_EQ(ReadWhole(path), "1");
 }
 
+TEST_F(FileTextTest, WritesBehindTheOldContentWhereThatIsKept) {
+    CapturedLog log;
+    EXPECT_EQ(FileWriteString(path.c_str(), "", OldContent::Kept), 0);
+    EXPECT_EQ(ReadWhole(path), "");
+    EXPECT_EQ(FileWriteString(path.c_str(), "1", OldContent::Kept), 0);
+    EXPECT_EQ(FileWriteString(path.c_str(), "", OldContent::Kept), 0);
+    EXPECT_EQ(FileWriteString(path.c_str(), "2", OldContent::Kept), 0);
+    EXPECT_EQ(ReadWhole(path), "12");
+}
+
 TEST_F(FileTextTest, EmptyTextMakesAnEmptyFile) {
     CapturedLog log;
     EXPECT_EQ(FileWriteString(path.c_str(), ""), 0);

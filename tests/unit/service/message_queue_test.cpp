@@ -2,11 +2,13 @@
 
 #include "service/queue_fixture.h"
 
+#include <atomic>
 #include <cerrno>
 #include <cstddef>
 #include <stdexcept>
 #include <sys/ipc.h>
 #include <sys/msg.h>
+#include <thread>
 
 class MessageQueueTest : public QueueTest {};
 
@@ -85,6 +87,27 @@ TEST_F(MessageQueueTest, AnExistingEmptyKeyFileIsFilled) {
     WriteWhole(keyFile_, "");
     EXPECT_NE(MsgCreateExclusive(KeyFile()), -1);
     EXPECT_EQ(ReadWhole(keyFile_), std::to_string(ftok(KeyFile(), 120)));
+}
+
+// The second looks before the first has created the file, and comes to creating it when the key is in.
+TEST_F(MessageQueueTest, OfTwoAtOnceNeitherEmptiesTheKeyFileOfTheOther) {
+    CapturedLog log;
+    const int rounds = 300;
+    for (int i = 0; i < rounds; ++i) {
+        const std::string path = folder_.Path("key" + std::to_string(i));
+        std::atomic<int> waiting{2};
+        const auto get = [&] {
+            --waiting;
+            while (waiting > 0) {
+            }
+            MsgQueueGet(path.c_str());
+        };
+        std::thread other(get);
+        get();
+        other.join();
+        ASSERT_EQ(ReadWhole(path), std::to_string(ftok(path.c_str(), 'x'))) << i;
+        EmptyPrivateWorld();
+    }
 }
 
 TEST_F(MessageQueueTest, AKeyFileThatCannotBeCreatedFails) {
