@@ -42,6 +42,17 @@ complete_line() { # WORD...: what bash would offer for the last word
     done
 }
 
+@test "the service's unit counts as started when the queue's key can be read" {
+    local key=/run/veskcachepinfile-msg-server.key wait
+    wait=$(sed -n 's/^ExecStartPost=//p' "$PACKAGING/systemd/veskcachepinfiletool.service")
+    : >"$key"
+    run timeout 0.5 bash -c "$wait"
+    [ "$status" -eq 124 ]
+    echo 1 >"$key"
+    timeout 5 bash -c "$wait"
+    rm "$key"
+}
+
 @test "bash completes every option" {
     [ "$(complete_line -- | sort)" = "$(sort <<<"$OPTIONS")" ]
     [ "$(complete_line --pin)" = --pin-files ]
