@@ -36,8 +36,8 @@ int GetMsgKey(int *key, const char *path) {
 
 int MsgCreateExclusive(const char *keyFile) {
     LogTraceScope();
-    // Whatever another process has put into the file since the look is kept: nobody would ever write
-    // the key of its queue again.
+    // Whatever another process has put into the file since the look is kept: nobody would ever
+    // write the key of its queue again.
     if (!PathExists(keyFile) && FileWriteString(keyFile, "", OldContent::Kept) < 0) {
         LogError("Create file (%s) failed", keyFile);
         return -1;

@@ -89,7 +89,8 @@ TEST_F(MessageQueueTest, AnExistingEmptyKeyFileIsFilled) {
     EXPECT_EQ(ReadWhole(keyFile_), std::to_string(ftok(KeyFile(), 120)));
 }
 
-// The second looks before the first has created the file, and comes to creating it when the key is in.
+// The second looks before the first has created the file, and comes to creating it when the key is
+// in.
 TEST_F(MessageQueueTest, OfTwoAtOnceNeitherEmptiesTheKeyFileOfTheOther) {
     CapturedLog log;
     const int rounds = 300;
