@@ -103,9 +103,8 @@ int main(int argc, char *argv[]) {
     }
     const auto milliseconds =
         std::chrono::duration_cast<std::chrono::milliseconds>(slowest).count();
-    printf(
-        "seed %s: %d kills, slowest end by SIGTERM %lld ms, %ld requests sent, %ld lost by SIGKILL, the others "
-        "carried out\n",
-        argv[4], kills, static_cast<long long>(milliseconds), sent, lost);
+    printf("seed %s: %d kills, slowest end by SIGTERM %lld ms, %ld requests sent, %ld lost by "
+           "SIGKILL, the others carried out\n",
+           argv[4], kills, static_cast<long long>(milliseconds), sent, lost);
     return milliseconds <= 1000 && Lost(sent) == lost ? 0 : 1;
 }
