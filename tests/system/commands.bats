@@ -172,7 +172,7 @@ END
 : Can't sent pending space
 END
         [ $(($(now_ms) - begin)) -ge 3000 ]
-        [ $(($(now_ms) - begin)) -lt 6000 ]
+        [ $(($(now_ms) - begin)) -lt 10000 ]
         waiting_is 0
     done
     lose_cache
@@ -182,7 +182,7 @@ END
 : Volume (/volume1) doesn't support pin
 : Can't sent pending space
 END
-        [ $(($(now_ms) - begin)) -lt 2000 ]
+        [ $(($(now_ms) - begin)) -lt 3000 ]
     done
 }
 

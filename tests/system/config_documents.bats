@@ -131,7 +131,6 @@ END
     tool --reload-blocks --mount-path /volume1
     CONF=$path start_service
     wait_until waiting_is 0
-    sleep 0.1
     service_said <<END
 : Can't open config file ($path)
 : Can't write to files
@@ -158,7 +157,7 @@ END
         "1":{"type":"reloadPinBlocks","mountPath":"/volume1","data":null}}}'
     cp "$CONF" "$BATS_TEST_TMPDIR/before"
     start_service
-    sleep 0.2
+    wait_until service_rests
     cmp "$BATS_TEST_TMPDIR/before" "$CONF"
     tool --reload-blocks --mount-path /volume1
     wait_until request_is_stored 2
@@ -173,7 +172,6 @@ END
     put_config '{"requestQueue":["0"],"requests":{
         "0":{"type":"PinFiles","mountPath":"/volume1","data":null}}}'
     start_service
-    sleep 0.2
     service_said <<END
 : Can't get correct request type
 : Get request error
@@ -186,7 +184,7 @@ END
     cp "$CONF" "$BATS_TEST_TMPDIR/before"
     start_service
     wait_until test -e "$(bitmap_file 1)"
-    sleep 0.2
+    wait_until service_rests
     cmp "$BATS_TEST_TMPDIR/before" "$CONF"
     service_said <<END
 : Remove string error, count =2

@@ -65,7 +65,7 @@ no_temporary_files() { same "" "$(find "$1" -name '.*' -type f)"; }
     start_service
     tool --reload-blocks --mount-path /volume1
     wait_until waiting_is 0
-    sleep 0.1
+    wait_until service_rests
     same '{"nextRequestNum":5}' "$(config .)"
     service_said <<END
 : Can't open config file ($CONF)
@@ -92,7 +92,7 @@ END
     dd if=/dev/zero of="$FOLDER/filler" bs=4k status=none 2>/dev/null || true
     tool --pin-files /volume1/a --mount-path /volume1
     wait_until waiting_is 0
-    sleep 0.1
+    wait_until service_rests
     same '{"nextRequestNum":7}' "$(config .)"
     no_temporary_files "$FOLDER"
     rm "$FOLDER/filler"
@@ -108,7 +108,7 @@ END
     start_service
     tool --reload-blocks --mount-path /volume1
     wait_until waiting_is 0
-    sleep 0.1
+    wait_until service_rests
     refute test -e "$FOLDER"
     service_said <<END
 : Can't open config file ($CONF)

@@ -89,9 +89,9 @@ refute() {
     fi
 }
 
-# wait_until COMMAND...: tries until it succeeds; gives up after WAIT_SECONDS (30).
+# wait_until COMMAND...: tries until it succeeds; gives up after 30 seconds.
 wait_until() {
-    local end=$((SECONDS + ${WAIT_SECONDS:-30})) pause=0.02
+    local end=$((SECONDS + 30)) pause=0.02
     until "$@"; do
         if [ "$SECONDS" -ge "$end" ]; then
             echo "waited too long for: $*"

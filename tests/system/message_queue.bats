@@ -167,9 +167,11 @@ END
 @test "a send waits for room for up to three seconds" {
     send_pin
     record 6 /volume1 "" | send_raw 1 1023
-    (sleep 0.5 && receive_raw 1 >/dev/null) &
-    send_pin
-    wait
+    "$BIN/veskcachepinfiletool" --pin-files /volume1/a --mount-path /volume1 &
+    local client=$!
+    wait_until thread_is_in_call "$client" "$PAUSE_CALL"
+    receive_raw 1 >/dev/null
+    wait "$client"
     waiting_is 1024
 }
 

@@ -29,10 +29,16 @@ block() { awk -v wanted="== $1" '/^== / { inside = $0 == wanted; next } inside' 
     touch "/volume1/photos/not this one"
     sync
     {
-        # shellcheck disable=SC2016
-        printf '%s\n' 'set -eu' \
-            'idle() { grep -qs "\"requestQueue\" : null" "$CONFIG"; }' \
-            'settle() { [ -z "${CONFIG:-}" ] || [ ! -e "$CONFIG" ] || until idle; do sleep 0.2; done; }'
+        cat <<'END'
+set -eu
+# Until what was asked for is done, where the service runs.
+settle() { until idle; do sleep 0.2; done; }
+idle() {
+    SERVICE_PID=$(pgrep -f 'veskcachepinfiletool --start-service') || return 0
+    service_rests && CONF=$CONFIG look_at_requests && [[ $QUEUE != *[0-9]* ]]
+}
+END
+        echo ". '$BATS_TEST_DIRNAME/lib/service.bash'"
         script_of "$BATS_TEST_DIRNAME/../../docs/operations.md"
     } >/tmp/operations.sh
     PATH=$BIN:$PATH timeout 120 bash /tmp/operations.sh >/tmp/operations.log 2>&1 3>&- || {

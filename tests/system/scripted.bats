@@ -243,7 +243,7 @@ END
     [ "$(config '.requests["0"].data | length')" -gt $((1023 - ${#entry} - 1)) ]
     tool --pin-files "$files" --mount-path /v
     wait_until waiting_is 0
-    sleep 0.1
+    wait_until service_rests
     same 1 "$(config .nextRequestNum)"
     stop_service
     same "Get relative paths failed

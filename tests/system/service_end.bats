@@ -11,9 +11,9 @@ setup_file() {
 
 setup() { fresh_volume; }
 
-# A service that reads /volume1/a through a slow device, for 3 seconds and longer.
+# A service that reads /volume1/a through a slow device, for 15 seconds.
 start_slow_warming() {
-    fragmented a 20
+    fragmented a 100
     map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
     local before
     before=$(slow_misses)
@@ -29,7 +29,7 @@ stops_at_once() {
     local begin
     begin=$(now_ms)
     stop_service_by "$1"
-    [ $(($(now_ms) - begin)) -lt 2000 ]
+    [ $(($(now_ms) - begin)) -lt 5000 ]
 }
 
 @test "SIGTERM, SIGINT and SIGQUIT end an idle service" {
@@ -72,6 +72,7 @@ stops_at_once() {
     random a 8K
     start_service
     pin 1 /volume1/a
+    wait_until worker_rests
     stops_at_once TERM
     same 1 "$(config '.volumes["/volume1"].files | length')"
     [ "$(wc -l <"$SERVICE_LOG")" -eq 2 ]

@@ -145,8 +145,7 @@ END
     send_pin /volume1/b
     rm a
     start_service
-    wait_until waiting_is 1
-    sleep 0.3
+    wait_until receiver_has_ended
     waiting_is 1
     refute test -e "$CONF"
     service_said <<END

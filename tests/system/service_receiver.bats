@@ -18,7 +18,7 @@ send_pin() { tool --pin-files "$1" --mount-path /volume1; }
 receiver_ended() {
     send_pin /volume1/b
     wait_until queue_is_empty
-    sleep 0.1
+    wait_until receiver_has_ended
     waiting_is "${1:-1}"
     kill -0 "$SERVICE_PID"
     stop_service
@@ -125,6 +125,8 @@ END
     start_service
     send_pin /volume1/a
     wait_until request_is_stored 0
+    # Where the queue is gone before it waits again, the call tells another reason.
+    wait_until receiver_waits
     remove_queues
     # The request sent now makes a queue of its own.
     receiver_ended <<END

@@ -46,7 +46,7 @@ lose_cache() {
     start_service
     tool --pin-files "/volume2/b" --mount-path /volume1
     wait_until waiting_is 0
-    sleep 0.1
+    wait_until service_rests
     refute test -e "$CONF"
     service_said <<END
 : Failed to Get relative path (Volume path=/volume1 File path=/volume2/b

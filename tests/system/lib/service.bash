@@ -31,8 +31,39 @@ service_is_ready() {
     [ "$name" = veskcachepinfil ] && ((0x$caught & 0x4000)) && [ -s "$KEY_FILE" ]
 }
 
-# The service must end with status 0.
-stop_service() { stop_service_by TERM; }
+# What its threads wait for is told by the arguments of the calls that they are in, whose numbers differ
+# from machine to machine.
+
+# The receiver, the first thread, waits for a message: only there is a record's size, 1540 bytes.
+receiver_waits() { thread_is_in_call "$SERVICE_PID" ' 0x604 '; }
+
+# The worker waits for a request or in a pause. It is the thread made last; where it has ended that is
+# the one that waits for signals.
+worker_rests() {
+    local task newest=0
+    for task in /proc/"$SERVICE_PID"/task/*; do
+        task=${task##*/}
+        [ "$task" -lt "$newest" ] || newest=$task
+    done
+    thread_is_in_call "$newest" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
+}
+
+# thread_is_in_call THREAD EXPRESSION
+PAUSE_CALL='^[0-9]+ 0x0 0x0 0x'
+thread_is_in_call() {
+    local call
+    read -r call <"/proc/$1/syscall" && [[ $call =~ $2 ]]
+}
+
+# It has written all that it has to say about what was asked of it.
+service_rests() { worker_rests && { receiver_waits || receiver_has_ended; }; }
+receiver_has_ended() { grep -qs '^State:.Z' "/proc/$SERVICE_PID/status"; }
+
+# The service is at rest, or comes to it, and must end with status 0.
+stop_service() {
+    wait_until service_rests
+    stop_service_by TERM
+}
 
 # stop_service_by SIGNAL
 stop_service_by() {
