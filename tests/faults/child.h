@@ -18,15 +18,16 @@ public:
 
     // True once it catches SIGTERM; false when it has ended before.
     bool AwaitHandler() const;
-    // Returns when the service has nothing more to do, has ended or gets nowhere for 300 ms.
-    void AwaitQuiet(const char *config) const;
+    // True once it is a service with nothing more to do and its last message written; false when it
+    // has ended before, or after five minutes.
+    bool AwaitQuiet() const;
     // The lowest number seen in some looks: requests open and close their own. Looks longer while
     // there are more than `enough`.
     int Descriptors(int enough) const;
     long MemoryKiB() const; // resident
     void Signal(int number) const;
-    // Exit status, 128 + the signal, or -1 when it has not ended within five seconds; it is killed
-    // then.
+    // Exit status, 128 + the signal, or -1 when it has not ended within half a minute; it is
+    // killed then.
     int AwaitEnd();
     bool FaultReached() const;
     long LiveAllocations() const; // at its orderly end; 0 where there was none
@@ -35,6 +36,7 @@ public:
 
 private:
     bool HasEnded() const;
+    bool IsQuiet() const;
     pid_t pid_ = -1;
 };
 

@@ -68,17 +68,15 @@ size_t Ended(const std::string &log) {
     return Count(log, ") OK ") + Count(log, "drop it.");
 }
 
-// The service is ended once the requests before number `next` are carried out.
+// The service is ended once it has nothing more to do, the requests before number `next` being
+// carried out.
 Left Serve(const Program &program, long next) {
     Left left;
     Child service(program, serve, Fault{});
-    bool idle = false;
-    for (int i = 0; i < 5000 && !idle; ++i) { // ten seconds
-        usleep(2000);
-        idle = WorldIsIdle(config) && WorldNextNumber(config) == next;
-    }
-    if (!idle || !service.AwaitHandler()) {
-        left.complaint = idle ? "the service did not start" : "requests stay queued";
+    if (!service.AwaitQuiet()) {
+        left.complaint = "the service did not start";
+    } else if (!WorldIsIdle(config) || WorldNextNumber(config) != next) {
+        left.complaint = "requests stay queued";
     }
     service.Signal(SIGTERM);
     if (service.AwaitEnd() != 0) {
@@ -132,10 +130,7 @@ std::string Judge(const CrashPoint &point, size_t requests, const Left &left, co
         return "the document is not what " + std::to_string(requests) + " requests lead to:\n" +
                left.document;
     }
-    // The last one's message comes after the document's change, perhaps too late for this end.
-    const size_t queued = QueuedIn(point.files);
-    const size_t ended = Ended(left.log);
-    if (ended > queued || ended + 1 < queued) {
+    if (Ended(left.log) != QueuedIn(point.files)) {
         return "a queued request was not carried out once";
     }
     if (!point.powerCut && (left.bitmap != good.bitmap || left.driver != good.driver)) {
@@ -162,7 +157,7 @@ void RunBeginning(const Program &recorded, const Program &program, bool withDocu
     std::string record;
     {
         Child service(recorded, serve, Fault{});
-        service.AwaitQuiet(config);
+        service.AwaitQuiet();
         service.Signal(SIGTERM);
         service.AwaitEnd();
         record = service.Report();

@@ -90,12 +90,8 @@ int main(int argc, char *argv[]) {
         }
     }
     Child last(program, serve, Fault{});
-    for (int i = 0; i < 3000 && !WorldIsIdle(config); ++i) { // up to five minutes
-        usleep(100000);
-    }
-    // Nothing may have been left to do, so that it has only just begun.
-    if (!last.AwaitHandler()) {
-        return Fail(kills, "the last service did not start:", last.Output());
+    if (!last.AwaitQuiet()) {
+        return Fail(kills, "the last service did not come to rest:", last.Output());
     }
     last.Signal(SIGTERM);
     if (last.AwaitEnd() != 0 || !WorldIsIdle(config)) {

@@ -168,6 +168,7 @@ int main(int argc, char *argv[]) {
         ++figures.rounds;
         Look(service, &figures);
     }
+    service.AwaitQuiet();
     service.Signal(SIGTERM);
     if (const int status = service.AwaitEnd(); status != 0) {
         return Fail("status " + std::to_string(status) + ": " + service.Output());

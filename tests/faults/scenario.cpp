@@ -102,7 +102,7 @@ Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Faul
     outcome.faultKind = fault.kind;
     Child child(program, scenario.arguments, fault);
     if (scenario.isService) {
-        child.AwaitQuiet(config);
+        child.AwaitQuiet();
         outcome.descriptors = child.Descriptors(descriptors);
         child.Signal(SIGTERM);
     }

@@ -131,10 +131,6 @@ long WorldRecords(const char *config) {
     return static_cast<long>(root["volumes"]["/volume1"]["files"].size());
 }
 
-bool WorldIsDone(const char *config) {
-    return WorldIsIdle(config) && WorldNextNumber(config) == 1 + static_cast<long>(messagesSent);
-}
-
 std::string WorldComplaint(const std::string &text) {
     if (text.empty()) {
         return "";

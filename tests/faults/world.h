@@ -22,9 +22,6 @@ void WorldAwaitQueue();
 
 long WorldRecords(const char *config); // pinned files of /volume1 in the document
 
-// All messages were taken and no request is queued any more.
-bool WorldIsDone(const char *config);
-
 // Nothing is queued, neither as a message nor in the document.
 bool WorldIsIdle(const char *config);
 long WorldNextNumber(const char *config); // the number that the next request will get

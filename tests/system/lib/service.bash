@@ -55,8 +55,9 @@ thread_is_in_call() {
     read -r call <"/proc/$1/syscall" && [[ $call =~ $2 ]]
 }
 
-# It has written all that it has to say about what was asked of it.
-service_rests() { worker_rests && { receiver_waits || receiver_has_ended; }; }
+# It has written all that it has to say about what was asked of it. In this order: the receiver has
+# woken the worker before it waits.
+service_rests() { { receiver_waits || receiver_has_ended; } && worker_rests; }
 receiver_has_ended() { grep -qs '^State:.Z' "/proc/$SERVICE_PID/status"; }
 
 # The service is at rest, or comes to it, and must end with status 0.
