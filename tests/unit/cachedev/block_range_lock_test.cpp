@@ -13,7 +13,7 @@ namespace {
 
 // Waits, within reason, until `count` ranges are held or awaited.
 void AwaitQueue(BlockRangeLock &lock, size_t count) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(5);
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
     while (std::chrono::steady_clock::now() < deadline) {
         {
             const std::lock_guard<std::mutex> hold(lock.mutex);

@@ -209,7 +209,7 @@ TEST(CacheDeviceDelayTest, OnlyMissesAreDelayedAndNobodyElseWaits) {
     using Clock = std::chrono::steady_clock;
     TestDevice test(8 * kBlockBytes, 8);
     TestTouch(test.device, {0});
-    constexpr std::chrono::milliseconds kDelay(150);
+    constexpr std::chrono::milliseconds kDelay(1000);
     test.device.settings.missDelayMs = kDelay.count();
     const auto start = Clock::now();
     std::thread misses([&test] { TestReadResult(test.device, 2 * kBlockBytes, 2 * kBlockBytes); });

@@ -141,7 +141,7 @@ bool ChildProcess::Runs() {
 }
 
 bool ChildProcess::Await(const std::function<bool()> &condition) {
-    const Clock::time_point end = Clock::now() + std::chrono::seconds(5);
+    const Clock::time_point end = Clock::now() + std::chrono::seconds(30);
     while (!condition()) {
         if (Clock::now() > end) {
             return false;

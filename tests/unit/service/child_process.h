@@ -49,17 +49,17 @@ public:
 
     // The exit status, 128 + the number of the signal that ended it, or -1 where it has not ended
     // within this time.
-    int AwaitEnd(std::chrono::milliseconds limit = std::chrono::seconds(5));
+    int AwaitEnd(std::chrono::milliseconds limit = std::chrono::seconds(10));
 
     // Whether it still runs.
     bool Runs();
 
-    // Whether the condition comes true within five seconds.
+    // Whether the condition comes true within half a minute.
     static bool Await(const std::function<bool()> &condition);
     // Whether the child has a handler for this signal.
     bool Catches(int number) const;
 
-    // Whether it writes this text within five seconds.
+    // Whether it writes this text within half a minute.
     bool AwaitOutput(const std::string &text);
 
     // What the child has written so far: lines without the program's name, with every line number

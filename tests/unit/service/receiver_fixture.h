@@ -47,15 +47,13 @@ protected:
     }
     // Until the receiver has logged this and then sleeps: it can only wait for the service lock.
     static void AwaitAtLock(CapturedLog &log, const std::string &message) {
-        const auto sleeps = [](pid_t thread) {
-            const std::string status =
-                ReadWhole("/proc/self/task/" + std::to_string(thread) + "/stat");
-            const size_t place = status.rfind(") S");
-            return place != std::string::npos;
-        };
-        while (!log.Has(message) || !sleeps(receiverThread_)) {
+        while (!log.Has(message) || !Sleeps(receiverThread_)) {
             sched_yield();
         }
+    }
+    static bool Sleeps(pid_t thread) {
+        const std::string status = ReadWhole("/proc/self/task/" + std::to_string(thread) + "/stat");
+        return status.rfind(") S") != std::string::npos;
     }
     static inline std::atomic<pid_t> receiverThread_{0};
 

@@ -77,15 +77,14 @@ TEST_F(ReceiverPendingTest, ASpaceThatEntersTheListMeanwhileStopsIt) {
     Put(requestAddPendingSpace, path);
     CapturedLog log(2);
     ServiceLock();
-    std::atomic<bool> adding{false};
+    std::atomic<pid_t> adding{0};
     std::thread other([&] { // the first in the line for the lock
-        adding = true;
+        adding = static_cast<pid_t>(syscall(SYS_gettid));
         ServiceAddPendingSpaceAtomic(&path[0]);
     });
-    while (!adding) {
+    while (adding == 0 || !Sleeps(adding)) {
         sched_yield();
     }
-    usleep(20000);
     std::thread receiver([this] { RunReceiver(); });
     AwaitAtLock(log, "GetRequests() [N]: Get a new message. Request type = addPendingSpace");
     ServiceUnlock();

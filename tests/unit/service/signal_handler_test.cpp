@@ -71,7 +71,7 @@ TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten
         });
         ASSERT_TRUE(ChildProcess::Await([&] { return child.Catches(SIGQUIT); }));
         child.Signal(number);
-        EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+        EXPECT_EQ(child.AwaitEnd(), 0);
         const Messages messages = child.Messages();
         ASSERT_FALSE(messages.empty());
         EXPECT_EQ(messages.back(), "SignalHandler() [N]: Get signal = " + std::to_string(number));
@@ -87,7 +87,7 @@ TEST_F(SignalHandlerTest, ASignalIsSilentAtLevel1) {
         }
         return 99;
     });
-    EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+    EXPECT_EQ(child.AwaitEnd(), 0);
     EXPECT_EQ(child.Messages(), Messages{});
 }
 
@@ -104,7 +104,7 @@ TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
     ASSERT_TRUE(ChildProcess::Await([&] { return child.Catches(SIGQUIT); }));
     usleep(5000); // the thread has long filled its buffer
     child.Signal(SIGTERM);
-    EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+    EXPECT_EQ(child.AwaitEnd(), 0);
 }
 
 TEST_F(SignalHandlerTest, OtherSignalsKeepTheirActions) {
@@ -126,7 +126,7 @@ TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheHandlerRunsWhereItIsInterrupte
         raise(SIGINT);
         return 98;
     });
-    EXPECT_EQ(child.AwaitEnd(std::chrono::seconds(1)), 0);
+    EXPECT_EQ(child.AwaitEnd(), 0);
     EXPECT_EQ(child.Messages(), Messages{"SignalHandler() [N]: Get signal = 2"});
 }
 

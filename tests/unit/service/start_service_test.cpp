@@ -18,8 +18,6 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
-using std::chrono::milliseconds;
-
 // The whole service in a process of its own.
 class StartServiceTest : public HandlerTest {
 protected:
@@ -98,7 +96,7 @@ TEST_F(StartServiceTest, ARequestIsReceivedStoredAndCarriedOut) {
     Send(requestPinFiles, volume_, volume_ + "/a");
     EXPECT_TRUE(service.AwaitOutput("OK \n"));
     service.Signal(SIGTERM);
-    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.AwaitEnd(), 0);
     EXPECT_EQ(service.Messages(),
               Messages{"Handle request (type=pinFiles files=a#" + std::to_string(inode) + ") OK "});
     EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "0100");
@@ -112,7 +110,7 @@ TEST_F(StartServiceTest, EachSignalEndsTheIdleServiceWithItsOutputWritten) {
         Send(requestReloadPinBlocks, "/volume9"); // of no cache: stored, woken for and dropped
         EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
         service.Signal(number);
-        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        EXPECT_EQ(service.AwaitEnd(), 0);
         const Messages messages = service.Messages();
         ASSERT_FALSE(messages.empty());
         EXPECT_EQ(messages.front(), "StartService() [N] : +++++");
@@ -145,7 +143,7 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceInTheMiddleOfARequest) {
         char byte = 0;
         EXPECT_EQ(syscall(SYS_read, marker[0], &byte, 1), 1);
         service.Signal(SIGTERM);
-        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        EXPECT_EQ(service.AwaitEnd(), 0);
         const Messages messages = service.Messages();
         EXPECT_TRUE(Contains(messages, "SignalHandler() [N]: Get signal = 15"));
     }
@@ -159,10 +157,11 @@ TEST_F(StartServiceTest, ASignalLetsTheMessageInHandBeStoredAndNoOtherBeTaken) {
     SendMessageToHold(&service);
     Send(requestReloadPinBlocks, volume_);
     service.Signal(SIGTERM);
-    usleep(20000);
+    // By the signal that calls the receiver to rest.
+    EXPECT_TRUE(ChildProcess::Await([&] { return service.Catches(SIGUSR1); }));
     EXPECT_TRUE(service.Runs());
     WriteWhole(release_, "");
-    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.AwaitEnd(), 0);
     EXPECT_NE(ReadWhole(config_).find("\"nextRequestNum\" : 2"), std::string::npos);
     EXPECT_EQ(CountMessages(queueId_), 1);
 }
@@ -171,7 +170,7 @@ TEST_F(StartServiceTest, ASignalDoesNotWaitForAMessageThatCannotBeStored) {
     ChildProcess service({1, false, true}, ServiceThatChoosesUntilReleased());
     SendMessageToHold(&service);
     service.Signal(SIGTERM);
-    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.AwaitEnd(), 0);
     EXPECT_NE(ReadWhole(config_).find("\"nextRequestNum\" : 1"), std::string::npos);
 }
 
@@ -190,7 +189,7 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceWhoseOutputNobodyReads) {
     }));
     EXPECT_GT(waiting, 0);
     service.Signal(SIGTERM);
-    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.AwaitEnd(), 0);
 }
 
 TEST_F(StartServiceTest, ASignalEndsTheServiceBeforeItHasItsQueue) {
@@ -203,7 +202,7 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceBeforeItHasItsQueue) {
         EXPECT_TRUE(service.AwaitOutput("Message queue exist, try to get key"));
         EXPECT_TRUE(service.Runs());
         service.Signal(number);
-        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        EXPECT_EQ(service.AwaitEnd(), 0);
         const Messages messages = service.Messages();
         ASSERT_FALSE(messages.empty());
         EXPECT_EQ(Of(messages, "GetRequests"), Messages{"GetRequests() [N] : +++++"});
@@ -218,7 +217,7 @@ TEST_F(StartServiceTest, ASignalRightAfterTheHandlersAreInstalledEndsTheService)
         ChildProcess service({1}, Service());
         EXPECT_TRUE(ChildProcess::Await([&] { return service.Catches(SIGQUIT); }));
         service.Signal(SIGTERM);
-        EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+        EXPECT_EQ(service.AwaitEnd(), 0);
     }
 }
 
@@ -234,7 +233,7 @@ TEST_F(StartServiceTest, WithoutItsQueueTheReceiverEndsAndTheWorkerGoesOn) {
     EXPECT_TRUE(service.AwaitOutput("Handle request (type=reloadPinBlocks) OK \n"));
     EXPECT_TRUE(service.Runs());
     service.Signal(SIGTERM);
-    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.AwaitEnd(), 0);
 }
 
 TEST_F(StartServiceTest, ASelectionErrorEndsTheWorkerAndTheReceiverGoesOn) {
@@ -245,7 +244,7 @@ TEST_F(StartServiceTest, ASelectionErrorEndsTheWorkerAndTheReceiverGoesOn) {
     EXPECT_TRUE(AwaitConfig("/volume1"));
     EXPECT_TRUE(service.Runs());
     service.Signal(SIGTERM);
-    EXPECT_EQ(service.AwaitEnd(milliseconds(1000)), 0);
+    EXPECT_EQ(service.AwaitEnd(), 0);
     EXPECT_EQ(service.Messages(), (Messages{
                                       "Can't find request number (7) in config",
                                       "Get request error",
