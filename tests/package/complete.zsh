@@ -10,7 +10,7 @@ for line in "$@"; do
     zpty -r -m shell answer '*ready*'
     # The completed line is turned into one that prints itself.
     zpty -w -n shell "veskcachepinfiletool $line"$'\t'
-    sleep 0.7
+    sleep 2
     zpty -w -n shell $'\C-aprint -r -- "<\C-e>"\n'
     zpty -r -m shell answer '*<*>*'
     sleep 0.2

@@ -49,7 +49,7 @@ complete_line() { # WORD...: what bash would offer for the last word
     run timeout 0.5 bash -c "$wait"
     [ "$status" -eq 124 ]
     echo 1 >"$key"
-    timeout 5 bash -c "$wait"
+    timeout 60 bash -c "$wait"
     rm "$key"
 }
 
