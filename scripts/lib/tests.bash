@@ -2,7 +2,8 @@
 
 # run_ctest ARGUMENT...: runs ctest with the arguments; the last line printed has the counts. A program
 # of CTest may hold several tests, a system test file or, in a cross build, all of GoogleTest's: their
-# own lines count then, not the program. Returns ctest's status.
+# own lines count then, not the program. Before them comes what failed, with the last lines that it
+# printed. Returns ctest's status.
 run_ctest() {
     local results status=0
     results=$(mktemp)
@@ -22,10 +23,17 @@ count_tests() { # JUNIT_FILE
             if ($0 ~ /status="(notrun|disabled)"/) outcome = "skipped"
             inside = 0
             inside_failed = 0
+            explaining = 0
+            lines = 0
         }
+        { output[lines++] = $0 }
+        explaining && /^#/ { print; next }
+        { explaining = 0 }
         /(^|>)ok [0-9]+ .*# skip/ { skipped++; inside++; print "skipped: " $0; next }
         /(^|>)ok [0-9]+/ { passed++; inside++ }
-        /(^|>)not ok [0-9]+/ { failed++; inside++; inside_failed++; print "failed: " $0 }
+        /(^|>)not ok [0-9]+/ {
+            failed++; inside++; inside_failed++; explaining = 1; print "failed: " $0
+        }
         /^\[       OK \] .* \([0-9]+ ms\)$/ { passed++; inside++ }
         /: Skipped$/ { getline reason }
         /^\[  SKIPPED \] .* \([0-9]+ ms\)$/ {
@@ -36,7 +44,11 @@ count_tests() { # JUNIT_FILE
         }
         /<\/testcase>/ {
             # A program that fails without a failed test has crashed or run out of time.
-            if (outcome == "failed" && !inside_failed) { failed++; print "failed: " name }
+            if (outcome == "failed" && !inside_failed) {
+                failed++
+                print "failed: " name
+                for (i = lines > 40 ? lines - 40 : 0; i < lines; i++) print "    " output[i]
+            }
             if (inside) next
             if (outcome == "skipped") { skipped++; print "skipped: " name }
             if (outcome == "passed") passed++
