@@ -11,9 +11,9 @@ setup_file() {
 
 setup() { fresh_volume; }
 
-# A service that reads /volume1/a through a slow device, for 15 seconds.
+# A service that reads /volume1/a through a slow device, for 7 seconds.
 start_slow_warming() {
-    fragmented a 100
+    fragmented a 50
     map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
     local before
     before=$(slow_misses)

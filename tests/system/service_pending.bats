@@ -38,7 +38,7 @@ END
 }
 
 @test "a pin that is interrupted while it reads stays first and runs again" {
-    fragmented big 100
+    fragmented big 60
     map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
     local before
     before=$(jq .misses "$SLOW_DEVICE.json")

@@ -58,7 +58,11 @@ thread_is_in_call() {
 # It has written all that it has to say about what was asked of it. In this order: the receiver has
 # woken the worker before it waits.
 service_rests() { { receiver_waits || receiver_has_ended; } && worker_rests; }
-receiver_has_ended() { grep -qs '^State:.Z' "/proc/$SERVICE_PID/status"; }
+receiver_has_ended() {
+    local pid name state rest
+    # shellcheck disable=SC2034
+    read -r pid name state rest <"/proc/$SERVICE_PID/stat" && [ "$state" = Z ]
+}
 
 # The service is at rest, or comes to it, and must end with status 0.
 stop_service() {
@@ -83,7 +87,7 @@ stop_service_by() {
 service_has_ended() {
     local threads=(/proc/"$SERVICE_PID"/task/*)
     [ "${#threads[@]}" -eq 1 ] || return 1
-    [ ! -e "/proc/$SERVICE_PID" ] || grep -qs '^State:.Z' "/proc/$SERVICE_PID/status"
+    [ ! -e "/proc/$SERVICE_PID" ] || receiver_has_ended
 }
 
 # Ends what a failed test left running, and shows what it wrote.
