@@ -48,8 +48,10 @@ worker_rests() {
     thread_is_in_call "$newest" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
 }
 
-# thread_is_in_call THREAD EXPRESSION
+# The call that sleep makes.
 PAUSE_CALL='^[0-9]+ 0x0 0x0 0x'
+
+# thread_is_in_call THREAD EXPRESSION
 thread_is_in_call() {
     local call
     read -r call <"/proc/$1/syscall" && [[ $call =~ $2 ]]
