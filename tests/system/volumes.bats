@@ -66,6 +66,7 @@ END
     tool --pin-files /volume2/b --mount-path /volume2
     wait_until request_is_stored 3
     lose_cache 1
+    wait_until config_has '.requestQueue == ["3"]'
     end_pending /volume2
     wait_until queue_is_empty
     same '["/volume2"]' "$(config '.volumes | keys')"
