@@ -60,7 +60,7 @@ arm_make_kernel() {
         printf '/bin/busybox mkdir -p /dev; /bin/busybox mount -t devtmpfs devtmpfs /dev\n'
         printf '/bin/busybox mount -t ext4 /dev/vda /root\n'
         printf '/bin/busybox umount /dev\n'
-        printf 'exec /bin/busybox switch_root /root %s/tests/system/arm-init %s\n' "$TREE" "$TREE"
+        printf 'exec /bin/busybox switch_root /root %q/tests/system/arm-init %q\n' "$TREE" "$TREE"
     } >"$work/initramfs/init"
     chmod +x "$work/initramfs/init"
     (cd "$work/initramfs" && find . | cpio -o -H newc --quiet | gzip -1) >"$ARM_MACHINE/initrd.gz"
