@@ -4,6 +4,10 @@
 
 # shellcheck source=../../scripts/lib/volume.bash
 . "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+# shellcheck source=lib/wait.bash
+. "$BATS_TEST_DIRNAME/lib/wait.bash"
+# shellcheck source=lib/devices.bash
+. "$BATS_TEST_DIRNAME/lib/devices.bash"
 # shellcheck source=lib/service.bash
 . "$BATS_TEST_DIRNAME/lib/service.bash"
 # shellcheck source=lib/blocks.bash
@@ -89,29 +93,6 @@ refute() {
     fi
 }
 
-# wait_until COMMAND...: tries until it succeeds; gives up after 30 seconds.
-wait_until() {
-    local end=$((SECONDS + 30)) pause=0.02
-    until "$@"; do
-        if [ "$SECONDS" -ge "$end" ]; then
-            echo "waited too long for: $*"
-            return 1
-        fi
-        # Quick to see what happens at once; what takes longer needs the machine more than this loop.
-        pause "$pause"
-        pause=0.1
-    done
-}
-
-# pause SECONDS: without a process.
-pause() {
-    [ -n "${NEVER:-}" ] || exec {NEVER}<> <(:)
-    read -rt "$1" -u "$NEVER" || true
-}
-
-# Milliseconds since some fixed moment.
-now_ms() { echo $((${EPOCHREALTIME/./} / 1000)); }
-
 # put_config JSON: makes it the configuration file's content.
 put_config() {
     mkdir -p "${CONF%/*}"
@@ -123,29 +104,6 @@ config() { jq -c "$1" "$CONF"; }
 
 # The number by which the service knows a file: the low 32 bits.
 inode() { echo $(($(stat -c %i "$1") & 0xFFFFFFFF)); }
-
-# map_cache UUID DEVICE: from now on this cache device is the one of the space.
-map_cache() {
-    printf '{"caches":[{"spaceUuid":"%s","ssdPath":"/tmp/some-ssd","cachePath":"%s"}]}\n' \
-        "$1" "$2" >"$VESK_FLASHCACHE_CONFIG.new"
-    mv "$VESK_FLASHCACHE_CONFIG.new" "$VESK_FLASHCACHE_CONFIG"
-}
-
-# spare_device NAME SIZE [veskcachedev option...]: a cache device that no volume lies on, with SSD_SIZE
-# (16M) of cache; prints its path. With map_cache it takes the place of a volume's own.
-spare_device() {
-    local name=$1 size=$2
-    shift 2
-    mkdir -p "/tmp/$name"
-    truncate -s "$size" "/tmp/$name/backing"
-    truncate -s "${SSD_SIZE:-16M}" "/tmp/$name/ssd"
-    (
-        close_descriptors
-        volume_serve --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \
-            --ssd "/tmp/$name/ssd" "$@"
-    )
-    echo "/run/$name/cachedev"
-}
 
 # make_volume: volume_make as a test may call it.
 make_volume() { (close_descriptors && volume_make "$@"); }

@@ -13,6 +13,8 @@ setup() {
 
 send_pin() { tool --pin-files "$1" --mount-path /volume1; }
 
+thread_is_gone() { [ ! -e "/proc/$SERVICE_PID/task/$1" ]; }
+
 # receiver_ended [WAITING]: with the lines of standard input. What is sent now stays on the queue, as
 # the one message (WAITING) there, and the worker still serves what was stored before.
 receiver_ended() {
@@ -20,7 +22,6 @@ receiver_ended() {
     wait_until queue_is_empty
     wait_until receiver_has_ended
     waiting_is "${1:-1}"
-    kill -0 "$SERVICE_PID"
     stop_service
     {
         sed 's/^:/veskcachepinfiletool:/'
@@ -136,12 +137,14 @@ END
 
 @test "a request of type unknown is stored and ends the worker for good" {
     start_service
+    find_newest_thread
+    local worker=$NEWEST_THREAD
     send_record 0 /volume1 ""
     wait_until request_is_stored 0
+    wait_until thread_is_gone "$worker"
     same '{"data":null,"mountPath":"/volume1","type":"unknown"}' "$(config '.requests["0"]')"
     send_pin /volume1/a
     wait_until request_is_stored 1
-    sleep 1.2
     same '["0","1"]' "$(config .requestQueue)"
     service_said <<END
 : Can't get correct request type

@@ -22,13 +22,13 @@ setup() {
 
 teardown() {
     end_service
-    end_log
     rm -f /dev/log
 }
 
 # The log ends once it has written what was sent, which it does in its own time.
 end_log() {
     [ -n "$LOG_PID" ] || return 0
+    is_child "$LOG_PID"
     kill "$LOG_PID"
     wait "$LOG_PID"
     LOG_PID=

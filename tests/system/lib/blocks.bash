@@ -66,7 +66,8 @@ is_subset() {
 common() { comm -12 <(sort -u <<<"$1") <(sort -u <<<"$2"); }
 
 # Every cached block's slot on the SSD of volume N holds the bytes of the backing image.
-ssd_holds_the_data() {
+ssd_holds_the_data() { while_still "$1" compare_ssd "$1"; }
+compare_ssd() {
     jq '.slotBlocks[]' "$(volume_state_file "$1")" |
         awk '$1 >= 0 { printf "%d %.0f 65536\n", (NR - 1) * 65536, $1 * 65536 }' |
         "$HELPERS/system_compare" "/tmp/volume$1/ssd" "/tmp/volume$1/backing"
@@ -115,14 +116,15 @@ fragmented_apart() {
 # The files are all that is pinned on volume 1: in the bitmap file, in the driver, in the records,
 # and their written blocks on the SSD.
 check_pinned() {
-    local file blocks written records=
+    local file blocks written pinned records=
     blocks=$(blocks_of "$@")
     written=$(written_blocks_of "$@")
     [ -n "$blocks" ]
     same "$blocks" "$(bitmap_blocks 1)"
     same "$blocks" "$(driver_blocks 1)"
-    is_subset "$written" "$(pinned_blocks 1)"
-    is_subset "$(pinned_blocks 1)" "$blocks"
+    pinned=$(pinned_blocks 1)
+    is_subset "$written" "$pinned"
+    is_subset "$pinned" "$blocks"
     ssd_holds_the_data 1
     for file in "$@"; do
         device_holds_the_file 1 "$file"

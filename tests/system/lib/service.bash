@@ -37,15 +37,23 @@ service_is_ready() {
 # The receiver, the first thread, waits for a message: only there is a record's size, 1540 bytes.
 receiver_waits() { thread_is_in_call "$SERVICE_PID" ' 0x604 '; }
 
+# What was sent is off the queue and dealt with. In this order: a message is off the queue before it is
+# dealt with.
+messages_are_taken() { waiting_is 0 && receiver_waits; }
+
 # The worker waits for a request or in a pause. It is the thread made last; where it has ended that is
 # the one that waits for signals.
 worker_rests() {
-    local task newest=0
+    find_newest_thread
+    thread_is_in_call "$NEWEST_THREAD" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
+}
+find_newest_thread() {
+    local task
+    NEWEST_THREAD=0
     for task in /proc/"$SERVICE_PID"/task/*; do
         task=${task##*/}
-        [ "$task" -lt "$newest" ] || newest=$task
+        [[ $task == *[!0-9]* || $task -lt $NEWEST_THREAD ]] || NEWEST_THREAD=$task
     done
-    thread_is_in_call "$newest" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
 }
 
 # The call that sleep makes.
@@ -75,6 +83,10 @@ stop_service() {
 # stop_service_by SIGNAL
 stop_service_by() {
     local status=0
+    is_child "$SERVICE_PID" || {
+        echo "the service has ended before"
+        return 1
+    }
     kill -s "$1" "$SERVICE_PID"
     wait_until service_has_ended
     wait "$SERVICE_PID" || status=$?
@@ -92,18 +104,34 @@ service_has_ended() {
     [ ! -e "/proc/$SERVICE_PID" ] || receiver_has_ended
 }
 
-# Ends what a failed test left running, and shows what it wrote.
+# is_child PID: a process that this shell has started and not yet waited for. Only such a one gets a
+# signal: any other number may be somebody else's by now.
+is_child() {
+    local pid name state parent rest
+    # shellcheck disable=SC2034
+    [ -n "${1:-}" ] && read -r pid name state parent rest 2>/dev/null <"/proc/$1/stat" &&
+        [ "$parent" = "$BASHPID" ]
+}
+
+# Ends what a failed test left running, and shows what the service wrote.
 end_service() {
-    if [ -n "${SERVICE_PID:-}" ]; then
-        kill -s TERM "$SERVICE_PID" 2>/dev/null || true
-        sleep 0.1
-        kill -s KILL "$SERVICE_PID" 2>/dev/null || true
-        wait "$SERVICE_PID" 2>/dev/null || true
-        SERVICE_PID=
+    release_device
+    if is_child "${SERVICE_PID:-}"; then
+        kill -s TERM "$SERVICE_PID"
+        PATIENCE=10 wait_until service_has_ended || true
     fi
+    SERVICE_PID=
+    end_children
     # Shown by bats where the test has failed.
     [ ! -e "$SERVICE_LOG" ] || tail -n 40 "$SERVICE_LOG"
     rm -f "$SERVICE_LOG"
+}
+end_children() {
+    local pid
+    for pid in $(jobs -p); do
+        ! is_child "$pid" || kill -s KILL "$pid"
+        wait "$pid" 2>/dev/null || true
+    done
 }
 
 # The service is to be stopped, having written exactly the lines of standard input, ":" as in
@@ -117,11 +145,13 @@ service_said() {
 
 # What is asked again and again is read from the document's text, without a process.
 
-# Sets NEXT_NUMBER, the number that the next request will get, and QUEUE, the queue as it is written.
+# Sets NEXT_NUMBER, the number that the next request will get, QUEUE, the queue as it is written, and
+# HAS_DOCUMENT, all of one moment.
 look_at_requests() {
     local text='' rest
-    NEXT_NUMBER=0 QUEUE=
+    NEXT_NUMBER=0 QUEUE='' HAS_DOCUMENT=
     [ ! -e "$CONF" ] || IFS= read -rd '' text <"$CONF" || true
+    [ -z "$text" ] || HAS_DOCUMENT=yes
     [[ ! $text =~ \"nextRequestNum\"[[:space:]]*:[[:space:]]*([0-9]+) ]] ||
         NEXT_NUMBER=${BASH_REMATCH[1]}
     [[ $text =~ \"requestQueue\"[[:space:]]*:[[:space:]]*\[ ]] || return 0
@@ -141,7 +171,7 @@ request_is_done() {
 config_has() { jq -e "$1" "$CONF" >/dev/null 2>&1; }
 queue_is_empty() {
     look_at_requests
-    [ -e "$CONF" ] && [[ $QUEUE != *[0-9]* ]]
+    [ -n "$HAS_DOCUMENT" ] && [[ $QUEUE != *[0-9]* ]]
 }
 
 # join FILE...: the form of the files argument.
