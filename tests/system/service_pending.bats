@@ -18,7 +18,19 @@ setup() {
 }
 
 send_pin() { tool --pin-files "$1/$2" --mount-path "$1"; }
-misses_are_above() { [ "$(jq .misses "$SLOW_DEVICE.json")" -gt "$1" ]; }
+
+# hold_at_reading COMMAND...: from now on the cache device of volume 1 is a slow one; the request that the
+# command sends is held where it reads from there.
+hold_at_reading() {
+    local before
+    map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
+    look_at_device "$SLOW_DEVICE"
+    before=$MISSES
+    start_service
+    "$@"
+    wait_until misses_are_above "$SLOW_DEVICE" "$before"
+    hold_device "$SLOW_DEVICE"
+}
 
 @test "the requests of a pending volume wait in their place while another volume's run" {
     start_service
@@ -39,16 +51,14 @@ END
 
 @test "a pin that is interrupted while it reads stays first and runs again" {
     fragmented big 60
-    map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
-    local before
-    before=$(jq .misses "$SLOW_DEVICE.json")
-    start_service
-    send_pin /volume1 big
-    wait_until misses_are_above $((before + 2))
-    send_pin /volume1 a
+    hold_at_reading send_pin /volume1 big
+    # Not by a client, which would ask the device.
+    send_record 1 /volume1 /volume1/a
     set_pending /volume1
+    wait_until messages_are_taken
     # The bitmap was written and sent before the reading began.
     same "$(blocks_of big)" "$(bitmap_blocks 1)"
+    release_device
     wait_until worker_rests
     same '["0","1"]' "$(config .requestQueue)"
     same null "$(config .volumes)"
@@ -67,13 +77,10 @@ END
     # Every other block of the first 256.
     { printf 'U%.0s' {1..32} && head -c 96 /dev/zero; } >"$(bitmap_file 1)"
     sync "$(bitmap_file 1)"
-    map_cache "$(volume_uuid 1)" "$SLOW_DEVICE"
-    local before
-    before=$(jq .misses "$SLOW_DEVICE.json")
-    start_service
-    tool --reload-blocks --mount-path /volume1
-    wait_until misses_are_above $((before + 2))
+    hold_at_reading tool --reload-blocks --mount-path /volume1
     set_pending /volume1
+    wait_until messages_are_taken
+    release_device
     wait_until worker_rests
     same '["0"]' "$(config .requestQueue)"
     volume_configure
