@@ -15,7 +15,7 @@ setup() {
 
 teardown() {
     end_service
-    ! mountpoint -q /volume1/ro || umount -l /volume1/ro
+    ! mountpoint -q "${CONF%/*}" || umount "${CONF%/*}"
     mount -o remount,rw /volume1
 }
 
