@@ -38,10 +38,10 @@ idle() {
     service_rests && CONF=$CONFIG look_at_requests && [[ $QUEUE != *[0-9]* ]]
 }
 END
-        echo ". '$BATS_TEST_DIRNAME/lib/service.bash'"
+        printf '. %q\n' "$BATS_TEST_DIRNAME/lib/service.bash"
         script_of "$BATS_TEST_DIRNAME/../../docs/operations.md"
     } >/tmp/operations.sh
-    PATH=$BIN:$PATH timeout 120 bash /tmp/operations.sh >/tmp/operations.log 2>&1 3>&- || {
+    PATH=$BIN:$PATH timeout $((2 * PATIENCE)) bash /tmp/operations.sh >/tmp/operations.log 2>&1 3>&- || {
         cat /tmp/operations.log
         return 1
     }

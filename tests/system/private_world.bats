@@ -15,8 +15,8 @@ write_program() {
     PROGRAM=$BATS_TEST_TMPDIR/program
     cat >"$PROGRAM" <<END
 set -e
-BIN=$BIN
-. "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+BIN=$(printf %q "$BIN")
+. $(printf %q "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash")
 volume_device() { echo "/run/$ID/cachedev_\$1"; }
 volume_make 1 64M 16M ext4
 echo ready
@@ -30,7 +30,8 @@ start_world() {
     : >"$BATS_TEST_TMPDIR/log"
     (
         close_descriptors
-        exec "$WORLD" bash "$PROGRAM"
+        # Whoever has started the tests may ignore signals, and then all that they start would.
+        exec /usr/bin/env --default-signal=HUP,TERM "$WORLD" bash "$PROGRAM"
     ) >"$BATS_TEST_TMPDIR/log" 2>&1 &
     WORLD_PID=$!
     wait_until grep -q ready "$BATS_TEST_TMPDIR/log"
@@ -38,9 +39,7 @@ start_world() {
     loop_devices_of_world
 }
 
-teardown() {
-    [ -z "${WORLD_PID:-}" ] || kill -KILL "$WORLD_PID" 2>/dev/null || true
-}
+teardown() { end_children; }
 
 # Of the whole machine, whose nodes this world need not have.
 loop_devices_of_world() {
@@ -62,12 +61,12 @@ nothing_is_left() {
 # end_world SIGNAL STATUS: the world ends so, and the machine can still write back everything.
 end_world() {
     local status=0
+    is_child "$WORLD_PID"
     kill -s "$1" "$WORLD_PID"
     wait "$WORLD_PID" || status=$?
-    WORLD_PID=
     same "$2" "$status"
     wait_until nothing_is_left
-    timeout 20 sync
+    timeout "$PATIENCE" sync
 }
 
 @test "nothing is left after kill -9, with a volume being written to" {
@@ -105,38 +104,50 @@ end_world() {
     sed -i 's/^while.*/kill -KILL "$(volume_state 1 pid)"; ls \/volume1 >\/dev\/null || true/' "$PROGRAM"
     same ready "$("$WORLD" bash "$PROGRAM")"
     wait_until nothing_is_left
-    timeout 20 sync
+    timeout "$PATIENCE" sync
 }
 
 @test "two worlds at once have each their own volume 1, their own queue and their own log" {
     write_program
     cat >"$PROGRAM" <<END
 set -e
-BIN=$BIN
-. "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+BIN=$(printf %q "$BIN")
+. $(printf %q "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash")
+# Where both worlds have come so far.
+meet() {
+    : >"\$1.\$2"
+    until [ -e "\$1.1" ] && [ -e "\$1.2" ]; do sleep 0.1; done
+}
 volume_make 1 64M 16M ext4
 echo "\$1" >/volume1/name
-"$BIN/veskcachepinfiletool" --reload-blocks --mount-path /volume1
-# Both are there now.
-for i in \$(seq \$1); do "$BIN/veskcachepinfiletool" --reload-blocks --mount-path /volume1; done
-sleep 0.5
+"\$BIN/veskcachepinfiletool" --reload-blocks --mount-path /volume1
+meet made "\$1"
+for i in \$(seq \$1); do "\$BIN/veskcachepinfiletool" --reload-blocks --mount-path /volume1; done
+meet sent "\$1"
 cat /volume1/name
 awk 'NR > 1 { print \$5 }' /proc/sysvipc/msg
 ls -A /dev/log 2>/dev/null || echo none
 END
-    "$WORLD" bash "$PROGRAM" 1 >"$BATS_TEST_TMPDIR/one" &
+    (
+        close_descriptors
+        exec "$WORLD" bash "$PROGRAM" 1
+    ) >"$BATS_TEST_TMPDIR/one" &
     local one=$!
-    "$WORLD" bash "$PROGRAM" 2 >"$BATS_TEST_TMPDIR/two"
+    timeout "$PATIENCE" "$WORLD" bash "$PROGRAM" 2 >"$BATS_TEST_TMPDIR/two"
     wait "$one"
     same $'1\n2\nnone' "$(cat "$BATS_TEST_TMPDIR/one")"
     same $'2\n3\nnone' "$(cat "$BATS_TEST_TMPDIR/two")"
 }
 
+# The first two folders of a path: a world sees what leads to this tree and to where it is called in.
+way_to() { cut -d/ -f1-3 <<<"$1"; }
+
 @test "what a world writes below /run, /tmp, /dev and the volumes stays in it" {
     # shellcheck disable=SC2016
     "$WORLD" sh -c 'for f in /run /tmp /dev /dev/shm /volume1 /volume2; do : >$f/from-the-world; done'
     same "" "$(ls -d /run/from-* /tmp/from-* /dev/from-* /dev/shm/from-* /volume?/from-* 2>/dev/null)"
-    same "" "$("$WORLD" sh -c 'cd /run && ls -A; cd /tmp && ls -A; cd /volume1 && ls -A' | grep -v '^mount$')"
+    same "" "$("$WORLD" sh -c 'ls -d /run/* /run/.[!.]* /tmp/* /tmp/.[!.]* /volume1/* 2>/dev/null' |
+        grep -vxF -e /run/mount -e "$(way_to "$(readlink -f "$BATS_TEST_DIRNAME")")" -e "$(way_to "$PWD")")"
 }
 
 @test "the command's status and arguments come through" {
@@ -158,8 +169,15 @@ missing() {
 }
 
 @test "without root, FUSE or loop devices it says so and ends with 77" {
+    # In a place that everybody can reach; the tree's may not be one.
+    local copy=/tmp/of-everybody
+    mkdir -p "$copy/scripts/lib" "$copy/tests/system"
+    cp "$WORLD" "$copy/scripts/lib/"
+    cp "$RUN_BATS" "$copy/tests/system/"
+    chmod -R a+rX "$copy"
+    cd "$copy"
     missing "root is needed (namespaces, mounts, loop devices)" \
-        setpriv --reuid=65534 --clear-groups "$WORLD" true
+        setpriv --reuid=65534 --clear-groups scripts/lib/private-world true
     # shellcheck disable=SC2016
     missing "/dev/fuse is missing: this kernel has no FUSE" \
         unshare --mount sh -c 'mount -t tmpfs tmpfs /dev && mknod /dev/null c 1 3 &&
@@ -169,7 +187,7 @@ missing() {
         unshare --mount sh -c 'mount -t tmpfs tmpfs /dev && mknod /dev/fuse c 10 229 &&
             mknod /dev/null c 1 3 && exec "$0" true' "$WORLD"
     missing "root is needed (namespaces, mounts, loop devices)" \
-        setpriv --reuid=65534 --clear-groups "$RUN_BATS" "$BATS_TEST_FILENAME"
+        setpriv --reuid=65534 --clear-groups tests/system/run-bats "$BATS_TEST_FILENAME"
 }
 
 @test "run-bats tells passed, failed and skipped files apart" {
