@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <cstdio>
 #include <cstdlib>
 #include <dirent.h>
 #include <fcntl.h>
@@ -29,6 +30,7 @@ const char outputPath[] = "/run/faults/output";
 const char reportPath[] = "/run/faults/report";
 const int reportFd = 9;
 const int pollMicroseconds = 2000;
+const std::chrono::minutes hang(5); // nothing here takes that long, also where all is slow
 
 void Redirect(const char *path, int fd) {
     const int opened = open(path, O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0600);
@@ -89,6 +91,10 @@ Child::Child(const Program &program, const std::vector<std::string> &arguments, 
     if (pid_ == 0) {
         Become(program, arguments, fault);
     }
+    if (pid_ < 0) {
+        perror("fork");
+        exit(1); // -1 would be everybody, for a signal
+    }
 }
 
 Child::~Child() {
@@ -136,7 +142,7 @@ bool Child::IsQuiet() const {
 }
 
 bool Child::AwaitQuiet() const {
-    const Clock::time_point end = Clock::now() + std::chrono::minutes(5);
+    const Clock::time_point end = Clock::now() + hang;
     while (!HasEnded() && Clock::now() < end) {
         if (IsQuiet()) {
             return true;
@@ -162,11 +168,13 @@ long Child::MemoryKiB() const {
 }
 
 void Child::Signal(int number) const {
-    kill(pid_, number);
+    if (pid_ > 0) {
+        kill(pid_, number);
+    }
 }
 
 int Child::AwaitEnd() {
-    const Clock::time_point end = Clock::now() + std::chrono::seconds(30);
+    const Clock::time_point end = Clock::now() + hang;
     while (!HasEnded() && Clock::now() < end) {
         usleep(pollMicroseconds / 4);
     }

@@ -24,10 +24,10 @@ public:
     // The lowest number seen in some looks: requests open and close their own. Looks longer while
     // there are more than `enough`.
     int Descriptors(int enough) const;
-    long MemoryKiB() const; // resident
-    void Signal(int number) const;
-    // Exit status, 128 + the signal, or -1 when it has not ended within half a minute; it is
-    // killed then.
+    long MemoryKiB() const;        // resident
+    void Signal(int number) const; // nothing once AwaitEnd has told its status
+    // Exit status, 128 + the signal, or -1 when it has not ended within five minutes; it is killed
+    // then.
     int AwaitEnd();
     bool FaultReached() const;
     long LiveAllocations() const; // at its orderly end; 0 where there was none

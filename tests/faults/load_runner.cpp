@@ -63,7 +63,7 @@ void MakeFiles(long files) {
 // Ten minutes for what takes seconds.
 bool AwaitStored(long requests) {
     for (int i = 0; i < 60000; ++i) {
-        if (WorldIsIdle(config) && WorldNextNumber(config) == requests + 1) {
+        if (WorldIsIdle(config, requests + 1)) {
             return true;
         }
         usleep(10000);
@@ -130,6 +130,7 @@ int Fail(const std::string &what) {
 }
 
 void Look(const Child &service, Figures *figures) {
+    service.AwaitQuiet(); // a request opens files and has the document in memory until its end
     figures->memoryEnd = service.MemoryKiB();
     figures->descriptorsEnd =
         service.Descriptors(figures->rounds <= 2 ? INT_MAX : figures->descriptors);

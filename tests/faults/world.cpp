@@ -70,6 +70,12 @@ void Send(const std::vector<char> &messages) {
     }
 }
 
+long NextNumberIn(const std::string &text) {
+    const std::string key = "\"nextRequestNum\" : ";
+    const size_t at = text.find(key);
+    return at == std::string::npos ? 0 : strtol(text.c_str() + at + key.size(), nullptr, 10);
+}
+
 } // namespace
 
 std::string WorldDocument() {
@@ -152,16 +158,17 @@ std::string WorldComplaint(const std::string &text) {
 }
 
 long WorldNextNumber(const char *config) {
-    const std::string key = "\"nextRequestNum\" : ";
-    const std::string text = WorldRead(config);
-    const size_t at = text.find(key);
-    return at == std::string::npos ? 0 : strtol(text.c_str() + at + key.size(), nullptr, 10);
+    return NextNumberIn(WorldRead(config));
 }
 
-bool WorldIsIdle(const char *config) {
+bool WorldIsIdle(const char *config, long next) {
+    // The queue first: what is not there any more is then in the document or on its way to it,
+    // which shows by the number.
+    const bool allTaken = WorldMessagesLeft() == 0;
     const std::string text = WorldRead(config);
-    return WorldMessagesLeft() == 0 && (text.find("\"requestQueue\" : null") != std::string::npos ||
-                                        text.find("\"requestQueue\"") == std::string::npos);
+    return allTaken && NextNumberIn(text) == next &&
+           (text.find("\"requestQueue\" : null") != std::string::npos ||
+            text.find("\"requestQueue\"") == std::string::npos);
 }
 
 std::string WorldRead(const std::string &path) {

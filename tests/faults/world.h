@@ -22,8 +22,9 @@ void WorldAwaitQueue();
 
 long WorldRecords(const char *config); // pinned files of /volume1 in the document
 
-// Nothing is queued, neither as a message nor in the document.
-bool WorldIsIdle(const char *config);
+// Nothing is queued, neither as a message nor in the document, and the next request will get the
+// number `next`. While a service runs this also tells that all that was sent before is carried out.
+bool WorldIsIdle(const char *config, long next);
 long WorldNextNumber(const char *config); // the number that the next request will get
 
 // What is wrong with a document: it must be one, and every queued number must have its request and
