@@ -4,17 +4,16 @@ zmodload zsh/zpty
 folder=$1
 shift
 for line in "$@"; do
-    zpty shell "TERM=dumb VESK_MOUNTS=$PWD/mounts zsh -f -i"
-    zpty -w shell "PS1=; bindkey -e; setopt no_zle_bracketed_paste 2>/dev/null; fpath=($folder \$fpath)"
-    zpty -w shell "autoload -U compinit; compinit -u -D; print read''y"
+    zpty shell "TERM=dumb VESK_MOUNTS=${(q)PWD}/mounts zsh -f -i"
+    zpty -w shell "PS1=; bindkey -e; setopt no_zle_bracketed_paste 2>/dev/null; fpath=(${(qq)folder} \$fpath)"
+    zpty -w shell "autoload -U compinit; compinit -u -D"
+    # What the tab key does, and then the line is shown without a blank at its end, between words that stand
+    # nowhere else.
+    zpty -w shell "complete-and-show() { zle expand-or-complete; print -r -- beg''in\"<\${BUFFER% }>\"e''nd; }"
+    zpty -w shell "zle -N complete-and-show; bindkey '^I' complete-and-show; print read''y"
     zpty -r -m shell answer '*ready*'
-    # The completed line is turned into one that prints itself.
     zpty -w -n shell "veskcachepinfiletool $line"$'\t'
-    sleep 2
-    zpty -w -n shell $'\C-aprint -r -- "<\C-e>"\n'
-    zpty -r -m shell answer '*<*>*'
-    sleep 0.2
-    while zpty -r -t shell more; do answer+=$more; done
+    zpty -r -m shell answer '*begin<*>end*'
     print -r -- "$answer"
     zpty -d shell
 done

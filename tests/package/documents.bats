@@ -49,7 +49,7 @@ complete_line() { # WORD...: what bash would offer for the last word
     run timeout 0.5 bash -c "$wait"
     [ "$status" -eq 124 ]
     echo 1 >"$key"
-    timeout 60 bash -c "$wait"
+    timeout 120 bash -c "$wait"
     rm "$key"
 }
 
@@ -84,7 +84,7 @@ complete_line() { # WORD...: what bash would offer for the last word
     touch film1
     printf '%s\n' "/dev/sdb /volume1 ext4 rw 0 0" >mounts
     # A terminal of zsh's own, into which a person's keys go.
-    run zsh -f "$BATS_TEST_DIRNAME/complete.zsh" "$PACKAGING/completions" "--support-p" \
+    run timeout 120 zsh -f "$BATS_TEST_DIRNAME/complete.zsh" "$PACKAGING/completions" "--support-p" \
         "--mount-path /vol" "--pin-files x\;fi"
     echo "$output"
     [[ "$output" == *"<veskcachepinfiletool --support-pin>"* ]]
