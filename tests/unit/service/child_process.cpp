@@ -2,19 +2,23 @@
 
 #include "support/fake_libc.h"
 #include "support/temp_dir.h"
+#include "support/thread_state.h"
 
 #include "cli/log.h"
 
+#include <algorithm>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <fcntl.h>
+#include <filesystem>
 #include <pthread.h>
 #include <regex>
 #include <sstream>
 #include <sys/prctl.h>
 #include <sys/wait.h>
+#include <thread>
 #include <unistd.h>
 
 // Writes the counts of a build that measures coverage; only such a build has it.
@@ -24,8 +28,11 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
+const int stretched = 100;
+
+// Not usleep(), whose time tests stretch.
 void PauseBriefly() {
-    usleep(1000);
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
 }
 
 void StuffPipe(int fd) {
@@ -71,6 +78,7 @@ void *RunBody(void *argument) {
     LogLevel = setup.logLevel;
     ProgramName = "tool";
     FakeLibc::onSleep = PauseBriefly;
+    FakeLibc::alarmFactor = setup.stuffedPipe ? 1 : stretched;
     at_quick_exit(WriteCoverage);
 
     sigset_t all;
@@ -101,6 +109,9 @@ ChildProcess::ChildProcess(const Setup &setup, const std::function<int()> &body)
     }
     fflush(stdout);
     pid_ = fork();
+    if (pid_ < 0) {
+        abort(); // a signal to -1 would go to everybody
+    }
     if (pid_ == 0) {
         RunChild(ends[1], setup, body);
     }
@@ -118,22 +129,25 @@ ChildProcess::~ChildProcess() {
 }
 
 void ChildProcess::Signal(int number) const {
-    kill(pid_, number);
+    if (!ended_) { // or its number may be another's by now
+        kill(pid_, number);
+    }
 }
 
 int ChildProcess::AwaitEnd(std::chrono::milliseconds limit) {
     const Clock::time_point end = Clock::now() + limit;
-    for (;;) {
+    while (!ended_) {
         int status = 0;
         if (waitpid(pid_, &status, WNOHANG) == pid_) {
             ended_ = true;
-            return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
-        }
-        if (Clock::now() > end) {
+            result_ = WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+        } else if (Clock::now() > end) {
             return -1;
+        } else {
+            PauseBriefly();
         }
-        PauseBriefly();
     }
+    return result_;
 }
 
 bool ChildProcess::Runs() {
@@ -156,6 +170,15 @@ bool ChildProcess::Catches(int number) const {
     const size_t place = status.find("SigCgt:");
     const char *mask = place == std::string::npos ? "" : status.c_str() + place + 7;
     return (strtoull(mask, nullptr, 16) >> (number - 1) & 1) != 0;
+}
+
+bool ChildProcess::Sleeps() const {
+    std::error_code gone;
+    const std::filesystem::directory_iterator threads("/proc/" + std::to_string(pid_) + "/task",
+                                                      gone);
+    return std::all_of(begin(threads), end(threads), [this](const auto &entry) {
+        return ThreadSleeps(pid_, std::stoi(entry.path().filename()));
+    });
 }
 
 void ChildProcess::ReadOutput() {

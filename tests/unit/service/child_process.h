@@ -1,8 +1,9 @@
 // A part of a test in a process of its own, with its standard output in a pipe: for what ends the
 // process or changes its signals.
 //
-// Messages go to standard output; pauses last a millisecond. The child is killed when the object
-// goes or the test program does.
+// Messages go to standard output; pauses last a millisecond. The limit that the tool sets to its
+// own end is stretched, unless the child cannot end otherwise: what ends orderly is then seen to,
+// however busy the machine is. The child is killed when the object goes or the test program does.
 #ifndef TESTS_SERVICE_CHILD_PROCESS_H
 #define TESTS_SERVICE_CHILD_PROCESS_H
 
@@ -34,7 +35,7 @@ class ChildProcess {
 public:
     struct Setup {
         int logLevel = 1;
-        bool stuffedPipe = false;  // the pipe is full before the child starts
+        bool stuffedPipe = false;  // the pipe is full before the child starts; real limit
         bool lineBuffered = false; // else its output comes in blocks, or at its end
     };
     // Runs `body` on a thread of the child; the child's exit status is what it returns. When it
@@ -49,7 +50,7 @@ public:
 
     // The exit status, 128 + the number of the signal that ended it, or -1 where it has not ended
     // within this time.
-    int AwaitEnd(std::chrono::milliseconds limit = std::chrono::seconds(10));
+    int AwaitEnd(std::chrono::milliseconds limit = std::chrono::seconds(30));
 
     // Whether it still runs.
     bool Runs();
@@ -58,6 +59,8 @@ public:
     static bool Await(const std::function<bool()> &condition);
     // Whether the child has a handler for this signal.
     bool Catches(int number) const;
+    // Whether all its threads wait for something.
+    bool Sleeps() const;
 
     // Whether it writes this text within half a minute.
     bool AwaitOutput(const std::string &text);
@@ -71,6 +74,7 @@ private:
     pid_t pid_ = -1;
     int output_ = -1;
     bool ended_ = false;
+    int result_ = -1; // of AwaitEnd, once it has ended
     std::string text_;
 };
 

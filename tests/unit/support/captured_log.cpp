@@ -9,6 +9,14 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+std::string FirstOf(const std::vector<std::string> &texts) {
+    return texts.empty() ? "(none)" : texts.front();
+}
+
+std::string LastOf(const std::vector<std::string> &texts) {
+    return texts.empty() ? "(none)" : texts.back();
+}
+
 CapturedLog::CapturedLog(int level) {
     fflush(stdout);
     savedStdout_ = dup(STDOUT_FILENO);

@@ -8,6 +8,10 @@
 #include <string>
 #include <vector>
 
+// The first and the last of some texts; "(none)" of none.
+std::string FirstOf(const std::vector<std::string> &texts);
+std::string LastOf(const std::vector<std::string> &texts);
+
 class CapturedLog {
 public:
     explicit CapturedLog(int level = 1);

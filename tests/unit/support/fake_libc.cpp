@@ -11,9 +11,12 @@
 #include <mutex>
 #include <pthread.h>
 #include <sys/stat.h>
+#include <sys/time.h>
 #include <sys/types.h>
 
 int FakeLibc::sleeps = 0;
+int FakeLibc::alarmFactor = 1;
+int FakeLibc::pauseFactor = 1;
 int FakeLibc::syncs = 0;
 std::function<void()> FakeLibc::onSleep;
 std::function<void()> FakeLibc::onSync;
@@ -83,6 +86,8 @@ template <typename Function> Function Real(const char *name) {
 
 void FakeLibc::Reset() {
     sleeps = 0;
+    alarmFactor = 1;
+    pauseFactor = 1;
     syncs = 0;
     onSleep = nullptr;
     onSync = nullptr;
@@ -142,6 +147,22 @@ unsigned sleep(unsigned /*seconds*/) {
         FakeLibc::onSleep();
     }
     return 0;
+}
+
+int usleep(useconds_t microseconds) {
+    static const auto real = Real<int (*)(useconds_t)>("usleep");
+    return real(microseconds * static_cast<useconds_t>(FakeLibc::pauseFactor));
+}
+
+int setitimer(__itimer_which_t which, const itimerval *value, itimerval *old) noexcept {
+    static const auto real =
+        Real<int (*)(__itimer_which_t, const itimerval *, itimerval *)>("setitimer");
+    const long long microseconds =
+        (value->it_value.tv_sec * 1000000LL + value->it_value.tv_usec) * FakeLibc::alarmFactor;
+    itimerval later = *value;
+    later.it_value.tv_sec = static_cast<time_t>(microseconds / 1000000);
+    later.it_value.tv_usec = static_cast<suseconds_t>(microseconds % 1000000);
+    return real(which, &later, old);
 }
 
 void sync() noexcept {

@@ -19,6 +19,11 @@ struct FakeLibc {
     static int sleeps;
     static std::function<void()> onSleep;
 
+    // What setitimer() sets comes, and what usleep() waits takes, this many times later: a busy
+    // machine needs more time than the tool gives itself.
+    static int alarmFactor;
+    static int pauseFactor;
+
     static int syncs; // sync() only counts
     static std::function<void()> onSync;
 
