@@ -69,7 +69,7 @@ bool ServiceLockIsFree() {
         ServiceUnlock();
         taken->set_value();
     });
-    if (result.wait_for(std::chrono::seconds(10)) != std::future_status::ready) {
+    if (result.wait_for(std::chrono::seconds(30)) != std::future_status::ready) {
         other.detach(); // it may wait for ever
         return false;
     }

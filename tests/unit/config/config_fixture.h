@@ -24,7 +24,7 @@ Json::Value ParseDocument(const std::string &text);
 // A request record with NUL-terminated texts.
 RequestRecord MakeRecord(int type, const std::string &mountPath, const std::string &data = "");
 
-// Whether nobody holds the service lock. (A lock that is held is waited for, for a second.)
+// Whether nobody holds the service lock. (One that is held is waited for, for half a minute.)
 bool ServiceLockIsFree();
 
 class ConfigTest : public LeakCheckedTest {

@@ -3,6 +3,7 @@
 #define TESTS_SERVICE_RECEIVER_FIXTURE_H
 
 #include "service/queue_fixture.h"
+#include "support/thread_state.h"
 
 #include "config/request_type.h"
 #include "service/message_queue.h"
@@ -47,13 +48,9 @@ protected:
     }
     // Until the receiver has logged this and then sleeps: it can only wait for the service lock.
     static void AwaitAtLock(CapturedLog &log, const std::string &message) {
-        while (!log.Has(message) || !Sleeps(receiverThread_)) {
+        while (!log.Has(message) || !ThreadSleeps(getpid(), receiverThread_)) {
             sched_yield();
         }
-    }
-    static bool Sleeps(pid_t thread) {
-        const std::string status = ReadWhole("/proc/self/task/" + std::to_string(thread) + "/stat");
-        return status.rfind(") S") != std::string::npos;
     }
     static inline std::atomic<pid_t> receiverThread_{0};
 

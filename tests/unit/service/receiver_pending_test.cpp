@@ -66,7 +66,7 @@ TEST_F(ReceiverPendingTest, ASpaceThatLeavesTheListMeanwhileStopsIt) {
     EXPECT_TRUE(
         log.Has("ServiceRemovePendingSpaceAtomic() [N] : ***** Space (/volume1) is not pending"));
     EXPECT_TRUE(log.Has("GetRequests() [N] : ***** Remove pending space error"));
-    EXPECT_EQ(log.Messages().back(), "GetRequests() [N] : -----");
+    EXPECT_EQ(LastOf(log.Messages()), "GetRequests() [N] : -----");
 }
 
 TEST_F(ReceiverPendingTest, ASpaceThatEntersTheListMeanwhileStopsIt) {
@@ -82,7 +82,7 @@ TEST_F(ReceiverPendingTest, ASpaceThatEntersTheListMeanwhileStopsIt) {
         adding = static_cast<pid_t>(syscall(SYS_gettid));
         ServiceAddPendingSpaceAtomic(&path[0]);
     });
-    while (adding == 0 || !Sleeps(adding)) {
+    while (adding == 0 || !ThreadSleeps(getpid(), adding)) {
         sched_yield();
     }
     std::thread receiver([this] { RunReceiver(); });

@@ -3,13 +3,14 @@
 #include "support/captured_log.h"
 #include "support/leak_checked_test.h"
 #include "support/messages_of.h"
+#include "support/thread_state.h"
 
 #include <atomic>
 #include <cerrno>
-#include <chrono>
-#include <future>
 #include <string>
+#include <sys/syscall.h>
 #include <thread>
+#include <unistd.h>
 #include <vector>
 
 namespace {
@@ -112,14 +113,18 @@ TEST_F(ServiceStateTest, AddingTwiceFailsAndKeepsTheLock) {
     EXPECT_EQ(Add("/volume1"), -1);
     EXPECT_EQ(log.Messages(), Messages{"Space (/volume1) is already pending"});
     EXPECT_TRUE(ServiceIsPendingSpace("/volume1")); // asks for no lock
-    std::promise<void> taken;
-    std::thread other([&taken] {
+    std::atomic<pid_t> thread{0};
+    std::atomic<bool> taken{false};
+    std::thread other([&] {
+        thread = static_cast<pid_t>(syscall(SYS_gettid));
         ServiceLock();
-        taken.set_value();
+        taken = true;
         ServiceUnlock();
     });
-    EXPECT_EQ(taken.get_future().wait_for(std::chrono::milliseconds(20)),
-              std::future_status::timeout);
+    while (!taken && (thread == 0 || !ThreadSleeps(getpid(), thread))) {
+        std::this_thread::yield();
+    }
+    EXPECT_FALSE(taken);
     GiveBackWhatTheAdditionKept();
     other.join();
 }
