@@ -95,7 +95,8 @@ void Writer(Stress &stress, size_t part) {
 void Requester(Stress &stress, unsigned seed) {
     std::mt19937 random(seed);
     std::vector<SectorRange> ranges(kRangeListRecords);
-    while (!stress.stop) {
+    // At least so often that each kind has had its turn, however busy the machine is.
+    for (int i = 0; i < kRounds || !stress.stop; ++i) {
         std::vector<uint8_t> bitmap(kDeviceBytes >> kBitmapShift);
         for (uint8_t &byte : bitmap) {
             byte = static_cast<uint8_t>(1U << (random() % 16)); // every other one is 0

@@ -6,15 +6,15 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <cerrno>
 #include <csignal>
-#include <cstdlib>
 #include <dirent.h>
 #include <memory>
 #include <sys/ioctl.h>
+#include <sys/mman.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 namespace {
@@ -28,13 +28,54 @@ bool IsFolderEmpty() {
     return entries == 2;
 }
 
+constexpr size_t kClients = 4;
+
+// How many rounds each client has done, in memory that they share with the test.
+struct Rounds {
+    using Count = std::atomic<unsigned>;
+    Count *done = static_cast<Count *>(mmap(nullptr, kClients * sizeof(Count),
+                                            PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1,
+                                            0)); // all 0
+    Rounds() = default;
+    ~Rounds() { munmap(done, kClients * sizeof(Count)); }
+    Rounds(const Rounds &) = delete;
+    Rounds &operator=(const Rounds &) = delete;
+};
+
+[[noreturn]] void UseDaemonWithoutEnd(uint8_t bitmapByte, Rounds::Count &rounds) {
+    const TestFd device(kDaemonDevice, O_RDWR | O_DIRECT);
+    const std::vector<uint8_t> bitmap(128, bitmapByte);
+    for (unsigned i = 0;; ++i) {
+        DaemonSetBitmap(bitmap);
+        TestReadAt(device.fd, (i * 37 % 1000) * kBlockBytes, 8 * kBlockBytes);
+        DaemonRequest(kRequestUnpinAll, nullptr);
+        ++rounds;
+    }
+}
+
+// Attaches a loop device to the daemon's; its path, empty where there is none to be had.
+std::string AttachLoop() {
+    if (DaemonCommand({"losetup", "--find", "--show", kDaemonDevice}) != 0) {
+        return "";
+    }
+    const std::string output = DaemonOutput();
+    return output.substr(0, output.find('\n'));
+}
+
+// Mounts it at /run/m and detaches it while it is mounted: the kernel lets go of it with the mount,
+// whatever ends this test.
+void MountAndDetach(const std::string &loop, const std::string &options) {
+    EXPECT_EQ(DaemonCommand({"mount", "-o", options, loop, "/run/m"}), 0) << DaemonErrors();
+    EXPECT_EQ(DaemonCommand({"losetup", "-d", loop}), 0) << DaemonErrors();
+}
+
 } // namespace
 
 TEST(CachedevDaemonTest, ServesReadsAndWritesThroughTheCache) {
     RunInPrivateWorld([] {
         constexpr uint64_t kBytes = 40 * kBlockBytes + 4096;
-        DaemonStartFresh(kBytes, 4, "--pid-file /run/pid");
-        EXPECT_EQ(std::stoi(TestReadFile("/run/pid")), DaemonPid());
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(kBytes, 4, {"--pid-file", "/run/pid"}));
+        EXPECT_EQ(TestReadFile("/run/pid"), std::to_string(DaemonPid()) + "\n");
         struct stat status = {};
         ASSERT_EQ(stat(kDaemonDevice, &status), 0);
         EXPECT_EQ(static_cast<uint64_t>(status.st_size), kBytes);
@@ -78,7 +119,7 @@ TEST(CachedevDaemonTest, ServesReadsAndWritesThroughTheCache) {
 
 TEST(CachedevDaemonTest, KeepsItsShape) {
     RunInPrivateWorld([] {
-        DaemonStartFresh(kBlockBytes, 1);
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(kBlockBytes, 1));
         EXPECT_EQ(open(kDaemonDevice, O_RDWR | O_TRUNC), -1);
         EXPECT_EQ(open(kDaemonState, O_RDWR), -1);
         EXPECT_EQ(open("/run/vesk/new", O_RDWR | O_CREAT, 0600), -1);
@@ -100,7 +141,7 @@ TEST(CachedevDaemonTest, KeepsItsShape) {
 
 TEST(CachedevDaemonTest, PinnedBlocksSurviveAScan) {
     RunInPrivateWorld([] {
-        DaemonStartFresh(64 * kBlockBytes, 8);
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(64 * kBlockBytes, 8));
         std::vector<uint8_t> bitmap(8);
         bitmap[1] = 0x03; // blocks 8 and 9
         EXPECT_EQ(DaemonQuery(kRequestQueryBitmapSet), 0);
@@ -138,24 +179,24 @@ TEST(CachedevDaemonTest, PinnedBlocksSurviveAScan) {
 
 TEST(CachedevDaemonTest, OutlivesClientsThatDieInTheMiddle) {
     RunInPrivateWorld([] {
-        DaemonStartFresh(1024 * kBlockBytes, 16);
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(1024 * kBlockBytes, 16));
+        Rounds rounds;
         std::vector<pid_t> clients;
-        for (int client = 0; client < 4; ++client) {
-            clients.push_back(fork());
-            if (clients.back() != 0) {
-                continue;
+        for (size_t client = 0; client < kClients; ++client) {
+            const pid_t process = fork();
+            ASSERT_GE(process, 0);
+            if (process == 0) {
+                UseDaemonWithoutEnd(static_cast<uint8_t>(client), rounds.done[client]);
             }
-            const TestFd device(kDaemonDevice, O_RDWR | O_DIRECT);
-            const std::vector<uint8_t> bitmap(128, static_cast<uint8_t>(client));
-            for (unsigned i = 0;; ++i) {
-                DaemonSetBitmap(bitmap);
-                TestReadAt(device.fd, (i * 37 % 1000) * kBlockBytes, 8 * kBlockBytes);
-                DaemonRequest(kRequestUnpinAll, nullptr);
+            clients.push_back(process);
+        }
+        for (size_t client = 0; client < kClients; ++client) {
+            while (rounds.done[client] < 5) {
+                usleep(1000);
             }
         }
-        usleep(200000);
         for (const pid_t client : clients) {
-            kill(client, SIGKILL);
+            EXPECT_EQ(kill(client, SIGKILL), 0);
             EXPECT_EQ(DaemonAwaitEnd(client), -SIGKILL);
         }
         const TestFd device(kDaemonDevice);
@@ -175,23 +216,22 @@ TEST(CachedevDaemonTest, CarriesAFilesystem) {
         TestMakeFile(kDaemonBacking, kBytes);
         TestMakeFile(kDaemonSsd, 16 * kBlockBytes);
         ASSERT_EQ(DaemonStart(), 0) << DaemonErrors();
-        const std::string attach = "losetup --find --show /run/vesk/cachedev_0 >/run/loop";
-        if (DaemonCommand(attach) != 0) {
+        ASSERT_EQ(access(kDaemonDevice, F_OK), 0);
+        const std::string loop = AttachLoop();
+        if (loop.empty()) {
             SkipWorld("no free loop device");
         }
-        // Detached while mounted: the kernel lets go of it with the mount, whatever ends this test.
-        EXPECT_EQ(DaemonCommand("L=$(cat /run/loop); mkdir /run/m; mkfs.ext4 -q -F -b 4096 $L &&"
-                                " mount $L /run/m; R=$?; losetup -d $L; exit $R"),
-                  0)
+        EXPECT_EQ(mkdir("/run/m", 0755), 0);
+        EXPECT_EQ(DaemonCommand({"mkfs.ext4", "-q", "-F", "-b", "4096", loop}), 0)
             << DaemonErrors();
+        MountAndDetach(loop, "rw");
         const std::string content = TestBytes(0, 3000000);
         TestWriteFile("/run/m/file", content);
         EXPECT_EQ(umount("/run/m"), 0);
         EXPECT_GT(DaemonState()["writes"].asInt(), 40);
-        EXPECT_EQ(DaemonCommand(attach + " && L=$(cat /run/loop); mount -o ro $L /run/m;"
-                                         " R=$?; losetup -d $L; exit $R"),
-                  0)
-            << DaemonErrors();
+        const std::string again = AttachLoop();
+        ASSERT_NE(again, "") << DaemonErrors();
+        MountAndDetach(again, "ro");
         const uint64_t misses = DaemonState()["misses"].asUInt64();
         EXPECT_TRUE(TestReadFile("/run/m/file") == content);
         EXPECT_GE(DaemonState()["misses"].asUInt64(), misses + 3000000 / kBlockBytes);
@@ -202,9 +242,10 @@ TEST(CachedevDaemonTest, CarriesAFilesystem) {
 
 TEST(CachedevDaemonTest, EndsWhenTheFolderIsUnmounted) {
     RunInPrivateWorld([] {
-        DaemonStartFresh(kBlockBytes, 1);
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(kBlockBytes, 1));
         const pid_t daemon = DaemonPid();
-        EXPECT_EQ(umount(kDaemonFolder), 0);
+        ASSERT_GT(daemon, 0);
+        ASSERT_EQ(umount(kDaemonFolder), 0);
         EXPECT_EQ(DaemonAwaitEnd(daemon), 0);
         EXPECT_EQ(DaemonStart(), 0) << DaemonErrors(); // and may begin again at once
         EXPECT_EQ(DaemonStop(), 0);
@@ -213,10 +254,8 @@ TEST(CachedevDaemonTest, EndsWhenTheFolderIsUnmounted) {
 
 TEST(CachedevDaemonTest, TellsWhatALeftOverMountPointIs) {
     RunInPrivateWorld([] {
-        DaemonStartFresh(kBlockBytes, 1);
-        const pid_t daemon = DaemonPid();
-        EXPECT_EQ(kill(daemon, SIGKILL), 0);
-        EXPECT_EQ(DaemonAwaitEnd(daemon), -SIGKILL);
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(kBlockBytes, 1));
+        EXPECT_EQ(DaemonEnd(SIGKILL), -SIGKILL);
         EXPECT_EQ(DaemonStart(), 1);
         EXPECT_NE(DaemonErrors().find("umount /run/vesk"), std::string::npos) << DaemonErrors();
         EXPECT_EQ(umount(kDaemonFolder), 0);
@@ -247,19 +286,16 @@ TEST(CachedevDaemonTest, RefusesToStart) {
         EXPECT_NE(DaemonErrors().find("mount point already"), std::string::npos) << DaemonErrors();
         EXPECT_EQ(umount(kDaemonFolder), 0);
         EXPECT_EQ(mount("t", "/dev", "tmpfs", 0, nullptr), 0); // no /dev/fuse
-        const int status =
-            system((std::string(VESKCACHEDEV) + " --device " + kDaemonDevice + " --backing " +
-                    kDaemonBacking + " --ssd " + kDaemonSsd + " >/run/output 2>&1")
-                       .c_str());
-        EXPECT_EQ(WEXITSTATUS(status), 1);
-        EXPECT_NE(TestReadFile("/run/output").find("cannot mount"), std::string::npos);
+        EXPECT_EQ(DaemonStart(), 1);
+        EXPECT_NE(DaemonErrors().find("cannot mount"), std::string::npos) << DaemonErrors();
     });
 }
 
 TEST(CachedevDaemonTest, OrderedFaults) {
     RunInPrivateWorld([] {
-        DaemonStartFresh(4 * kBlockBytes, 2,
-                         "--fail-ioctl 0xFED1:5 --fail-read 70000:61 --short-at 200000");
+        ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(
+            4 * kBlockBytes, 2,
+            {"--fail-ioctl", "0xFED1:5", "--fail-read", "70000:61", "--short-at", "200000"}));
         EXPECT_EQ(DaemonRequest(kRequestUnpinAll, nullptr), EIO);
         const TestFd device(kDaemonDevice);
         EXPECT_EQ(TestReadAt(device.fd, 69000, 1000).size(), 1000U);

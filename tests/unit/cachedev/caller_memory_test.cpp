@@ -8,6 +8,7 @@
 #include <csignal>
 #include <cstring>
 #include <sys/mman.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -33,7 +34,9 @@ TEST_F(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
     // The child has the same layout and its own copy of this variable.
     static volatile int value = 1;
     const pid_t child = fork();
+    ASSERT_GE(child, 0);
     if (child == 0) {
+        prctl(PR_SET_PDEATHSIG, SIGKILL);
         value = 42;
         while (value == 42) {
             usleep(1000);
@@ -43,20 +46,22 @@ TEST_F(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
     const Caller caller = {child, sizeof(void *) == 4};
     const uint64_t address = reinterpret_cast<uintptr_t>(&value);
     int seen = 0;
-    for (int i = 0; i < 5000 && seen != 42; ++i) {
-        ASSERT_EQ(CallerRead(caller, address, &seen, sizeof seen), 0);
+    while (CallerRead(caller, address, &seen, sizeof seen) == 0 && seen != 42) {
         usleep(1000);
     }
     EXPECT_EQ(seen, 42);
     const int written = 7;
     EXPECT_EQ(CallerWrite(caller, address, &written, sizeof written), 0);
-    int status = 0;
-    ASSERT_EQ(waitpid(child, &status, 0), child);
-    EXPECT_EQ(WEXITSTATUS(status), 7);
-    EXPECT_EQ(value, 1);
-    // It is gone now.
+    // It is gone then, but not its number, which could be another's.
+    siginfo_t end = {};
+    ASSERT_EQ(waitid(P_PID, static_cast<id_t>(child), &end, WEXITED | WNOWAIT), 0);
     EXPECT_EQ(CallerRead(caller, address, &seen, sizeof seen), -EFAULT);
     EXPECT_EQ(CallerWrite(caller, address, &written, sizeof written), -EFAULT);
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    EXPECT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 7);
+    EXPECT_EQ(value, 1);
 }
 
 TEST_F(CallerMemoryTest, MemoryThatIsNotThereIsRefused) {

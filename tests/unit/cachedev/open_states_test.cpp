@@ -27,6 +27,7 @@ TEST(OpenStatesTest, AClosedFileIsGoneButNotUnderAReader) {
     OpenStatesClose(states, handle);
     OpenStatesClose(states, 0);
     EXPECT_THROW(OpenStatesText(states, handle), std::out_of_range);
+    ASSERT_FALSE(reading->empty());
     EXPECT_EQ(reading->back(), '\n');
     EXPECT_NE(OpenStatesOpen(states, test.device), handle); // never used again
 }

@@ -31,6 +31,7 @@ std::string Text(const Json::Value &value) {
 TEST(StateJsonTest, AFreshDevice) {
     TestDevice test(16 * kBlockBytes + 512, 3);
     const std::string text = StateJsonText(CacheDeviceSnapshot(test.device), 4711);
+    ASSERT_FALSE(text.empty());
     EXPECT_EQ(text.back(), '\n');
     const Json::Value state = Parse(text);
     EXPECT_EQ(state["pid"].asInt(), 4711);

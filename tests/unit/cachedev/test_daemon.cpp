@@ -6,21 +6,52 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <climits>
 #include <csignal>
 #include <cstdlib>
 #include <memory>
+#include <spawn.h>
 #include <sstream>
 #include <sys/ioctl.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 namespace {
+
+constexpr const char *kOutput = "/run/output";
+constexpr const char *kErrors = "/run/errors";
 
 // The bitmap descriptor as a program of this word size passes it.
 struct Descriptor {
     const void *bytes;
     uint32_t length;
 };
+
+// Where a command writes to.
+struct OutputFiles {
+    posix_spawn_file_actions_t actions;
+    OutputFiles() {
+        posix_spawn_file_actions_init(&actions);
+        Add(STDOUT_FILENO, kOutput);
+        Add(STDERR_FILENO, kErrors);
+    }
+    ~OutputFiles() { posix_spawn_file_actions_destroy(&actions); }
+    OutputFiles(const OutputFiles &) = delete;
+    OutputFiles &operator=(const OutputFiles &) = delete;
+
+    void Add(int fd, const char *path) {
+        posix_spawn_file_actions_addopen(&actions, fd, path, O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    }
+};
+
+bool RunsTheDaemon(pid_t process) {
+    struct stat running = {};
+    struct stat program = {};
+    return stat(("/proc/" + std::to_string(process) + "/exe").c_str(), &running) == 0 &&
+           stat(VESKCACHEDEV, &program) == 0 && running.st_dev == program.st_dev &&
+           running.st_ino == program.st_ino;
+}
 
 } // namespace
 
@@ -32,21 +63,36 @@ TestFd::~TestFd() {
     }
 }
 
-int DaemonCommand(const std::string &command) {
-    const int status = system((command + " 2>/run/errors").c_str());
-    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+int DaemonCommand(std::vector<std::string> command) {
+    const OutputFiles files;
+    std::vector<char *> words;
+    for (std::string &word : command) {
+        words.push_back(word.data());
+    }
+    words.push_back(nullptr);
+    pid_t child = -1;
+    if (posix_spawnp(&child, words[0], &files.actions, nullptr, words.data(), environ) != 0) {
+        return 127;
+    }
+    return DaemonAwaitEnd(child);
+}
+
+std::string DaemonOutput() {
+    return TestReadFile(kOutput);
 }
 
 std::string DaemonErrors() {
-    return TestReadFile("/run/errors");
+    return TestReadFile(kErrors);
 }
 
-int DaemonStart(const std::string &more) {
-    return DaemonCommand(std::string(VESKCACHEDEV) + " --device " + kDaemonDevice + " --backing " +
-                         kDaemonBacking + " --ssd " + kDaemonSsd + " " + more);
+int DaemonStart(const std::vector<std::string> &more) {
+    std::vector<std::string> command = {VESKCACHEDEV,   "--device", kDaemonDevice, "--backing",
+                                        kDaemonBacking, "--ssd",    kDaemonSsd};
+    command.insert(command.end(), more.begin(), more.end());
+    return DaemonCommand(command);
 }
 
-void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots, const std::string &more) {
+void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots, const std::vector<std::string> &more) {
     TestWriteFile(kDaemonBacking, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(kDaemonSsd, slots * kBlockBytes);
     ASSERT_EQ(DaemonStart(more), 0) << DaemonErrors();
@@ -67,20 +113,35 @@ std::string DaemonStateText(const char *member) {
     return Json::writeString(writer, DaemonState()[member]);
 }
 
-int DaemonAwaitEnd(pid_t daemon) {
+int DaemonAwaitEnd(pid_t child) {
     int status = 0;
-    EXPECT_EQ(waitpid(daemon, &status, 0), daemon);
+    if (child <= 0 || waitpid(child, &status, 0) != child) { // 0 and -1 would be any child
+        ADD_FAILURE() << "no child " << child;
+        return INT_MIN;
+    }
     return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
 }
 
 pid_t DaemonPid() {
-    return DaemonState()["pid"].asInt();
+    const Json::Value state = DaemonState();
+    const pid_t daemon = state.isObject() && state["pid"].isInt() ? state["pid"].asInt() : -1;
+    if (daemon <= 0 || !RunsTheDaemon(daemon)) {
+        ADD_FAILURE() << "no daemon of process id " << daemon;
+        return -1;
+    }
+    return daemon;
+}
+
+int DaemonEnd(int signalNumber) {
+    const pid_t daemon = DaemonPid();
+    if (daemon > 0) { // a signal to 0 or -1 would go far beyond this test
+        EXPECT_EQ(kill(daemon, signalNumber), 0);
+    }
+    return DaemonAwaitEnd(daemon);
 }
 
 int DaemonStop() {
-    const pid_t daemon = DaemonPid();
-    EXPECT_EQ(kill(daemon, SIGTERM), 0);
-    return DaemonAwaitEnd(daemon);
+    return DaemonEnd(SIGTERM);
 }
 
 int DaemonRequest(unsigned long number, const void *argument) {

@@ -24,24 +24,33 @@ struct TestFd {
     TestFd &operator=(const TestFd &) = delete;
 };
 
-// Runs a shell command; its exit status. What it wrote to standard error is in DaemonErrors.
-int DaemonCommand(const std::string &command);
+// Runs a command; its exit status, 127 where there is no such one. What it wrote is in DaemonOutput
+// and DaemonErrors.
+int DaemonCommand(std::vector<std::string> command);
+std::string DaemonOutput();
 std::string DaemonErrors();
 
 // Starts the daemon on the images, with more options; the exit status of the command.
-int DaemonStart(const std::string &more = "");
+int DaemonStart(const std::vector<std::string> &more = {});
 
 // Makes the images, the backing one with TestByte content, and starts the daemon.
-void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots, const std::string &more = "");
+void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots,
+                      const std::vector<std::string> &more = {});
 
 // The daemon's state, and one member of it as compact text.
 Json::Value DaemonState();
 std::string DaemonStateText(const char *member);
+
+// The process that the state names, seen to run the daemon's program; otherwise -1 and a failure.
 pid_t DaemonPid();
 
 // The exit status of a child, or the negative number of the signal that ended it. The daemon is
-// one, because orphans of a world become children of its first process.
+// one, because orphans of a world become children of its first process. INT_MIN and a failure where
+// there is no such child.
 int DaemonAwaitEnd(pid_t child);
+
+// Sends the signal to the daemon and awaits its end as above.
+int DaemonEnd(int signalNumber);
 
 // Ends the daemon with SIGTERM; its exit status.
 int DaemonStop();
