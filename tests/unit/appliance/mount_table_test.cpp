@@ -61,6 +61,7 @@ TEST(MountTable, ReadsTheKernelsTable) {
 
 TEST(MountTable, FindsByDeviceTheFirstMountThatIsNoAutomountPoint) {
     std::vector<MountEntry> entries = TableOf(kTable);
+    ASSERT_EQ(entries.size(), 8U);
     ASSERT_NE(MountFindByDevice(entries, makedev(254, 1)), nullptr);
     EXPECT_EQ(MountFindByDevice(entries, makedev(254, 1))->id, 29);
     EXPECT_EQ(MountFindByDevice(entries, makedev(0, 50)), nullptr);
@@ -68,6 +69,7 @@ TEST(MountTable, FindsByDeviceTheFirstMountThatIsNoAutomountPoint) {
 
     entries.push_back(entries[3]);
     entries.back().id = 99;
+    ASSERT_NE(MountFindByDevice(entries, makedev(254, 1)), nullptr);
     EXPECT_EQ(MountFindByDevice(entries, makedev(254, 1))->id, 29);
 }
 
@@ -91,6 +93,7 @@ TEST(MountTable, FindsByPathTheLongestMountPoint) {
 
 TEST(MountTable, OptionValues) {
     const std::vector<MountEntry> entries = TableOf(kTable);
+    ASSERT_EQ(entries.size(), 8U);
     EXPECT_EQ(MountOptionValue(entries[5], "subvol"), "/@");
     EXPECT_EQ(MountOptionValue(entries[5], "subvolid"), "256");
     EXPECT_EQ(MountOptionValue(entries[5], "rw"), "") << "an option without a value";

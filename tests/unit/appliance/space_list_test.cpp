@@ -169,12 +169,9 @@ TEST(VESKSpaceInfoEnum, ListsSeveralFilesystems) {
         }
     }
     std::string output;
-    ASSERT_EQ(CommandRun("btrfs subvolume create /mnt/third/sub && mkdir /mnt/sub &&"
-                         " mount -n -o subvol=sub " +
-                             btrfs.device + " /mnt/sub",
-                         output),
-              0)
-        << output;
+    ASSERT_EQ(CommandRun({"btrfs", "subvolume", "create", "/mnt/third/sub"}, output), 0) << output;
+    std::filesystem::create_directory("/mnt/sub");
+    ASSERT_EQ(mount(btrfs.device.c_str(), "/mnt/sub", "btrfs", 0, "subvol=sub"), 0);
     EXPECT_EQ(WorldSpaces(), (Texts{xfs.device + " /mnt/first", ext4.device + " /mnt/second",
                                     btrfs.device + " /mnt/third"}));
     ASSERT_EQ(umount2("/mnt/sub", 0), 0);

@@ -3,23 +3,31 @@
 #include <gtest/gtest.h>
 
 #include <fcntl.h>
+#include <linux/falloc.h>
+#include <linux/fiemap.h>
+#include <linux/fs.h>
 #include <linux/loop.h>
 #include <sched.h>
+#include <spawn.h>
 #include <sys/ioctl.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
+#include <sstream>
 
 namespace {
+
+constexpr int kNoSuchCommand = 127;
 
 std::string WorldMake() {
     if (geteuid() != 0) {
@@ -49,7 +57,7 @@ std::string LoopProbe() {
 // btrfs does not show its device's number, but every filesystem shows what was mounted.
 std::string MountSource(const std::string &mountPath) {
     std::string output;
-    CommandRun("findmnt -n -o SOURCE --mountpoint '" + mountPath + "'", output);
+    CommandRun({"findmnt", "-n", "-o", "SOURCE", "--mountpoint", mountPath}, output);
     return output.substr(0, output.find('\n'));
 }
 
@@ -57,6 +65,28 @@ std::string UuidMake() {
     std::string uuid;
     std::ifstream("/proc/sys/kernel/random/uuid") >> uuid;
     return uuid;
+}
+
+std::vector<std::string> WordsOf(const std::string &text) {
+    std::istringstream stream(text);
+    return {std::istream_iterator<std::string>(stream), {}};
+}
+
+// Starts the command with both outputs into the pipe's end; its process or a negative errno.
+pid_t CommandStart(std::vector<std::string> command, int output) {
+    std::vector<char *> words;
+    for (std::string &word : command) {
+        words.push_back(word.data());
+    }
+    words.push_back(nullptr);
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_adddup2(&actions, output, STDOUT_FILENO);
+    posix_spawn_file_actions_adddup2(&actions, output, STDERR_FILENO);
+    pid_t child = -1;
+    const int error = posix_spawnp(&child, words[0], &actions, nullptr, words.data(), environ);
+    posix_spawn_file_actions_destroy(&actions);
+    return error == 0 ? child : -error;
 }
 
 std::string FolderMake() {
@@ -76,17 +106,23 @@ std::string PrivateWorldEnter() {
     return reason;
 }
 
-int CommandRun(const std::string &command, std::string &output) {
+int CommandRun(const std::vector<std::string> &command, std::string &output) {
     output.clear();
-    FILE *pipe = popen((command + " 2>&1").c_str(), "re");
-    if (pipe == nullptr) {
+    std::array<int, 2> ends = {-1, -1};
+    if (pipe2(ends.data(), O_CLOEXEC) != 0) {
         return -1;
     }
+    const pid_t child = CommandStart(command, ends[1]);
+    close(ends[1]);
     std::array<char, 4096> buffer = {};
-    while (size_t count = fread(buffer.data(), 1, buffer.size(), pipe)) {
-        output.append(buffer.data(), count);
+    for (ssize_t count = 0; (count = read(ends[0], buffer.data(), buffer.size())) > 0;) {
+        output.append(buffer.data(), static_cast<size_t>(count));
     }
-    const int status = pclose(pipe);
+    close(ends[0]);
+    int status = 0;
+    if (child < 0 || waitpid(child, &status, 0) != child) {
+        return child == -ENOENT ? kNoSuchCommand : -1;
+    }
     return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
@@ -111,16 +147,17 @@ TestVolume::TestVolume(const std::string &name, const std::string &mkfs, uint64_
 }
 
 void TestVolume::Mount(const std::string &mkfs) {
-    constexpr int kNoSuchCommand = 127;
+    std::vector<std::string> command = WordsOf(mkfs);
+    command.push_back(imagePath);
     std::string output;
-    const int formatted = CommandRun(mkfs + " '" + imagePath + "'", output);
+    const int formatted = CommandRun(command, output);
     if (formatted == kNoSuchCommand) {
-        skipReason = "needs " + mkfs.substr(0, mkfs.find(' '));
+        skipReason = "needs " + command[0];
         return;
     }
     EXPECT_EQ(formatted, 0) << mkfs << ": " << output;
     // The loop device of "-o loop" goes with the mount.
-    if (CommandRun("mount -n -o loop '" + imagePath + "' '" + mountPath + "'", output) != 0) {
+    if (CommandRun({"mount", "-n", "-o", "loop", imagePath, mountPath}, output) != 0) {
         skipReason = "cannot mount: " + output;
         EXPECT_NE(output.find("unknown filesystem type"), std::string::npos) << output;
         return;
@@ -166,6 +203,35 @@ void TestFile::Fallocate(int mode, uint64_t offset, uint64_t length) {
 
 void TestFile::Sync() {
     EXPECT_EQ(fsync(fd), 0) << std::strerror(errno);
+}
+
+bool TestFile::LookBeforePlaced(uint64_t offset, uint64_t length,
+                                const std::function<void()> &look) {
+    for (int tries = 0; tries < 100; ++tries) {
+        Fallocate(FALLOC_FL_PUNCH_HOLE | FALLOC_FL_KEEP_SIZE, offset, length);
+        Write(offset, length);
+        look();
+        if (IsUnplaced(offset, length)) {
+            return true;
+        }
+    }
+    return false;
+}
+
+// What has got a place keeps it, so whoever looked before this has seen none either.
+bool TestFile::IsUnplaced(uint64_t offset, uint64_t length) const {
+    constexpr uint32_t kExtents = 16;
+    alignas(fiemap) std::array<char, sizeof(fiemap) + kExtents * sizeof(fiemap_extent)> memory = {};
+    auto *const map = reinterpret_cast<fiemap *>(memory.data());
+    map->fm_start = offset;
+    map->fm_length = length;
+    map->fm_extent_count = kExtents;
+    EXPECT_EQ(ioctl(fd, FS_IOC_FIEMAP, map), 0) << std::strerror(errno);
+    const fiemap_extent *const first = map->fm_extents;
+    return map->fm_mapped_extents > 0 &&
+           std::all_of(first, first + map->fm_mapped_extents, [](const fiemap_extent &extent) {
+               return (extent.fe_flags & FIEMAP_EXTENT_DELALLOC) != 0;
+           });
 }
 
 uint64_t TestFile::Inode() const {

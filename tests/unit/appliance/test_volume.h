@@ -10,6 +10,7 @@
 #include <sys/types.h>
 
 #include <cstdint>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -20,17 +21,17 @@ constexpr char kWorldPath[] = "/mnt";
 // process, further calls change nothing. Returns why it is not possible here; empty: done.
 std::string PrivateWorldEnter();
 
-// Runs a shell command. Returns its exit status, -1 when it did not end by itself, and what it
-// wrote to both outputs.
-int CommandRun(const std::string &command, std::string &output);
+// Runs a command: its name and its arguments. Returns its exit status, 127 where there is no such
+// command, -1 when it did not end by itself, and what it wrote to both outputs.
+int CommandRun(const std::vector<std::string> &command, std::string &output);
 
 // A filesystem in a sparse image that is mounted through a loop device at /mnt/<name>, unmounted by
 // the destructor.
 class TestVolume {
 public:
-    // `mkfs` is the formatting command without the image's path; "%UUID%" in it stands for a UUID
-    // of the volume's own. A machine without what this takes gives a reason to skip, anything else
-    // that goes wrong is a test failure.
+    // `mkfs` is the formatting command, words and blanks, without the image's path; "%UUID%" in it
+    // stands for a UUID of the volume's own. A machine without what this takes gives a reason to
+    // skip, anything else that goes wrong is a test failure.
     TestVolume(const std::string &name, const std::string &mkfs, uint64_t imageBytes);
     TestVolume(const TestVolume &) = delete;
     TestVolume &operator=(const TestVolume &) = delete;
@@ -74,8 +75,16 @@ public:
     void Sync();
     uint64_t Inode() const;
 
+    // Writes the range anew and looks at the file, as often as it takes for the range to have had
+    // no place on the device throughout a look: the kernel gives it one when it likes. False where
+    // it always does so at once.
+    bool LookBeforePlaced(uint64_t offset, uint64_t length, const std::function<void()> &look);
+
     const std::string path;
     const int fd;
+
+private:
+    bool IsUnplaced(uint64_t offset, uint64_t length) const;
 };
 
 // The pattern that TestFile::Write puts at this place of a file.
