@@ -41,8 +41,9 @@ protected:
             table.entries = found->second;
             return 0;
         };
-        if (!device_->TakesDirectReads()) {
-            GTEST_SKIP() << "the current folder takes no direct reads";
+        if (!FakeCacheDevice::TakesDirectReads()) {
+            GTEST_SKIP() << "neither the current folder nor one for temporary files takes direct "
+                            "reads";
         }
     }
     RequestRecord Record(int type, const std::string &data = "") const {

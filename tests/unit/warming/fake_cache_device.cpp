@@ -5,12 +5,15 @@
 
 #include "bitmap/pin_bitmap.h"
 #include "driver/pin_interface.h"
+#include "platform/scoped_fd.h"
 
 #include <cerrno>
 #include <climits>
 #include <cstdlib>
 #include <fcntl.h>
+#include <filesystem>
 #include <linux/fs.h>
+#include <memory>
 #include <unistd.h>
 
 namespace {
@@ -30,6 +33,46 @@ std::string RangesText(const UnpinList &list) {
     return text;
 }
 
+// An empty file of a new name in the folder; its path, or nothing.
+std::string MakeFile(const std::string &folder) {
+    std::string path = folder + "/vesk-test-device-XXXXXX";
+    const ScopedFd fd(mkstemp(&path[0]));
+    return fd.IsOpen() ? path : "";
+}
+
+bool FolderTakesDirectReads(const std::string &folder) {
+    const size_t bytes = 4096;
+    const std::string path = MakeFile(folder);
+    const ScopedFd fd(open(path.c_str(), O_RDWR | O_DIRECT | O_CLOEXEC));
+    const std::unique_ptr<void, void (*)(void *)> buffer(aligned_alloc(bytes, bytes), free);
+    const bool taken = fd.IsOpen() && ftruncate(fd.Get(), static_cast<off_t>(bytes)) == 0 &&
+                       pread(fd.Get(), buffer.get(), bytes, 0) == static_cast<ssize_t>(bytes);
+    unlink(path.c_str());
+    return taken;
+}
+
+// The first that takes direct reads: the current folder, which a test run has in the build folder,
+// and those for temporary files. A file system in memory need not take them, and a private /tmp
+// hides a build folder below it. Empty: none does.
+std::string FindDirectReadsFolder() {
+    std::error_code ignored;
+    const char *temporary = getenv("TMPDIR");
+    for (const std::string &folder :
+         {std::filesystem::current_path(ignored).string(),
+          std::string(temporary == nullptr ? "" : temporary), std::string("/var/tmp"),
+          std::string("/tmp"), std::string("/var/lib"), std::string("/dev/shm")}) {
+        if (!folder.empty() && FolderTakesDirectReads(folder)) {
+            return folder;
+        }
+    }
+    return "";
+}
+
+const std::string &DirectReadsFolder() {
+    static const std::string folder = FindDirectReadsFolder();
+    return folder;
+}
+
 } // namespace
 
 std::string Hex(const std::string &bytes) {
@@ -43,17 +86,13 @@ std::string Hex(const std::string &bytes) {
     return text;
 }
 
-// In the current folder, which a test run has in the build folder: a file system in memory, as
-// /tmp may be, need not take direct reads.
-FakeCacheDevice::FakeCacheDevice(uint64_t bytes) : bytes_(bytes) {
-    char name[] = "./vesk-test-device-XXXXXX";
-    const int fd = mkstemp(name);
+FakeCacheDevice::FakeCacheDevice(uint64_t bytes)
+    : path_(MakeFile(TakesDirectReads() ? DirectReadsFolder() : "/tmp")), bytes_(bytes) {
     char whole[PATH_MAX];
-    if (fd < 0 || ftruncate(fd, static_cast<off_t>(bytes)) < 0 ||
-        realpath(name, whole) == nullptr) {
+    if (truncate(path_.c_str(), static_cast<off_t>(bytes)) < 0 ||
+        realpath(path_.c_str(), whole) == nullptr) {
         abort();
     }
-    close(fd);
     path_ = whole;
     FakeLibc::onIoctl = [this](unsigned long request, void *argument) {
         return Answer(request, argument);
@@ -69,13 +108,8 @@ FakeCacheDevice::~FakeCacheDevice() {
     unlink(path_.c_str());
 }
 
-bool FakeCacheDevice::TakesDirectReads() const {
-    const int fd = open(path_.c_str(), O_RDONLY | O_DIRECT);
-    if (fd < 0) {
-        return false;
-    }
-    close(fd);
-    return true;
+bool FakeCacheDevice::TakesDirectReads() {
+    return !DirectReadsFolder().empty();
 }
 
 int FakeCacheDevice::Answer(unsigned long request, void *argument) {

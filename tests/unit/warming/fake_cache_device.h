@@ -21,8 +21,8 @@ public:
     FakeCacheDevice &operator=(const FakeCacheDevice &) = delete;
 
     const std::string &Path() const { return path_; }
-    // False where the test's folder cannot do direct reads.
-    bool TakesDirectReads() const;
+    // False where no folder that such a file may lie in does.
+    static bool TakesDirectReads();
 
     // In order:
     //   "bitmap 0180"        set-bitmap request with these bytes; with bitmapFile set,

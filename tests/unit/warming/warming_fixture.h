@@ -33,8 +33,9 @@ protected:
 };
 
 #define SKIP_WITHOUT_DIRECT_READS()                                                                \
-    if (!device_->TakesDirectReads()) {                                                            \
-        GTEST_SKIP() << "the current folder takes no direct reads";                                \
+    if (!FakeCacheDevice::TakesDirectReads()) {                                                    \
+        GTEST_SKIP() << "neither the current folder nor one for temporary files takes direct "     \
+                        "reads";                                                                   \
     }                                                                                              \
     static_assert(true, "a semicolon follows")
 
