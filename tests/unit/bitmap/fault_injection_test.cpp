@@ -141,7 +141,7 @@ TEST_F(FileSimulateGetMappingFailedTest, ControlFileWithoutPermissionCountsAsAbs
         const CapturedLog log;
         _exit(setuid(65534) == 0 ? FileSimulateGetMappingFailed(file) : 99);
     }
-    int status = 0;
+    int status = -1; // of no process, where there is none
     waitpid(child, &status, 0);
     ASSERT_TRUE(WIFEXITED(status));
     EXPECT_EQ(WEXITSTATUS(status), 0);

@@ -70,8 +70,8 @@ TEST_F(FileExtentsTest, LargestInodeIsNotExtended) {
     AnswerWithExtents({1});
     EXPECT_EQ(GetMappingTableFromFile(&table, "/volume1", file, 4294967295U), 0);
     EXPECT_EQ(askedInode, 4294967295U);
-    EXPECT_EQ(log.Messages().front(), "GetMappingTableFromFile() [N]: Start for file "
-                                      "(/volume1/photo/a.jpg), inode = 4294967295");
+    EXPECT_EQ(FirstOf(log.Messages()), "GetMappingTableFromFile() [N]: Start for file "
+                                       "(/volume1/photo/a.jpg), inode = 4294967295");
 }
 
 TEST_F(FileExtentsTest, FolderOfAPathIsThatOfDirname) {
@@ -149,8 +149,8 @@ TEST_F(FileExtentsTest, TimeoutIsAnErrorAndEveryRetryIsToldAtLevel2) {
     EXPECT_EQ(log.Count("GetMappingTableFromFile() [N]: Retry to get mapping of file "
                         "(/volume1/photo/a.jpg) Ret = 0 size = 0"),
               10);
-    EXPECT_EQ(log.Messages().back(), "GetMappingTableFromFile() [N] : ***** Get mapping of file "
-                                     "(/volume1/photo/a.jpg) timeout (10 seconds)");
+    EXPECT_EQ(LastOf(log.Messages()), "GetMappingTableFromFile() [N] : ***** Get mapping of file "
+                                      "(/volume1/photo/a.jpg) timeout (10 seconds)");
 }
 
 TEST_F(FileExtentsTest, ResultAbove0WithoutExtentsIsTriedAgain) {
@@ -171,7 +171,7 @@ TEST_F(FileExtentsTest, FailedLookupIsNotTriedAgain) {
         EXPECT_EQ(FakeAppliance::lookups, 1);
         EXPECT_EQ(FakeLibc::sleeps, 0);
         EXPECT_EQ(FakeLibc::syncs, 0);
-        EXPECT_EQ(log.Messages().back(),
+        EXPECT_EQ(LastOf(log.Messages()),
                   "GetMappingTableFromFile() [N] : ***** Get mapping result fail.");
         EXPECT_EQ(log.Lines().size(), 2U);
     }

@@ -190,6 +190,6 @@ TEST_F(UnsetBitmapTest, FailureHasTheErrorMarker) {
     AnswerWith(-1, {});
     CapturedLog log(2);
     EXPECT_EQ(Unset(), -1);
-    EXPECT_EQ(log.Messages().back(), "UnsetBitmapAndAppendUnpinInfos() [N] : ***** Get mapping "
-                                     "table of file (/volume1/photo/a.jpg) failed");
+    EXPECT_EQ(LastOf(log.Messages()), "UnsetBitmapAndAppendUnpinInfos() [N] : ***** Get mapping "
+                                      "table of file (/volume1/photo/a.jpg) failed");
 }

@@ -51,7 +51,9 @@ protected:
         return log.Messages();
     }
     std::string Content() const {
-        return std::string(reinterpret_cast<const char *>(bitmap->data), bitmap->size);
+        return bitmap == nullptr
+                   ? "(none)"
+                   : std::string(reinterpret_cast<const char *>(bitmap->data), bitmap->size);
     }
 
     TempDir folder;
@@ -141,7 +143,7 @@ TEST_F(SpaceBitmapTest, SizesAreToldAtLevel2) {
     const Messages messages = Load(0, 2);
     EXPECT_EQ(messages.at(messages.size() - 3), "BitmapAllocateAndInitialize() [N]: Bitmap memory "
                                                 "size = 100, file size = 100");
-    EXPECT_EQ(messages.back(), "BitmapInitByFile() [N]: Read to memory finish");
+    EXPECT_EQ(LastOf(messages), "BitmapInitByFile() [N]: Read to memory finish");
 }
 
 TEST_F(SpaceBitmapTest, ShorterFileFillsTheStartAndTellsOfTheChange) {
@@ -251,8 +253,9 @@ TEST_F(SpaceBitmapTest, FileThatCannotBeReadIsAnErrorAndTheRecordIsReleased) {
 
 TEST_F(SpaceBitmapTest, ErrorsCarryTheMarkerAndTheOperationsName) {
     WriteWhole(path, std::string(101, '\x5A'));
-    EXPECT_EQ(Load(-1, 2).back(), "BitmapAllocateAndInitialize() [N] : ***** Incorrect bitmap size "
-                                  "(100), file size (101)");
+    EXPECT_EQ(LastOf(Load(-1, 2)),
+              "BitmapAllocateAndInitialize() [N] : ***** Incorrect bitmap size "
+              "(100), file size (101)");
 }
 
 TEST_F(SpaceBitmapTest, HolderReleasesTheBitmap) {

@@ -95,7 +95,7 @@ protected:
             RunInChild(arguments, output, systemLog, logLevel);
         }
         Outcome run;
-        int status = 0;
+        int status = -1; // of no process, where there is none
         waitpid(child, &status, 0);
         run.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
         run.output = Content(output);

@@ -148,7 +148,7 @@ TEST_F(OptionsTest, VerboseAndDebugAreFlagsWithANotice) {
 TEST_F(OptionsTest, MessagesOfTheParserAreShortEvenBehindVerbose) {
     CapturedLog log;
     EXPECT_EQ(Parse({"--verbose", "--debug", "--check-pin", "/no/such"}), -1);
-    EXPECT_EQ(log.Lines().back(), "tool: File (/no/such) doesn't exist");
+    EXPECT_EQ(LastOf(log.Lines()), "tool: File (/no/such) doesn't exist");
 }
 
 TEST_F(OptionsTest, StdoutTakesEffectWhereItStands) {

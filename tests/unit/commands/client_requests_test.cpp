@@ -189,7 +189,7 @@ TEST_F(ClientRequestsTest, APendingSpaceRequestShowsTheIdentifierThatItUses) {
                   "SetSpaceStateRequest() [N] : ***** Send message failed: Invalid argument",
                   "SetSpaceStateRequest() [N] : -----",
               }));
-    EXPECT_EQ(MessagesOf(log, "MsgQueueSend").front(),
+    EXPECT_EQ(FirstOf(MessagesOf(log, "MsgQueueSend")),
               "MsgQueueSend() [N]: Send to message queue (id = -1) msg type = 1");
 }
 

@@ -112,7 +112,7 @@ TEST_F(InspectionFileTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
     std::filesystem::remove(file_);
     CapturedLog log(2);
     EXPECT_EQ(Check(), 2);
-    EXPECT_EQ(MessagesOf(log, "CheckFileIsPin").back(),
+    EXPECT_EQ(LastOf(MessagesOf(log, "CheckFileIsPin")),
               "CheckFileIsPin() [N] : ***** Can't get inode number of file (" + file_ + ")");
     EXPECT_TRUE(log.Has("FileGetInodeNumber() [N] : ***** Stat file " + file_ + " error"));
 }

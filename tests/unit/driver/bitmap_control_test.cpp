@@ -168,5 +168,5 @@ TEST_F(BitmapControlTest, AllUnpinnedFailsWhenTheDriverRefuses) {
     EXPECT_EQ(isAllBlocksUnpin(device, &allUnpinned), -1);
     const Messages messages = log.Messages();
     EXPECT_EQ(messages.at(messages.size() - 2), "isAllBlocksUnpin() [N] : ***** Ioctl error");
-    EXPECT_EQ(messages.back(), "isAllBlocksUnpin() [N] : -----");
+    EXPECT_EQ(LastOf(messages), "isAllBlocksUnpin() [N] : -----");
 }

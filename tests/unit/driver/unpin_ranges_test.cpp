@@ -69,7 +69,7 @@ using UnpinRangeTest = UnpinRangesTest;
 TEST_F(SendUnpinInfoToDriverTest, SendsNothingForAnEmptyList) {
     CapturedLog log;
     EXPECT_EQ(SendUnpinInfoToDriver("/no/such", {}), 0);
-    ExpectSent({});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({}));
     EXPECT_EQ(log.Text(), "");
 }
 
@@ -85,46 +85,48 @@ TEST_F(SendUnpinInfoToDriverTest, FirstRecordIsTheseBytes) {
 TEST_F(SendUnpinInfoToDriverTest, EndsAShortListByAZeroRecord) {
     CapturedLog log;
     EXPECT_EQ(Send(1023), 0);
-    ExpectSent({Request(0, 1023)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(0, 1023)}));
     EXPECT_EQ(sent[0].substr(16368), std::string(16, '\0'));
 }
 
 TEST_F(SendUnpinInfoToDriverTest, SendsAFullListWithoutAZeroRecord) {
     CapturedLog log;
     EXPECT_EQ(Send(1024), 0);
-    ExpectSent({Request(0, 1024)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(0, 1024)}));
     EXPECT_NE(sent[0].substr(16368), std::string(16, '\0'));
 }
 
 TEST_F(SendUnpinInfoToDriverTest, DropsTheRangeThatArrivesAtAFullList) {
     CapturedLog log;
     EXPECT_EQ(Send(1025), 0);
-    ExpectSent({Request(0, 1024)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(0, 1024)}));
     EXPECT_EQ(log.Text(), "");
 }
 
 TEST_F(SendUnpinInfoToDriverTest, BeginsTheSecondListBehindTheDroppedRange) {
     CapturedLog log;
     EXPECT_EQ(Send(1026), 0);
-    ExpectSent({Request(0, 1024), Request(1025, 1026)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(0, 1024), Request(1025, 1026)}));
 }
 
 TEST_F(SendUnpinInfoToDriverTest, SendsTwoFullLists) {
     CapturedLog log;
     EXPECT_EQ(Send(2049), 0);
-    ExpectSent({Request(0, 1024), Request(1025, 2049)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(0, 1024), Request(1025, 2049)}));
 }
 
 TEST_F(SendUnpinInfoToDriverTest, DropsEvery1025thRange) {
     CapturedLog log;
     EXPECT_EQ(Send(2050), 0);
-    ExpectSent({Request(0, 1024), Request(1025, 2049)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(0, 1024), Request(1025, 2049)}));
     sent.clear();
     EXPECT_EQ(Send(3075), 0);
-    ExpectSent({Request(0, 1024), Request(1025, 2049), Request(2050, 3074)});
+    ASSERT_NO_FATAL_FAILURE(
+        ExpectSent({Request(0, 1024), Request(1025, 2049), Request(2050, 3074)}));
     sent.clear();
     EXPECT_EQ(Send(3076), 0);
-    ExpectSent({Request(0, 1024), Request(1025, 2049), Request(2050, 3074), Request(3075, 3076)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent(
+        {Request(0, 1024), Request(1025, 2049), Request(2050, 3074), Request(3075, 3076)}));
 }
 
 TEST_F(SendUnpinInfoToDriverTest, RangesOfZerosAreSentAsTheyAre) {
@@ -152,7 +154,7 @@ TEST_F(SendUnpinInfoToDriverTest, FailsWhenTheLastListIsRefused) {
     const Messages messages = log.Messages();
     EXPECT_EQ(messages.at(messages.size() - 2),
               "SendUnpinInfoToDriver() [N] : ***** Send unpin inctl to driver failed");
-    EXPECT_EQ(messages.back(), "SendUnpinInfoToDriver() [N] : -----");
+    EXPECT_EQ(LastOf(messages), "SendUnpinInfoToDriver() [N] : -----");
 }
 
 TEST_F(SendUnpinInfoToDriverTest, TellsEveryListAtLevel2) {
@@ -186,7 +188,7 @@ TEST_F(UnpinRangeTest, SendsOneRecordToTheVolumesCache) {
     FakeApplianceOneVolume(device);
     CapturedLog log;
     EXPECT_EQ(UnpinRange("/volume1", Range(7).startSector, Range(7).numSectors), 0);
-    ExpectSent({Request(7, 8)});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(7, 8)}));
     EXPECT_EQ(log.Text(), "");
 }
 
@@ -195,7 +197,7 @@ TEST_F(UnpinRangeTest, FailsWhereTheVolumeHasNoCache) {
     EXPECT_EQ(UnpinRange("/volume1", 0, 1), -1);
     EXPECT_EQ(log.Messages(), (Messages{"Can't get space uuid from reference path (/volume1)",
                                         "Can't get cache path of volume (/volume1)"}));
-    ExpectSent({});
+    ASSERT_NO_FATAL_FAILURE(ExpectSent({}));
 }
 
 TEST_F(UnpinRangeTest, FailsWhenTheDriverRefuses) {
@@ -204,10 +206,10 @@ TEST_F(UnpinRangeTest, FailsWhenTheDriverRefuses) {
     CapturedLog log(2);
     EXPECT_EQ(UnpinRange("/volume1", 0, 1), -1);
     const Messages messages = log.Messages();
-    EXPECT_EQ(messages.front(), "UnpinRange() [N] : +++++");
+    EXPECT_EQ(FirstOf(messages), "UnpinRange() [N] : +++++");
     EXPECT_EQ(messages.at(messages.size() - 2),
               "UnpinRange() [N] : ***** Send unpin inctl to driver failed");
-    EXPECT_EQ(messages.back(), "UnpinRange() [N] : -----");
+    EXPECT_EQ(LastOf(messages), "UnpinRange() [N] : -----");
 }
 
 TEST_F(UnpinRangeTest, FailureMessageHasTheErrorMarker) {

@@ -74,7 +74,7 @@ protected:
             }
             _exit(static_cast<int>(FileReplaceContent(file.c_str(), content)));
         }
-        int status = 0;
+        int status = -1; // of no process, where there is none
         waitpid(child, &status, 0);
         EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) != 99);
         return static_cast<FileReplaceResult>(WEXITSTATUS(status));

@@ -113,8 +113,8 @@ TEST_F(RelativePathTest, BySpaceUuidUsesTheSpacesReferencePath) {
 TEST_F(RelativePathTest, OfAnUnknownSpaceFails) {
     CapturedLog log(2);
     EXPECT_EQ(FileGetRelativePath("uuid-9", "/volume1/a"), nullptr);
-    EXPECT_EQ(log.Messages().back(), "FileGetRelativePath() [N] : ***** Can't get space's "
-                                     "reference path. UUID = uuid-9");
+    EXPECT_EQ(LastOf(log.Messages()), "FileGetRelativePath() [N] : ***** Can't get space's "
+                                      "reference path. UUID = uuid-9");
 }
 
 TEST_F(TopDirTest, IsASlashAndTheFirstComponent) {

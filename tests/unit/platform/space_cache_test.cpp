@@ -89,7 +89,7 @@ TEST_F(SpaceCacheTest, HasNoCachePrintsNothingAtLevel1) {
 TEST_F(SpaceCacheTest, HasNoCacheSaysSoAtLevel2) {
     CapturedLog log(2);
     EXPECT_EQ(SpaceHasCache("uuid-9"), 0);
-    EXPECT_EQ(log.Messages().back(),
+    EXPECT_EQ(LastOf(log.Messages()),
               "SpaceHasCache() [N]: Space (uuid-9) doesn't be found in the config");
 }
 
@@ -213,7 +213,7 @@ TEST_F(SpaceCacheTest, AnswersAreToldAtLevel2) {
     Cache().supportPin = 0;
     CapturedLog no(2);
     EXPECT_EQ(SpaceHasCacheAndSupportPin("/volume1"), 0);
-    EXPECT_EQ(no.Messages().back(), "SpaceHasCacheAndSupportPinByUUID() [N]: supportPin=0");
+    EXPECT_EQ(LastOf(no.Messages()), "SpaceHasCacheAndSupportPinByUUID() [N]: supportPin=0");
 }
 
 TEST_F(SpaceCacheTest, SpaceWithoutCacheHasNoPinSupport) {
@@ -223,15 +223,15 @@ TEST_F(SpaceCacheTest, SpaceWithoutCacheHasNoPinSupport) {
     EXPECT_EQ(silent.Text(), "");
     CapturedLog log(2);
     EXPECT_EQ(SpaceHasCacheAndSupportPinByUUID("uuid-1"), 0);
-    EXPECT_EQ(log.Messages().back(), "SpaceHasCacheAndSupportPinByUUID() [N]: Space (UUID = "
-                                     "uuid-1) doesn't has cache");
+    EXPECT_EQ(LastOf(log.Messages()), "SpaceHasCacheAndSupportPinByUUID() [N]: Space (UUID = "
+                                      "uuid-1) doesn't has cache");
 }
 
 TEST_F(SpaceCacheTest, PathThatIsNoVolumeIsAnErrorAndHasNoPinSupport) {
     CapturedLog log(2);
     EXPECT_EQ(SpaceHasCacheAndSupportPin("/home"), 0);
-    EXPECT_EQ(log.Messages().back(), "SpaceHasCacheAndSupportPin() [N] : ***** Can't get space "
-                                     "uuid from mount path (/home)");
+    EXPECT_EQ(LastOf(log.Messages()), "SpaceHasCacheAndSupportPin() [N] : ***** Can't get space "
+                                      "uuid from mount path (/home)");
 }
 
 TEST_F(SpaceCacheTest, CacheThatVanishesWhileItIsAskedForIsAnErrorAndHasNoPinSupport) {

@@ -214,7 +214,7 @@ TEST_F(MessageQueueTest, AKeyThatNamesNoQueueFails) {
     EXPECT_EQ(MsgQueueGet(KeyFile()), -1);
     EXPECT_TRUE(
         log.Has("MsgQueueGet() [N] : ***** Can't open message queue: No such file or directory"));
-    EXPECT_EQ(log.Messages().back(), "MsgQueueGet() [N] : -----");
+    EXPECT_EQ(LastOf(log.Messages()), "MsgQueueGet() [N] : -----");
 }
 
 TEST_F(MessageQueueTest, TheKeyIsTheNumberThatTheFirstLineBeginsWith) {

@@ -76,7 +76,9 @@ TEST_F(ReceiverTest, AFileThatDoesNotExistStopsIt) {
     Put(requestPinFiles, volume_, volume_ + "/missing");
     CapturedLog log(2);
     RunReceiver();
-    EXPECT_EQ(MessagesOf(log, "GetRequests").rbegin()[1],
+    const Messages messages = MessagesOf(log, "GetRequests");
+    ASSERT_GE(messages.size(), 2U);
+    EXPECT_EQ(messages.rbegin()[1],
               "GetRequests() [N] : ***** Can't add request to config (" + config_ + ")");
 }
 

@@ -28,7 +28,7 @@ TEST_F(RequestHandlersTest, APinWritesTheBitmapThenSendsItThenReads) {
 TEST_F(RequestHandlersTest, APinAddsToTheStoredBitmap) {
     WriteWhole(bitmapFile_, std::string("\x80\x10", 2));
     EXPECT_EQ(Handle(requestPinFiles, "a#1"), 0);
-    EXPECT_EQ(device_->events.front(), "bitmap 8110 file 8110");
+    EXPECT_EQ(FirstOf(device_->events), "bitmap 8110 file 8110");
 }
 
 TEST_F(RequestHandlersTest, LookupsGoByFolderAndInode) {

@@ -175,6 +175,7 @@ TEST_F(RequestWorkerTest, AFailedRequestIsFollowedByTheNextWithoutAPause) {
     const Messages messages = log.Messages();
     EXPECT_EQ(log.Count("Handle request error (num = 0, type = pinFiles), drop it."), 1);
     EXPECT_EQ(log.Count("Handle request error (num = 1, type = ack), drop it."), 1);
+    ASSERT_GE(messages.size(), 4U);
     EXPECT_EQ(*(messages.end() - 4), "Handle request (type=reloadPinBlocks) OK ");
 }
 

@@ -69,9 +69,9 @@ TEST_F(ReadFileTest, TheEndOfTheFileIsSuccess) {
     CapturedLog log(2);
     EXPECT_EQ(Read(1000), 0);
     EXPECT_EQ(device_->events, (Events{"read 0+65536", "read 65536+65536", "read 69632+65536"}));
-    EXPECT_EQ(WithoutTimes(log.Messages()).back(), "FileReadToCache() [N]: Read file (" +
-                                                       device_->Path() +
-                                                       ") finish, Time=T Num read=69632");
+    EXPECT_EQ(LastOf(WithoutTimes(log.Messages())), "FileReadToCache() [N]: Read file (" +
+                                                        device_->Path() +
+                                                        ") finish, Time=T Num read=69632");
 }
 
 TEST_F(ReadFileTest, AFileThatHasGoneIsSkipped) {
@@ -81,7 +81,7 @@ TEST_F(ReadFileTest, AFileThatHasGoneIsSkipped) {
               Messages{"File (/missing/file) doesn't exist (might due to be renamed), skip it"});
     CapturedLog verbose(2);
     EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), 0);
-    EXPECT_EQ(verbose.Messages().back(),
+    EXPECT_EQ(LastOf(verbose.Messages()),
               "FileReadToCache() [N] : File (/missing/file) doesn't exist (might due to be "
               "renamed), skip it");
 }

@@ -230,7 +230,7 @@ TEST_F(ReloadBlocksTest, AFailingLastRangeFails) {
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
     EXPECT_EQ(Reload("\x80"), 1);
-    EXPECT_EQ(log.Messages().back(),
+    EXPECT_EQ(LastOf(log.Messages()),
               "ReloadPinBlocksToCache() [N] : ***** Read range to cache failed");
 }
 
