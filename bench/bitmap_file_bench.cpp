@@ -1,8 +1,8 @@
 // Loading and saving a bitmap file, against a plain loop over the same chunks.
 #include "bench_names.h"
 
+#include "base/log.h"
 #include "bitmap/bitmap_file.h"
-#include "cli/log.h"
 
 #include <cstdio>
 #include <fcntl.h>

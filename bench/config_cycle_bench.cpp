@@ -2,11 +2,11 @@
 // recorded; against the same two readings and writings with jsoncpp alone.
 #include "bench_names.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "config/pinned_files.h"
 #include "config/request_queue.h"
-#include "config/request_type.h"
-#include "service/service_state.h"
+#include "request/request_type.h"
+#include "state/service_state.h"
 
 #include <cstdio>
 #include <cstdlib>

@@ -2,9 +2,9 @@
 // the kernel needs for a zero page and no more.
 #include "bench_names.h"
 
+#include "base/log.h"
 #include "bitmap/pin_bitmap.h"
-#include "cli/log.h"
-#include "service/service_state.h"
+#include "state/service_state.h"
 #include "warming/read_range.h"
 #include "warming/reload_blocks.h"
 

@@ -1,9 +1,9 @@
 // warm MOUNT_PATH FILE...: reads the files into the cache as a pin request does, once their extents
 // are known; prints the seconds.
-#include "bitmap/file_extents.h"
-#include "cli/log.h"
-#include "platform/path.h"
-#include "service/service_state.h"
+#include "base/log.h"
+#include "files/path.h"
+#include "space/file_extents.h"
+#include "state/service_state.h"
 #include "warming/read_range.h"
 #include "warming/warm_files.h"
 

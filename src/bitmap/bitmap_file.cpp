@@ -1,8 +1,8 @@
 #include "bitmap/bitmap_file.h"
 
-#include "cli/log.h"
-#include "platform/path.h"
-#include "platform/scoped_fd.h"
+#include "base/log.h"
+#include "base/scoped_fd.h"
+#include "files/path.h"
 
 #include <algorithm>
 #include <fcntl.h>

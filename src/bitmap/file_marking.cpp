@@ -1,7 +1,7 @@
 #include "bitmap/file_marking.h"
 
-#include "bitmap/file_extents.h"
-#include "cli/log.h"
+#include "base/log.h"
+#include "space/file_extents.h"
 
 #include <chrono>
 

@@ -1,6 +1,6 @@
 #include "bitmap/pin_bitmap.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 
 #include <algorithm>
 #include <cstdlib>

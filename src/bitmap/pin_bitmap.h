@@ -8,14 +8,9 @@
 #ifndef BITMAP_PIN_BITMAP_H
 #define BITMAP_PIN_BITMAP_H
 
-#include <cstdint>
+#include "driver/pin_interface.h"
 
-// Also the descriptor that the cache driver reads (8 bytes on the 32-bit target): field order
-// counts.
-struct PinBitmap {
-    unsigned char *data; // malloc'd, owned by the record
-    uint32_t size;       // bytes of data
-};
+#include <cstdint>
 
 const unsigned bitmapSectorShift = 7; // sectors to blocks: 128 sectors of 512 bytes
 const unsigned bitmapByteShift = 16;  // bytes to blocks: 64 KiB

@@ -1,12 +1,12 @@
 #include "bitmap/space_bitmap.h"
 
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "bitmap/bitmap_file.h"
-#include "cli/log.h"
-#include "platform/device.h"
-#include "platform/malloc_text.h"
-#include "platform/path.h"
-#include "platform/space_bitmap_path.h"
-#include "platform/space_cache.h"
+#include "driver/device.h"
+#include "files/path.h"
+#include "space/space_bitmap_path.h"
+#include "space/space_cache.h"
 
 #include <cstdlib>
 

@@ -1,20 +1,20 @@
 // The program's entry: parses the command line, runs the one command it names, prints what scripts
 // read and turns the outcome into the exit status.
-#include "cli/log.h"
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "cli/options.h"
-#include "cli/tool_parameters.h"
 #include "cli/usage.h"
 #include "commands/bitmap_development.h"
 #include "commands/client_requests.h"
 #include "commands/inspection.h"
 #include "commands/unpin_all.h"
+#include "commands/unpin_range.h"
 #include "commands/volume_events.h"
 #include "driver/bitmap_control.h"
-#include "driver/unpin_ranges.h"
-#include "platform/malloc_text.h"
-#include "platform/space.h"
-#include "platform/space_cache.h"
+#include "request/tool_parameters.h"
 #include "service/start_service.h"
+#include "space/space.h"
+#include "space/space_cache.h"
 
 #include <cstdio>
 #include <json/value.h>

@@ -1,10 +1,10 @@
 #include "cli/options.h"
 
-#include "cli/log.h"
+#include "base/log.h"
+#include "cli/file_list.h"
 #include "cli/usage.h"
-#include "platform/file_list.h"
-#include "platform/path.h"
-#include "platform/space_cache.h"
+#include "files/path.h"
+#include "space/space_cache.h"
 
 #include <cstdio>
 #include <cstdlib>

@@ -4,7 +4,7 @@
 #ifndef CLI_OPTIONS_H
 #define CLI_OPTIONS_H
 
-#include "cli/tool_parameters.h"
+#include "request/tool_parameters.h"
 
 // What the command options ask for; several command options add up.
 struct RequiredParameters {

@@ -1,6 +1,6 @@
 #include "cli/usage.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 
 #include <cstdio>
 

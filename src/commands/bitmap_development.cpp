@@ -1,13 +1,13 @@
 #include "commands/bitmap_development.h"
 
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "bitmap/bitmap_file.h"
 #include "bitmap/space_bitmap.h"
-#include "cli/log.h"
 #include "driver/bitmap_control.h"
-#include "platform/malloc_text.h"
-#include "platform/space.h"
-#include "platform/space_bitmap_path.h"
-#include "platform/space_cache.h"
+#include "space/space.h"
+#include "space/space_bitmap_path.h"
+#include "space/space_cache.h"
 
 namespace {
 

@@ -1,10 +1,10 @@
 #include "commands/client_requests.h"
 
-#include "cli/log.h"
-#include "cli/tool_parameters.h"
-#include "config/request_type.h"
-#include "platform/space_cache.h"
-#include "service/message_queue.h"
+#include "base/log.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
+#include "request/tool_parameters.h"
+#include "space/space_cache.h"
 
 #include <cerrno>
 #include <cstring>

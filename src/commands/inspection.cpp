@@ -1,16 +1,16 @@
 #include "commands/inspection.h"
 
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "bitmap/bitmap_file.h"
 #include "bitmap/space_bitmap.h"
-#include "cli/log.h"
 #include "config/config_document.h"
 #include "driver/bitmap_control.h"
-#include "platform/malloc_text.h"
-#include "platform/path.h"
-#include "platform/relative_path.h"
-#include "platform/space.h"
-#include "platform/space_bitmap_path.h"
-#include "platform/space_cache.h"
+#include "files/path.h"
+#include "space/relative_path.h"
+#include "space/space.h"
+#include "space/space_bitmap_path.h"
+#include "space/space_cache.h"
 
 #include <string>
 

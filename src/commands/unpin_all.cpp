@@ -1,11 +1,11 @@
 #include "commands/unpin_all.h"
 
-#include "cli/log.h"
-#include "cli/tool_parameters.h"
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "driver/device_ioctl.h"
 #include "driver/pin_interface.h"
-#include "platform/malloc_text.h"
-#include "platform/space_cache.h"
+#include "request/tool_parameters.h"
+#include "space/space_cache.h"
 
 int UnpinAllBlocksByCachePath(const char *cachePath) {
     if (cachePath == nullptr) {

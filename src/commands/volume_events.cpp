@@ -1,11 +1,11 @@
 #include "commands/volume_events.h"
 
-#include "cli/log.h"
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "config/pinned_files.h"
-#include "platform/malloc_text.h"
-#include "platform/path.h"
-#include "platform/space_bitmap_path.h"
-#include "platform/space_cache.h"
+#include "files/path.h"
+#include "space/space_bitmap_path.h"
+#include "space/space_cache.h"
 
 #include <unistd.h>
 

@@ -1,6 +1,6 @@
 #include "config/json_array.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 
 #include <algorithm>
 

@@ -1,7 +1,7 @@
 #include "config/json_file.h"
 
-#include "cli/log.h"
-#include "platform/file_replace.h"
+#include "base/log.h"
+#include "files/file_replace.h"
 
 #include <exception>
 #include <fstream>

@@ -1,13 +1,13 @@
 #include "config/pinned_files.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "config/config_document.h"
-#include "config/file_inode_list.h"
 #include "config/json_file.h"
 #include "config/request_queue.h"
-#include "config/request_type.h"
-#include "platform/path.h"
-#include "service/service_state.h"
+#include "files/path.h"
+#include "request/file_inode_list.h"
+#include "request/request_type.h"
+#include "state/service_state.h"
 
 #include <vector>
 

@@ -9,8 +9,8 @@
 #ifndef CONFIG_PINNED_FILES_H
 #define CONFIG_PINNED_FILES_H
 
-#include "config/request_record.h"
-#include "service/service_state.h"
+#include "request/request_record.h"
+#include "state/service_state.h"
 
 #include <json/value.h>
 #include <string>

@@ -9,8 +9,8 @@
 #ifndef CONFIG_REQUEST_QUEUE_H
 #define CONFIG_REQUEST_QUEUE_H
 
-#include "config/request_record.h"
-#include "service/service_state.h"
+#include "request/request_record.h"
+#include "state/service_state.h"
 
 #include <json/value.h>
 #include <string>

@@ -1,8 +1,7 @@
 #include "driver/bitmap_control.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "driver/device_ioctl.h"
-#include "driver/pin_interface.h"
 
 static_assert(sizeof(void *) != 4 || sizeof(PinBitmap) == pinBitmapDescriptorBytes,
               "the record is the descriptor that the driver of the 32-bit target reads");

@@ -4,7 +4,7 @@
 #ifndef DRIVER_BITMAP_CONTROL_H
 #define DRIVER_BITMAP_CONTROL_H
 
-#include "bitmap/pin_bitmap.h"
+#include "driver/pin_interface.h"
 
 // Hands over the whole bitmap. 0, or -1 after an error message (also for null arguments).
 int BitmapSendToDriver(PinBitmap *bitmap, const char *cachePath);

@@ -1,7 +1,7 @@
 #include "driver/device_ioctl.h"
 
-#include "cli/log.h"
-#include "platform/scoped_fd.h"
+#include "base/log.h"
+#include "base/scoped_fd.h"
 
 #include <fcntl.h>
 #include <sys/ioctl.h>

@@ -17,6 +17,13 @@ const unsigned pinIoctlQueryAllUnpinned = 0x8004FED2; // payload: 32-bit int, fi
 // Size of the bitmap descriptor (bytes): a 32-bit address and a 32-bit length.
 const int pinBitmapDescriptorBytes = 8;
 
+// A pin bitmap, and the descriptor that the driver reads (8 bytes on the 32-bit target): field
+// order counts. What the bits mean stands in bitmap/pin_bitmap.h.
+struct PinBitmap {
+    unsigned char *data; // malloc'd, owned by the record
+    uint32_t size;       // bytes of data
+};
+
 // One sector range to release; 16 bytes, little-endian on the target.
 struct UnpinInfo {
     alignas(8) uint64_t

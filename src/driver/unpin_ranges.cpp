@@ -1,9 +1,7 @@
 #include "driver/unpin_ranges.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "driver/device_ioctl.h"
-#include "platform/malloc_text.h"
-#include "platform/space_cache.h"
 
 #include <sys/types.h>
 
@@ -13,22 +11,6 @@ void DumpRanges(const UnpinInfo *ranges, size_t count) {
                   static_cast<ssize_t>(i), LogU64(ranges[i].startSector),
                   LogU64(ranges[i].numSectors));
     }
-}
-
-int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
-    LogTraceScope();
-    const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
-    if (!cachePath) {
-        LogError("Can't get cache path of volume (%s)", mountPath);
-        return -1;
-    }
-    UnpinList list{};
-    list.ranges[0] = {startSector, numSectors};
-    if (DoIoctl(cachePath.get(), pinIoctlUnpinRanges, &list, unpinListBytes) < 0) {
-        LogError("Send unpin inctl to driver failed");
-        return -1;
-    }
-    return 0;
 }
 
 int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &ranges) {

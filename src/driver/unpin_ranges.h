@@ -7,14 +7,10 @@
 #include "driver/pin_interface.h"
 
 #include <cstddef>
-#include <cstdint>
 #include <vector>
 
 // Logs each range, at every level.
 void DumpRanges(const UnpinInfo *ranges, size_t count);
-
-// Releases one range (512-byte sectors) of the volume's cache. 0, or -1 after an error message.
-int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors);
 
 // Releases the ranges, 1024 to a request. The range whose turn comes when a full list is sent is
 // dropped: of 1025 ranges the last stays pinned, of 1026 the second list holds only the last. 0, or

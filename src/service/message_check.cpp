@@ -1,7 +1,7 @@
 #include "service/message_check.h"
 
-#include "cli/log.h"
-#include "config/request_type.h"
+#include "base/log.h"
+#include "request/request_type.h"
 
 int CheckNormalMsg(const RequestMessage *message) {
     const RequestRecord &record = message->record;

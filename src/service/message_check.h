@@ -2,7 +2,7 @@
 #ifndef SERVICE_MESSAGE_CHECK_H
 #define SERVICE_MESSAGE_CHECK_H
 
-#include "service/message.h"
+#include "request/message.h"
 
 // 0, or -1 after an error message when the mount path is empty, or the files are in a pin or unpin
 // request.

@@ -1,13 +1,13 @@
 #include "service/receiver.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "config/request_queue.h"
-#include "config/request_type.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
 #include "service/message_check.h"
-#include "service/message_queue.h"
 #include "service/receiver_rest.h"
-#include "service/service_state.h"
 #include "service/signal_handler.h"
+#include "state/service_state.h"
 
 #include <cerrno>
 #include <cstring>

@@ -10,8 +10,8 @@
 #define SERVICE_REQUEST_HANDLERS_H
 
 #include "bitmap/pin_bitmap.h"
-#include "config/file_inode_list.h"
-#include "config/request_record.h"
+#include "request/file_inode_list.h"
+#include "request/request_record.h"
 
 #include <vector>
 

@@ -1,11 +1,11 @@
 #include "service/request_worker.h"
 
-#include "cli/log.h"
-#include "cli/tool_parameters.h"
-#include "config/next_request.h"
+#include "base/log.h"
 #include "config/pinned_files.h"
 #include "config/request_queue.h"
-#include "config/request_type.h"
+#include "request/request_type.h"
+#include "request/tool_parameters.h"
+#include "service/next_request.h"
 #include "service/request_handlers.h"
 #include "service/signal_handler.h"
 

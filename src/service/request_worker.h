@@ -6,7 +6,7 @@
 #ifndef SERVICE_REQUEST_WORKER_H
 #define SERVICE_REQUEST_WORKER_H
 
-#include "config/request_record.h"
+#include "request/request_record.h"
 
 #include <string>
 

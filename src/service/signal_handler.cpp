@@ -1,6 +1,6 @@
 #include "service/signal_handler.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "service/receiver_rest.h"
 
 #include <atomic>

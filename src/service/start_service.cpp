@@ -1,12 +1,12 @@
 #include "service/start_service.h"
 
-#include "cli/log.h"
-#include "cli/tool_parameters.h"
-#include "platform/file_leftovers.h"
+#include "base/log.h"
+#include "files/file_leftovers.h"
+#include "request/tool_parameters.h"
 #include "service/receiver.h"
 #include "service/request_worker.h"
-#include "service/service_state.h"
 #include "service/signal_handler.h"
+#include "state/service_state.h"
 
 #include <cerrno>
 #include <cstring>

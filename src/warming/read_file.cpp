@@ -1,8 +1,8 @@
 #include "warming/read_file.h"
 
-#include "cli/log.h"
-#include "platform/scoped_fd.h"
-#include "service/service_state.h"
+#include "base/log.h"
+#include "base/scoped_fd.h"
+#include "state/service_state.h"
 #include "warming/read_range.h"
 
 #include <fcntl.h>

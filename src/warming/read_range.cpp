@@ -1,7 +1,7 @@
 #include "warming/read_range.h"
 
+#include "base/log.h"
 #include "bitmap/pin_bitmap.h"
-#include "cli/log.h"
 
 #include <algorithm>
 #include <cstdlib>

@@ -7,7 +7,7 @@
 #ifndef WARMING_READ_RANGE_H
 #define WARMING_READ_RANGE_H
 
-#include "platform/malloc_text.h"
+#include "base/malloc_text.h"
 
 #include <cstddef>
 #include <cstdint>

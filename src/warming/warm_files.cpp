@@ -1,10 +1,10 @@
 #include "warming/warm_files.h"
 
-#include "cli/log.h"
-#include "platform/malloc_text.h"
-#include "platform/scoped_fd.h"
-#include "platform/space_cache.h"
-#include "service/service_state.h"
+#include "base/log.h"
+#include "base/malloc_text.h"
+#include "base/scoped_fd.h"
+#include "space/space_cache.h"
+#include "state/service_state.h"
 #include "warming/read_range.h"
 
 #include <fcntl.h>

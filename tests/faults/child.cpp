@@ -1,6 +1,6 @@
-#include "faults/child.h"
+#include "tests/faults/child.h"
 
-#include "faults/world.h"
+#include "tests/faults/world.h"
 
 #include <algorithm>
 #include <chrono>

@@ -2,7 +2,7 @@
 #ifndef TESTS_FAULTS_CHILD_H
 #define TESTS_FAULTS_CHILD_H
 
-#include "faults/scenario.h"
+#include "tests/faults/scenario.h"
 
 #include <string>
 #include <sys/types.h>

@@ -1,4 +1,4 @@
-#include "faults/crash_points.h"
+#include "tests/faults/crash_points.h"
 
 #include <algorithm>
 #include <memory>

@@ -6,9 +6,9 @@
 // fault_runner. Every time the service must start, have every request that it had done with, carry
 // each queued one out once, and come to the document, bitmap file and driver's bitmap that a run
 // without a crash has after as many requests. Ends with 1 where that does not hold.
-#include "faults/child.h"
-#include "faults/crash_points.h"
-#include "faults/world.h"
+#include "tests/faults/child.h"
+#include "tests/faults/crash_points.h"
+#include "tests/faults/world.h"
 
 #include <algorithm>
 #include <csignal>

@@ -5,8 +5,8 @@
 // options, and covers the program and its libraries, but not what the C library calls inside
 // itself. When the call is reached, a byte goes to descriptor 9. At the program's orderly end the
 // number of allocations that are not freed follows there as " N".
-#include "faults/fail_call.h"
-#include "faults/real_call.h"
+#include "tests/faults/fail_call.h"
+#include "tests/faults/real_call.h"
 
 #include <atomic>
 #include <cerrno>

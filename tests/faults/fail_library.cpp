@@ -1,7 +1,7 @@
 // The functions of the appliance's libraries, which fail as one kind, "library": each in the way
 // that its declaration says.
-#include "faults/fail_call.h"
-#include "faults/real_call.h"
+#include "tests/faults/fail_call.h"
+#include "tests/faults/real_call.h"
 
 #include "vesk/flash_cache.h"
 #include "vesk/storage_core.h"

@@ -4,7 +4,7 @@
 // run ends without having reached the call; memory allocations in steps of STEP. To be run in a
 // private world with a volume at /volume1 that holds the files a and b. Prints the number of runs;
 // ends with 1 when one of them broke a promise, and tells which.
-#include "faults/scenario.h"
+#include "tests/faults/scenario.h"
 
 #include <cerrno>
 #include <climits>

@@ -6,8 +6,8 @@
 // second: the slowest end tells more about what else the machine does. SIGKILL may lose at
 // most the one that was just taken off the queue; the document must be whole after every end, and
 // in the end every stored request must have been carried out. Ends with 1 where that does not hold.
-#include "faults/child.h"
-#include "faults/world.h"
+#include "tests/faults/child.h"
+#include "tests/faults/world.h"
 
 #include <algorithm>
 #include <chrono>

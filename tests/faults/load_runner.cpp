@@ -6,8 +6,8 @@
 // service must carry out every request once, each client's in the order in which they were sent,
 // with its memory and descriptors flat, and end with 0. Prints the figures; ends with 1 where that
 // does not hold.
-#include "faults/child.h"
-#include "faults/world.h"
+#include "tests/faults/child.h"
+#include "tests/faults/world.h"
 
 #include <algorithm>
 #include <chrono>

@@ -8,7 +8,7 @@
 // "sync" of a folder makes its names durable. Two more lines tell what others know: "driver" when a
 // bitmap was handed over, "receive" when the service asks for its next message. Operations are
 // written down in the order in which they were done.
-#include "faults/real_call.h"
+#include "tests/faults/real_call.h"
 
 #include <cstdarg>
 #include <cstdio>

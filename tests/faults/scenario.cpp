@@ -1,7 +1,7 @@
-#include "faults/scenario.h"
+#include "tests/faults/scenario.h"
 
-#include "faults/child.h"
-#include "faults/world.h"
+#include "tests/faults/child.h"
+#include "tests/faults/world.h"
 
 #include <json/reader.h>
 #include <json/value.h>

@@ -1,4 +1,4 @@
-#include "faults/world.h"
+#include "tests/faults/world.h"
 
 #include <cstdlib>
 #include <cstring>

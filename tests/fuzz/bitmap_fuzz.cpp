@@ -2,11 +2,11 @@
 //
 // Input: length of the bitmap (2 bytes), number of ranges, for each a byte (bit 0: set) and two
 // numbers of 8 bytes; the file.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
+#include "base/log.h"
 #include "bitmap/bitmap_file.h"
 #include "bitmap/pin_bitmap.h"
-#include "cli/log.h"
 
 #include <algorithm>
 #include <cstdlib>

@@ -1,5 +1,5 @@
 // A cache configuration of any bytes: refused without caches, or every cache whole.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
 #include "flash_cache/cache_config.h"
 

@@ -3,16 +3,16 @@
 // be used.
 //
 // Input: a byte of operations (a bit each), a byte that chooses the request, the document.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "config/config_document.h"
-#include "config/next_request.h"
 #include "config/pinned_files.h"
 #include "config/request_queue.h"
-#include "config/request_type.h"
-#include "service/service_state.h"
-#include "support/fake_appliance.h"
+#include "request/request_type.h"
+#include "service/next_request.h"
+#include "state/service_state.h"
+#include "tests/support/fake_appliance.h"
 
 #include <cstring>
 #include <json/value.h>

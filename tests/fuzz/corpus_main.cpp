@@ -1,6 +1,6 @@
 // In place of the fuzzing engine: gives every file of the folders that are named to the target,
 // once. Messages of the code under test go nowhere. Prints how many there were; none is a failure.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
 #include <cstdio>
 #include <fcntl.h>

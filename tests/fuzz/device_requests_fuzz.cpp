@@ -3,10 +3,10 @@
 // one where nothing is.
 //
 // Input: operations, a byte each and what they need (see Step).
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
 #include "cachedev/pin_requests.h"
-#include "cachedev/test_device.h"
+#include "tests/support/test_device.h"
 
 #include <algorithm>
 #include <cstring>

@@ -1,9 +1,9 @@
 // A file-inode list of any bytes. What was read is written as the format says and read again: the
 // same records come back.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
-#include "cli/log.h"
-#include "config/file_inode_list.h"
+#include "base/log.h"
+#include "request/file_inode_list.h"
 
 #include <cstring>
 #include <vector>

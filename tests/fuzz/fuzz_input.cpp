@@ -1,4 +1,4 @@
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
 #include <algorithm>
 #include <cstdio>

@@ -1,9 +1,9 @@
 // A key file of any bytes. A text without a number ends the process by the exception of the
 // conversion, and by no other.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
-#include "cli/log.h"
-#include "service/message_queue.h"
+#include "base/log.h"
+#include "request/message_queue.h"
 
 #include <stdexcept>
 

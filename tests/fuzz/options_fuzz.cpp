@@ -2,12 +2,12 @@
 // options that nothing handles) are left out.
 //
 // Input: the words, a NUL behind each.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "cli/options.h"
-#include "cli/tool_parameters.h"
-#include "support/fake_appliance.h"
+#include "request/tool_parameters.h"
+#include "tests/support/fake_appliance.h"
 
 #include <getopt.h>
 #include <vector>

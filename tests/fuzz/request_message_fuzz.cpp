@@ -2,15 +2,15 @@
 // document stays one that can be used, and every message is taken.
 //
 // Input: messages, each a length (2 bytes) and its text.
-#include "fuzz/fuzz_input.h"
+#include "tests/fuzz/fuzz_input.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 #include "config/config_document.h"
-#include "service/message_queue.h"
-#include "service/private_world.h"
+#include "request/message_queue.h"
 #include "service/receiver.h"
-#include "service/service_state.h"
 #include "service/signal_handler.h"
+#include "state/service_state.h"
+#include "tests/support/private_world.h"
 
 #include <cstdio>
 #include <cstdlib>

@@ -1,6 +1,6 @@
 // The flash-cache library as a test scripts it.
 #include "vesk/flash_cache.h"
-#include "script.h"
+#include "tests/system/scripted/script.h"
 
 #include <cstdio>
 #include <cstdlib>

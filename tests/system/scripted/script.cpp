@@ -1,4 +1,4 @@
-#include "script.h"
+#include "tests/system/scripted/script.h"
 
 #include <cstdlib>
 #include <fcntl.h>

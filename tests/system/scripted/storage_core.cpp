@@ -1,6 +1,6 @@
 // The storage-core library as a test scripts it.
 #include "vesk/storage_core.h"
-#include "script.h"
+#include "tests/system/scripted/script.h"
 
 #include <atomic>
 #include <cstdlib>

@@ -1,9 +1,9 @@
 #include "bitmap/bitmap_file.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
-#include "support/private_mounts.h"
-#include "support/temp_dir.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/private_mounts.h"
+#include "tests/support/temp_dir.h"
 
 #include <cerrno>
 #include <gtest/gtest.h>
@@ -11,6 +11,8 @@
 #include <unistd.h>
 
 namespace {
+
+const bool privateMounts = UsePrivateMounts();
 
 using Messages = std::vector<std::string>;
 

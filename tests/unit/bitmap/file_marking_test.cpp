@@ -1,7 +1,7 @@
 #include "bitmap/file_marking.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
 
 #include <gtest/gtest.h>
 

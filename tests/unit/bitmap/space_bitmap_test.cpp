@@ -1,8 +1,8 @@
 #include "bitmap/space_bitmap.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
-#include "support/temp_dir.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/temp_dir.h"
 
 #include <cerrno>
 #include <cstdlib>

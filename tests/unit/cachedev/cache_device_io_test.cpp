@@ -2,8 +2,8 @@
 // fails.
 #include "cachedev/cache_device.h"
 
-#include "support/thread_state.h"
-#include "test_device.h"
+#include "tests/support/test_device.h"
+#include "tests/support/thread_state.h"
 
 #include <gtest/gtest.h>
 

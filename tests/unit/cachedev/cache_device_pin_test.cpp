@@ -1,7 +1,7 @@
 // Pinning: the bitmap, what a read pins, and what releases it.
 #include "cachedev/cache_device.h"
 
-#include "test_device.h"
+#include "tests/support/test_device.h"
 
 #include <gtest/gtest.h>
 

@@ -3,7 +3,7 @@
 #include "cachedev/cache_device.h"
 
 #include "cachedev/pin_requests.h"
-#include "test_device.h"
+#include "tests/support/test_device.h"
 
 #include <gtest/gtest.h>
 

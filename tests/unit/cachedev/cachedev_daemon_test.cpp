@@ -1,8 +1,8 @@
 // The daemon itself, through the kernel.
 #include "cachedev/driver_requests.h"
-#include "private_world.h"
-#include "test_daemon.h"
-#include "test_device.h"
+#include "tests/support/test_device.h"
+#include "tests/unit/cachedev/private_world.h"
+#include "tests/unit/cachedev/test_daemon.h"
 
 #include <gtest/gtest.h>
 

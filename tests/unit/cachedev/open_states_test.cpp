@@ -1,6 +1,6 @@
 #include "cachedev/open_states.h"
 
-#include "test_device.h"
+#include "tests/support/test_device.h"
 
 #include <gtest/gtest.h>
 

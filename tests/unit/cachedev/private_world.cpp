@@ -1,6 +1,6 @@
-#include "private_world.h"
+#include "tests/unit/cachedev/private_world.h"
 
-#include "test_device.h"
+#include "tests/support/test_device.h"
 
 #include <gtest/gtest.h>
 

@@ -1,7 +1,7 @@
-#include "test_daemon.h"
+#include "tests/unit/cachedev/test_daemon.h"
 
 #include "cachedev/driver_requests.h"
-#include "test_device.h"
+#include "tests/support/test_device.h"
 
 #include <gtest/gtest.h>
 

@@ -1,12 +1,12 @@
-#include "cli/fake_commands.h"
+#include "tests/unit/cli/fake_commands.h"
 
-#include "cli/log.h"
-#include "cli/tool_parameters.h"
+#include "base/log.h"
 #include "commands/bitmap_development.h"
 #include "commands/client_requests.h"
 #include "commands/inspection.h"
 #include "commands/unpin_all.h"
 #include "commands/volume_events.h"
+#include "request/tool_parameters.h"
 #include "service/start_service.h"
 
 #include <cstdio>

@@ -1,5 +1,5 @@
 // The operations behind the commands, replaced by ones that print their name and arguments to
-// standard output and answer what the test says. What platform/ and driver/ do for main is real.
+// standard output and answer what the test says. What space/ and driver/ do for main is real.
 #ifndef TESTS_CLI_FAKE_COMMANDS_H
 #define TESTS_CLI_FAKE_COMMANDS_H
 

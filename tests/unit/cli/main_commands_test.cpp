@@ -1,5 +1,5 @@
 // What each command runs, logs and ends with.
-#include "cli/main_fixture.h"
+#include "tests/unit/cli/main_fixture.h"
 
 namespace {
 

@@ -3,11 +3,11 @@
 #ifndef TESTS_CLI_MAIN_FIXTURE_H
 #define TESTS_CLI_MAIN_FIXTURE_H
 
-#include "cli/fake_commands.h"
-#include "cli/log.h"
-#include "cli/options_fixture.h"
-#include "cli/syslog_capture.h"
-#include "support/leak_checked_test.h"
+#include "base/log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/syslog_capture.h"
+#include "tests/unit/cli/fake_commands.h"
+#include "tests/unit/cli/options_fixture.h"
 
 #include <cstdlib>
 #include <gtest/gtest.h>

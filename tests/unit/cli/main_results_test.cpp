@@ -1,6 +1,6 @@
 // What commands print for scripts, and the exit status that goes with it. The driver and the
 // appliance answer as the test says.
-#include "cli/main_fixture.h"
+#include "tests/unit/cli/main_fixture.h"
 
 TEST_F(MainTest, BitmapSizeIsANumberAndALineFeed) {
     FakeCommands::bitmapSize = 18446744073709551615ULL;

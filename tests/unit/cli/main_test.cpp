@@ -1,8 +1,8 @@
 // What main does around every command: the program's name, the log level and the exit status.
-#include "cli/main_fixture.h"
+#include "tests/unit/cli/main_fixture.h"
 
 #include "cli/usage.h"
-#include "support/captured_log.h"
+#include "tests/support/captured_log.h"
 
 namespace {
 

@@ -2,8 +2,8 @@
 // and the mount path's trailing slash.
 #include "cli/options.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
 
 #include <gtest/gtest.h>
 

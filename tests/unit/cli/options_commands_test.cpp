@@ -1,8 +1,8 @@
 // Every command option: what it chooses, what it needs and what is said when that is missing.
 #include "cli/options.h"
 
-#include "cli/options_fixture.h"
-#include "support/captured_log.h"
+#include "tests/support/captured_log.h"
+#include "tests/unit/cli/options_fixture.h"
 
 #include <gtest/gtest.h>
 

@@ -1,8 +1,8 @@
 // Options that end the process where they stand.
 #include "cli/options.h"
 
-#include "cli/options_fixture.h"
-#include "support/captured_log.h"
+#include "tests/support/captured_log.h"
+#include "tests/unit/cli/options_fixture.h"
 
 #include <csignal>
 #include <gtest/gtest.h>

@@ -2,7 +2,7 @@
 #ifndef TESTS_CLI_OPTIONS_FIXTURE_H
 #define TESTS_CLI_OPTIONS_FIXTURE_H
 
-#include "support/leak_checked_test.h"
+#include "tests/support/leak_checked_test.h"
 
 #include "cli/options.h"
 

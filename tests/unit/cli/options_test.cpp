@@ -1,8 +1,8 @@
 #include "cli/options.h"
 
-#include "cli/options_fixture.h"
-#include "cli/syslog_capture.h"
-#include "support/captured_log.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/syslog_capture.h"
+#include "tests/unit/cli/options_fixture.h"
 
 #include <gtest/gtest.h>
 

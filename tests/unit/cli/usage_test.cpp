@@ -1,7 +1,7 @@
 #include "cli/usage.h"
 
-#include "cli/log.h"
-#include "support/captured_log.h"
+#include "base/log.h"
+#include "tests/support/captured_log.h"
 
 #include <gtest/gtest.h>
 

@@ -1,11 +1,11 @@
 #include "commands/client_requests.h"
 
-#include "commands/commands_fixture.h"
-#include "service/private_world.h"
+#include "tests/support/private_world.h"
+#include "tests/unit/commands/commands_fixture.h"
 
-#include "cli/tool_parameters.h"
-#include "config/request_type.h"
-#include "service/message_queue.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
+#include "request/tool_parameters.h"
 
 namespace {
 

@@ -2,13 +2,13 @@
 #ifndef TESTS_COMMANDS_COMMANDS_FIXTURE_H
 #define TESTS_COMMANDS_COMMANDS_FIXTURE_H
 
-#include "support/captured_log.h"
-#include "support/fake_appliance.h"
-#include "support/fake_libc.h"
-#include "support/leak_checked_test.h"
-#include "support/messages_of.h"
-#include "support/temp_dir.h"
-#include "warming/fake_cache_device.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/fake_appliance.h"
+#include "tests/support/fake_cache_device.h"
+#include "tests/support/fake_libc.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/messages_of.h"
+#include "tests/support/temp_dir.h"
 
 #include <filesystem>
 #include <gtest/gtest.h>

@@ -1,7 +1,7 @@
 // Whether one file is pinned.
 #include "commands/inspection.h"
 
-#include "commands/commands_fixture.h"
+#include "tests/unit/commands/commands_fixture.h"
 
 #include <sys/stat.h>
 

@@ -1,6 +1,6 @@
 #include "commands/inspection.h"
 
-#include "commands/commands_fixture.h"
+#include "tests/unit/commands/commands_fixture.h"
 
 #include <cerrno>
 

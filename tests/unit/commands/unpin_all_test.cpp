@@ -1,8 +1,8 @@
 #include "commands/unpin_all.h"
 
-#include "commands/commands_fixture.h"
+#include "tests/unit/commands/commands_fixture.h"
 
-#include "cli/tool_parameters.h"
+#include "request/tool_parameters.h"
 
 class UnpinAllTest : public CommandsTest {
 protected:

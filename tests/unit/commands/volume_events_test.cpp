@@ -1,7 +1,7 @@
 #include "commands/volume_events.h"
 
-#include "commands/commands_fixture.h"
-#include "config/ordinary_user.h"
+#include "tests/support/ordinary_user.h"
+#include "tests/unit/commands/commands_fixture.h"
 
 #include <json/reader.h>
 #include <sstream>

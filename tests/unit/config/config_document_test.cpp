@@ -1,6 +1,6 @@
 #include "config/config_document.h"
 
-#include "config/config_fixture.h"
+#include "tests/support/config_fixture.h"
 
 class ConfigDocumentTest : public ConfigTest {};
 

@@ -1,6 +1,6 @@
 #include "config/json_array.h"
 
-#include "config/config_fixture.h"
+#include "tests/support/config_fixture.h"
 
 class JsonArrayTest : public ConfigTest {};
 

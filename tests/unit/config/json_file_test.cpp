@@ -1,6 +1,6 @@
 #include "config/json_file.h"
 
-#include "config/config_fixture.h"
+#include "tests/support/config_fixture.h"
 
 #include <filesystem>
 #include <sys/stat.h>

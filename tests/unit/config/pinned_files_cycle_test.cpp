@@ -1,7 +1,7 @@
 // The file cycles of config/pinned_files.h.
 #include "config/pinned_files.h"
 
-#include "config/config_fixture.h"
+#include "tests/support/config_fixture.h"
 
 #include <sys/stat.h>
 

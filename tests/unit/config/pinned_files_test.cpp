@@ -1,6 +1,6 @@
 #include "config/pinned_files.h"
 
-#include "config/config_fixture.h"
+#include "tests/support/config_fixture.h"
 
 class PinnedFilesTest : public ConfigTest {
 protected:

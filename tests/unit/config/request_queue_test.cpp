@@ -1,6 +1,6 @@
 #include "config/request_queue.h"
 
-#include "config/config_fixture.h"
+#include "tests/support/config_fixture.h"
 
 #include <sys/stat.h>
 

@@ -1,7 +1,7 @@
 #include "driver/bitmap_control.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
 
 #include <cstring>
 #include <gtest/gtest.h>

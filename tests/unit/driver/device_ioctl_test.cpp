@@ -1,9 +1,9 @@
 #include "driver/device_ioctl.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
-#include "support/open_file.h"
-#include "support/temp_dir.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/open_file.h"
+#include "tests/support/temp_dir.h"
 
 #include <cerrno>
 #include <gtest/gtest.h>

@@ -1,68 +1,18 @@
 #include "driver/unpin_ranges.h"
 
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
-
-#include <cstring>
-#include <gtest/gtest.h>
+#include "tests/support/unpin_ranges_fixture.h"
 
 namespace {
 
-using Messages = std::vector<std::string>;
-
-const char device[] = "/dev/null"; // can be opened; what it is asked is answered by the test
-
-// Range i of a list: no field of it is zero and no two are alike.
-UnpinInfo Range(uint64_t i) {
-    return {0x0101000000000000 + i, 0x0202000000000000 + 3 * i};
-}
-
-class UnpinRangesTest : public LeakCheckedTest {
-protected:
-    void SetUp() override {
-        LeakCheckedTest::SetUp();
-        FakeLibc::onIoctl = [this](unsigned long request, void *data) {
-            EXPECT_EQ(request, 0xFED0UL);
-            sent.emplace_back(static_cast<const char *>(data), 16384);
-            return static_cast<int>(sent.size()) == refused ? -1 : 0;
-        };
-    }
-
-    static int Send(uint64_t count) {
-        std::vector<UnpinInfo> ranges;
-        for (uint64_t i = 0; i < count; ++i) {
-            ranges.push_back(Range(i));
-        }
-        return SendUnpinInfoToDriver(device, ranges);
-    }
-
-    // A whole request: the records of ranges `first` to `last` - 1, then zeros.
-    static std::string Request(uint64_t first, uint64_t last) {
-        std::string bytes;
-        for (uint64_t i = first; i < last; ++i) {
-            for (const uint64_t word : {Range(i).startSector, Range(i).numSectors}) {
-                for (unsigned shift = 0; shift < 64; shift += 8) {
-                    bytes.push_back(static_cast<char>(word >> shift & 0xFF));
-                }
-            }
-        }
-        bytes.resize(16384, '\0');
-        return bytes;
-    }
-
-    void ExpectSent(const std::vector<std::string> &requests) {
-        ASSERT_EQ(sent.size(), requests.size());
-        for (size_t i = 0; i < requests.size(); ++i) {
-            EXPECT_TRUE(sent[i] == requests[i]) << "request " << i;
-        }
-    }
-
-    std::vector<std::string> sent;
-    int refused = 0; // the number of the request that the driver refuses; 0: none
-};
-
 using SendUnpinInfoToDriverTest = UnpinRangesTest;
-using UnpinRangeTest = UnpinRangesTest;
+
+int Send(uint64_t count) {
+    std::vector<UnpinInfo> ranges;
+    for (uint64_t i = 0; i < count; ++i) {
+        ranges.push_back(Range(i));
+    }
+    return SendUnpinInfoToDriver(device, ranges);
+}
 
 } // namespace
 
@@ -182,40 +132,6 @@ TEST_F(SendUnpinInfoToDriverTest, TellsAFullListToo) {
                         "num sectors = 144678138029280253"));
     EXPECT_TRUE(log.Has("DumpRanges() [N] : Unpin range [0] start sector = 72339069014639617 "
                         "num sectors = 144678138029280259"));
-}
-
-TEST_F(UnpinRangeTest, SendsOneRecordToTheVolumesCache) {
-    FakeApplianceOneVolume(device);
-    CapturedLog log;
-    EXPECT_EQ(UnpinRange("/volume1", Range(7).startSector, Range(7).numSectors), 0);
-    ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(7, 8)}));
-    EXPECT_EQ(log.Text(), "");
-}
-
-TEST_F(UnpinRangeTest, FailsWhereTheVolumeHasNoCache) {
-    CapturedLog log;
-    EXPECT_EQ(UnpinRange("/volume1", 0, 1), -1);
-    EXPECT_EQ(log.Messages(), (Messages{"Can't get space uuid from reference path (/volume1)",
-                                        "Can't get cache path of volume (/volume1)"}));
-    ASSERT_NO_FATAL_FAILURE(ExpectSent({}));
-}
-
-TEST_F(UnpinRangeTest, FailsWhenTheDriverRefuses) {
-    FakeApplianceOneVolume(device);
-    refused = 1;
-    CapturedLog log(2);
-    EXPECT_EQ(UnpinRange("/volume1", 0, 1), -1);
-    const Messages messages = log.Messages();
-    EXPECT_EQ(FirstOf(messages), "UnpinRange() [N] : +++++");
-    EXPECT_EQ(messages.at(messages.size() - 2),
-              "UnpinRange() [N] : ***** Send unpin inctl to driver failed");
-    EXPECT_EQ(LastOf(messages), "UnpinRange() [N] : -----");
-}
-
-TEST_F(UnpinRangeTest, FailureMessageHasTheErrorMarker) {
-    CapturedLog log(2);
-    EXPECT_EQ(UnpinRange("/volume9", 0, 1), -1);
-    EXPECT_TRUE(log.Has("UnpinRange() [N] : ***** Can't get cache path of volume (/volume9)"));
 }
 
 TEST(DumpRanges, LogsEveryRangeAtEveryLevel) {

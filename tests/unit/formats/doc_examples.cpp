@@ -1,6 +1,6 @@
-#include "formats/doc_examples.h"
+#include "tests/unit/formats/doc_examples.h"
 
-#include "support/temp_dir.h"
+#include "tests/support/temp_dir.h"
 
 #include <sstream>
 #include <stdexcept>

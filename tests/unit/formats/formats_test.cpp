@@ -1,22 +1,22 @@
 // The examples in docs/formats.md are what the code writes and reads, byte for byte.
-#include "formats/doc_examples.h"
-#include "service/private_world.h"
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
-#include "support/temp_dir.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/private_world.h"
+#include "tests/support/temp_dir.h"
+#include "tests/unit/formats/doc_examples.h"
 
 #include "bitmap/bitmap_file.h"
-#include "cli/tool_parameters.h"
 #include "commands/client_requests.h"
 #include "config/config_document.h"
-#include "config/file_inode_list.h"
 #include "config/json_file.h"
 #include "config/pinned_files.h"
-#include "config/request_type.h"
 #include "driver/bitmap_control.h"
 #include "driver/unpin_ranges.h"
-#include "platform/file_text.h"
-#include "service/message_queue.h"
+#include "files/file_text.h"
+#include "request/file_inode_list.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
+#include "request/tool_parameters.h"
 
 #include <cstring>
 #include <sys/ipc.h>

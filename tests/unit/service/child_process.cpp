@@ -1,10 +1,10 @@
-#include "service/child_process.h"
+#include "tests/unit/service/child_process.h"
 
-#include "support/fake_libc.h"
-#include "support/temp_dir.h"
-#include "support/thread_state.h"
+#include "tests/support/fake_libc.h"
+#include "tests/support/temp_dir.h"
+#include "tests/support/thread_state.h"
 
-#include "cli/log.h"
+#include "base/log.h"
 
 #include <algorithm>
 #include <csignal>

@@ -3,17 +3,17 @@
 #ifndef TESTS_SERVICE_HANDLER_FIXTURE_H
 #define TESTS_SERVICE_HANDLER_FIXTURE_H
 
-#include "support/captured_log.h"
-#include "support/fake_appliance.h"
-#include "support/fake_libc.h"
-#include "support/leak_checked_test.h"
-#include "support/messages_of.h"
-#include "support/temp_dir.h"
-#include "warming/fake_cache_device.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/fake_appliance.h"
+#include "tests/support/fake_cache_device.h"
+#include "tests/support/fake_libc.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/messages_of.h"
+#include "tests/support/temp_dir.h"
 
-#include "config/request_record.h"
-#include "config/request_type.h"
-#include "service/service_state.h"
+#include "request/request_record.h"
+#include "request/request_type.h"
+#include "state/service_state.h"
 
 #include <cstdio>
 #include <filesystem>

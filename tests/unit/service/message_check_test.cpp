@@ -1,9 +1,9 @@
 #include "service/message_check.h"
 
-#include "service/private_world.h"
-#include "support/captured_log.h"
-#include "support/leak_checked_test.h"
-#include "support/messages_of.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/messages_of.h"
+#include "tests/support/private_world.h"
 
 #include <cstring>
 

@@ -2,13 +2,13 @@
 #ifndef TESTS_SERVICE_RECEIVER_FIXTURE_H
 #define TESTS_SERVICE_RECEIVER_FIXTURE_H
 
-#include "service/queue_fixture.h"
-#include "support/thread_state.h"
+#include "tests/support/queue_fixture.h"
+#include "tests/support/thread_state.h"
 
-#include "config/request_type.h"
-#include "service/message_queue.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
 #include "service/receiver.h"
-#include "service/service_state.h"
+#include "state/service_state.h"
 
 #include <atomic>
 #include <filesystem>

@@ -1,7 +1,7 @@
 // The receiver's pending-space messages.
 #include "service/receiver.h"
 
-#include "service/receiver_fixture.h"
+#include "tests/unit/service/receiver_fixture.h"
 
 #include <thread>
 

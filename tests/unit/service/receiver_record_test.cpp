@@ -1,7 +1,7 @@
 // Records that no well-meaning client sends.
 #include "service/receiver.h"
 
-#include "service/receiver_fixture.h"
+#include "tests/unit/service/receiver_fixture.h"
 
 #include <climits>
 

@@ -1,6 +1,6 @@
 #include "service/receiver.h"
 
-#include "service/receiver_fixture.h"
+#include "tests/unit/service/receiver_fixture.h"
 
 #include <csignal>
 #include <sys/msg.h>

@@ -1,7 +1,7 @@
 // What pin, unpin and reload have in common, and the reload.
 #include "service/request_handlers.h"
 
-#include "service/handler_fixture.h"
+#include "tests/unit/service/handler_fixture.h"
 
 #include <cerrno>
 

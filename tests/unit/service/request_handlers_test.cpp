@@ -1,6 +1,6 @@
 #include "service/request_handlers.h"
 
-#include "service/handler_fixture.h"
+#include "tests/unit/service/handler_fixture.h"
 
 #include <cerrno>
 

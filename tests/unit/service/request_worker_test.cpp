@@ -1,8 +1,8 @@
 #include "service/request_worker.h"
 
-#include "service/handler_fixture.h"
+#include "tests/unit/service/handler_fixture.h"
 
-#include "cli/tool_parameters.h"
+#include "request/tool_parameters.h"
 
 #include <json/reader.h>
 #include <pthread.h>

@@ -1,8 +1,8 @@
 #include "service/signal_handler.h"
 
-#include "service/child_process.h"
-#include "support/leak_checked_test.h"
-#include "support/messages_of.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/messages_of.h"
+#include "tests/unit/service/child_process.h"
 
 #include <cerrno>
 #include <csignal>

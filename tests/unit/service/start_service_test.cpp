@@ -1,12 +1,12 @@
 #include "service/start_service.h"
 
-#include "service/child_process.h"
-#include "service/handler_fixture.h"
-#include "service/private_world.h"
+#include "tests/support/private_world.h"
+#include "tests/unit/service/child_process.h"
+#include "tests/unit/service/handler_fixture.h"
 
-#include "cli/tool_parameters.h"
-#include "platform/path.h"
-#include "service/message_queue.h"
+#include "files/path.h"
+#include "request/message_queue.h"
+#include "request/tool_parameters.h"
 
 #include <algorithm>
 #include <cerrno>

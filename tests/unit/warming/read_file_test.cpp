@@ -1,6 +1,6 @@
 #include "warming/read_file.h"
 
-#include "warming/warming_fixture.h"
+#include "tests/unit/warming/warming_fixture.h"
 
 #include <cerrno>
 #include <regex>

@@ -1,8 +1,8 @@
 #include "warming/read_range.h"
 
-#include "warming/warming_fixture.h"
+#include "tests/unit/warming/warming_fixture.h"
 
-#include "platform/scoped_fd.h"
+#include "base/scoped_fd.h"
 
 #include <cerrno>
 #include <cstdint>

@@ -1,6 +1,6 @@
 #include "warming/reload_blocks.h"
 
-#include "warming/warming_fixture.h"
+#include "tests/unit/warming/warming_fixture.h"
 
 #include <cerrno>
 #include <random>

@@ -1,6 +1,6 @@
 #include "warming/warm_files.h"
 
-#include "warming/warming_fixture.h"
+#include "tests/unit/warming/warming_fixture.h"
 
 #include "warming/read_range.h"
 

@@ -2,14 +2,14 @@
 #ifndef TESTS_WARMING_WARMING_FIXTURE_H
 #define TESTS_WARMING_WARMING_FIXTURE_H
 
-#include "support/captured_log.h"
-#include "support/fake_appliance.h"
-#include "support/fake_libc.h"
-#include "support/leak_checked_test.h"
-#include "support/messages_of.h"
-#include "warming/fake_cache_device.h"
+#include "tests/support/captured_log.h"
+#include "tests/support/fake_appliance.h"
+#include "tests/support/fake_cache_device.h"
+#include "tests/support/fake_libc.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/messages_of.h"
 
-#include "service/service_state.h"
+#include "state/service_state.h"
 
 #include <gtest/gtest.h>
 #include <memory>

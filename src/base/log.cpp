@@ -1,0 +1,111 @@
+#include "base/log.h"
+
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <cstring>
+#include <memory>
+#include <new>
+#include <sys/time.h>
+#include <syslog.h>
+
+int LogToSyslog = 1;
+int LogLevel = 1;
+const char *ProgramName = nullptr;
+
+namespace {
+
+// Readers of the log know the program by this one file name, in whichever source file a message
+// stands.
+const char sourceFileName[] = "veskcachepinfiletool.cpp";
+
+// One message text: a buffer on the stack, which a text that does not fit leaves for the heap.
+// Where no memory is left the text is cut: a log call never fails.
+class MessageText {
+public:
+    MessageText(const char *format, va_list arguments) {
+        va_list again;
+        va_copy(again, arguments);
+        // The caller has started the arguments. NOLINTNEXTLINE(clang-analyzer-valist.Uninitialized)
+        const int length = vsnprintf(fixed_, sizeof(fixed_), format, arguments);
+        if (length >= static_cast<int>(sizeof(fixed_))) {
+            const size_t size = static_cast<size_t>(length) + 1;
+            grown_.reset(new (std::nothrow) char[size]);
+            if (grown_) {
+                vsnprintf(grown_.get(), size, format, again);
+            }
+        }
+        va_end(again);
+        if (length < 0) {
+            fixed_[0] = '\0';
+        }
+    }
+    const char *Get() const { return grown_ ? grown_.get() : fixed_; }
+
+private:
+    char fixed_[1024];
+    std::unique_ptr<char[]> grown_;
+};
+
+void WriteShort(int line, const char *core) {
+    if (LogToSyslog == 1) {
+        syslog(LOG_ERR, "%s:%d %s", sourceFileName, line, core);
+    } else {
+        printf("%s: %s\n", ProgramName, core);
+    }
+}
+
+// `colon` is what stands between the line and the text on standard output, `marker` precedes the
+// text.
+void WriteLong(int line, const char *function, const char *colon, const char *marker,
+               const char *core) {
+    if (LogToSyslog == 1) {
+        syslog(LOG_ERR, "%s:%d %s() [%d] : %s%s", sourceFileName, line, function, line, marker,
+               core);
+    } else {
+        printf("%s: %s() [%d]%s%s%s\n", ProgramName, function, line, colon, marker, core);
+    }
+}
+
+} // namespace
+
+void LogWrite(LogClass logClass, int line, const char *function, const char *format, ...) {
+    const int savedErrno = errno;
+    va_list arguments;
+    va_start(arguments, format);
+    const MessageText core(format, arguments);
+    va_end(arguments);
+
+    const bool detail = logClass == LogClass::Verbose || logClass == LogClass::Debug;
+    if (detail) {
+        // Readers of verbose output on a terminal see no blank before this colon.
+        WriteLong(line, function, ": ", "", core.Get());
+    } else if (LogLevel <= 1) {
+        WriteShort(line, core.Get());
+    } else {
+        WriteLong(line, function, " : ", logClass == LogClass::Error ? "***** " : "", core.Get());
+    }
+    errno = savedErrno;
+}
+
+LogTrace::LogTrace(int line, const char *function) : line_(line), function_(function) {
+    if (LogLevel > 1) {
+        LogWrite(LogClass::Notice, line_, function_, "+++++");
+    }
+}
+
+LogTrace::~LogTrace() {
+    if (LogLevel > 1) {
+        LogWrite(LogClass::Notice, line_, function_, "-----");
+    }
+}
+
+const char *GetTimeString() {
+    static char text[512];
+    timeval now{};
+    gettimeofday(&now, nullptr);
+    const long microseconds = static_cast<long>(now.tv_usec);
+    snprintf(text, sizeof(text), "sec=%ld msec=%ld usec=%ld", static_cast<long>(now.tv_sec),
+             microseconds / 1000, microseconds);
+    return text;
+}

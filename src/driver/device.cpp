@@ -1,0 +1,24 @@
+#include "driver/device.h"
+
+#include "base/log.h"
+#include "base/scoped_fd.h"
+
+#include <fcntl.h>
+#include <linux/fs.h>
+#include <sys/ioctl.h>
+
+// The request number carries the size of size_t, not of the 64-bit count that the kernel writes.
+static_assert(sizeof(void *) != 4 || BLKGETSIZE64 == 0x80041272, "request of the 32-bit target");
+
+int DeviceGetSizeByte(const char *path, uint64_t *sizeBytes) {
+    const ScopedFd device(open(path, O_RDONLY | O_CLOEXEC));
+    if (!device.IsOpen()) {
+        LogError("Can't open device (%s)", path);
+        return -1;
+    }
+    if (ioctl(device.Get(), BLKGETSIZE64, sizeBytes) < 0) {
+        LogError("Can't get size of device (%s)", path);
+        return -1;
+    }
+    return 0;
+}

@@ -1,0 +1,12 @@
+// Removes what processes that died while they replaced a file (files/file_replace.h) left in its
+// folder, so that years of crashes do not fill it.
+//
+// Thread rule: no state.
+#ifndef FILES_FILE_LEFTOVERS_H
+#define FILES_FILE_LEFTOVERS_H
+
+// Removes the temporary files beside `path` whose process is gone and that nobody has written to
+// for a minute; what cannot be removed stays. Never logs.
+void FileRemoveLeftovers(const char *path);
+
+#endif

@@ -1,0 +1,18 @@
+// Small text files: the message-queue key and the like. Thread rule: no state.
+#ifndef FILES_FILE_TEXT_H
+#define FILES_FILE_TEXT_H
+
+#include <string>
+
+// What becomes of the content of a file that is there already.
+enum class OldContent { Emptied, Kept };
+
+// Creates or empties the file, or finds its end, and writes the text, nothing added. 0, or -1 after
+// an error message when it cannot be opened or not every byte was written.
+int FileWriteString(const char *path, const char *text, OldContent old = OldContent::Emptied);
+
+// The first line of the file, with its line feed if it has one. 0, or -1 after an error message
+// when the file cannot be opened or is empty.
+int FileReadString(const char *path, std::string *text);
+
+#endif

@@ -1,0 +1,64 @@
+#include "files/path.h"
+
+#include "base/log.h"
+
+#include <cerrno>
+#include <sys/stat.h>
+
+namespace {
+
+const mode_t fileBit = 0x8000;
+const mode_t directoryBit = 0x4000;
+
+} // namespace
+
+int FileGetSizeByte(const char *path, uint64_t *sizeBytes) {
+    struct stat status {};
+    if (stat(path, &status) < 0) {
+        LogError("Can't get file (%s) stat result", path);
+        return -1;
+    }
+    *sizeBytes = static_cast<uint64_t>(status.st_size);
+    return 0;
+}
+
+int FileGetInodeNumber(const char *path, uint32_t *inode) {
+    struct stat status {};
+    if (stat(path, &status) < 0) {
+        LogError("Stat file %s error", path);
+        return -1;
+    }
+    *inode = static_cast<uint32_t>(status.st_ino);
+    return 0;
+}
+
+int PathExists(const char *path) {
+    struct stat status {};
+    return stat(path, &status) == 0 ? 1 : 0;
+}
+
+int PathIsMissing(const char *path) {
+    struct stat status {};
+    return stat(path, &status) < 0 &&
+                   (errno == ENOENT || errno == ENOTDIR || errno == ELOOP || errno == ENAMETOOLONG)
+               ? 1
+               : 0;
+}
+
+int PathIsFile(const char *path) {
+    struct stat status {};
+    if (stat(path, &status) < 0) {
+        LogError("Path (%s) doesn't exist", path);
+        return 0;
+    }
+    return (status.st_mode & fileBit) != 0 ? 1 : 0;
+}
+
+int PathIsDir(const char *path) {
+    struct stat status {};
+    if (stat(path, &status) < 0) {
+        LogError("Path (%s) doesn't exist", path);
+        return 0;
+    }
+    return (status.st_mode & directoryBit) != 0 ? 1 : 0;
+}

@@ -1,0 +1,142 @@
+#include "request/message_queue.h"
+
+#include "base/log.h"
+#include "files/file_text.h"
+#include "files/path.h"
+#include "request/request_type.h"
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <string>
+#include <sys/ipc.h>
+#include <sys/msg.h>
+#include <unistd.h>
+
+namespace {
+
+const int keyProject = 'x';
+const int keyReadTries = 3;
+const int sendTries = 3;
+const int ackTries = 3;
+static_assert((IPC_CREAT | IPC_EXCL | 0644) == 0x7A4, "creation flags");
+
+} // namespace
+
+int GetMsgKey(int *key, const char *path) {
+    std::string text;
+    if (FileReadString(path, &text) < 0) {
+        LogError("Can't get message key from file (%s)", path);
+        return -1;
+    }
+    *key = std::stoi(text);
+    LogVerbose("Get Key = %d", *key);
+    return 0;
+}
+
+int MsgCreateExclusive(const char *keyFile) {
+    LogTraceScope();
+    // Whatever another process has put into the file since the look is kept: nobody would ever
+    // write the key of its queue again.
+    if (!PathExists(keyFile) && FileWriteString(keyFile, "", OldContent::Kept) < 0) {
+        LogError("Create file (%s) failed", keyFile);
+        return -1;
+    }
+    const key_t key = ftok(keyFile, keyProject);
+    if (key == -1) {
+        LogError("Can't get message queue key by file (%s)", keyFile);
+        return -1;
+    }
+    LogVerbose("Generate message queue key = %d (0x%x)", key, static_cast<unsigned>(key));
+    char keyText[1024];
+    snprintf(keyText, sizeof(keyText), "%d", key);
+
+    const int queueId = msgget(key, IPC_CREAT | IPC_EXCL | 0644);
+    if (queueId == -1) {
+        LogVerbose("Message queue (key = %d) already exists (error = %s)", key, strerror(errno));
+        return -1;
+    }
+    msqid_ds limits{};
+    if (msgctl(queueId, IPC_STAT, &limits) < 0) {
+        LogError("Can't get message queue data structure");
+        return -1;
+    }
+    limits.msg_qbytes = messageQueueBytes;
+    if (msgctl(queueId, IPC_SET, &limits) < 0) {
+        LogError("Can't set message queue size");
+        return -1;
+    }
+    LogVerbose("Set size = %ld (num of request = %d, request size = %zu)",
+               static_cast<long>(messageQueueBytes), messageQueueRequests, requestMessageBytes);
+    if (FileWriteString(keyFile, keyText) < 0) {
+        // This process can use the queue all the same; others cannot find it.
+        LogError("Can't write to file (%s)", keyFile);
+    }
+    return queueId;
+}
+
+int MsgQueueGet(const char *keyFile) {
+    LogTraceScope();
+    int queueId = MsgCreateExclusive(keyFile);
+    if (queueId != -1) {
+        LogVerbose("Create message queue by file (%s) successfully", keyFile);
+        return queueId;
+    }
+    LogVerbose("Message queue exist, try to get key");
+    int key = 0;
+    int result = -1;
+    for (int tries = 0; tries < keyReadTries && result < 0; ++tries) {
+        result = GetMsgKey(&key, keyFile);
+    }
+    if (result < 0) {
+        LogError("Can't find the message queue's key from file (%s)", keyFile);
+        return -1;
+    }
+    queueId = msgget(key, 0);
+    if (queueId == -1) {
+        LogError("Can't open message queue: %s", strerror(errno));
+        return -1;
+    }
+    LogVerbose("Get message queue by id (%d) successfully", queueId);
+    return queueId;
+}
+
+int MsgQueueSend(int queueId, const RequestMessage *message, size_t size) {
+    int sendErrno = 0;
+    for (int tries = 0; tries < sendTries; ++tries) {
+        LogVerbose("Send to message queue (id = %d) msg type = %ld", queueId, message->messageType);
+        if (msgsnd(queueId, message, size, IPC_NOWAIT) == 0) {
+            LogVerbose("Send to message queue (id = %d) OK", queueId);
+            return 0;
+        }
+        sendErrno = errno;
+        sleep(1);
+    }
+    LogError("Send message timeout (%d seconds)", sendTries);
+    errno = sendErrno;
+    return -1;
+}
+
+int WaitForAck(int queueId, long messageType) {
+    LogTraceScope();
+    RequestMessage message{};
+    int seconds = 0;
+    ssize_t received = -1;
+    while (received < 0) {
+        if (seconds >= ackTries) {
+            LogError("Can't get ack messages (Wait for %d sceounds)", seconds);
+            return -1;
+        }
+        sleep(1);
+        ++seconds;
+        LogVerbose("Wait for ack. Secound = %d", seconds);
+        received = msgrcv(queueId, &message, requestMessageBytes, messageType, IPC_NOWAIT);
+    }
+    LogVerbose("Get message");
+    if (message.record.type != requestAck) {
+        LogError("Get wrong request");
+        return -1;
+    }
+    LogVerbose("Get ACK from servier");
+    return 0;
+}

@@ -1,0 +1,25 @@
+// Choosing the next request to carry out.
+//
+// The oldest runnable request wins. Requests of pending spaces are passed over but keep their
+// place; requests of volumes whose cache is gone are removed on the way, with the volume's
+// pinned-file records.
+//
+// Locks: holds the service lock throughout, except while it waits.
+#ifndef SERVICE_NEXT_REQUEST_H
+#define SERVICE_NEXT_REQUEST_H
+
+#include "request/request_record.h"
+#include "state/service_state.h"
+
+#include <string>
+
+const int nextRequestNone = 0;  // requests are queued, none may run now
+const int nextRequestTaken = 2; // a request was taken; it stays in the file until it is done
+const int nextRequestError = 3; // after an error message; the file is as it was
+
+// Fills `*out` and `*num` when a request was taken. `*out` must be zeroed. Blocks, without a time
+// limit, while the file is missing or the queue is empty.
+int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
+                                          std::string *num) NEEDS_NO_LOCK(serviceLock);
+
+#endif

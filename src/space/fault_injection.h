@@ -1,0 +1,16 @@
+// A switch for field tests: makes the extent lookup of one file fail.
+//
+// The control file /tmp/veskcachepinfiletool.debug holds the full path of the file whose lookups
+// shall fail, with or without one line feed behind it. Without the file nothing fails.
+//
+// Thread rule: no state.
+#ifndef SPACE_FAULT_INJECTION_H
+#define SPACE_FAULT_INJECTION_H
+
+#include <string>
+
+// 1 when the lookup of this file (full path, compared whole) shall fail, else 0. A control file
+// that is not a regular file counts as absent, and opening it never blocks.
+int FileSimulateGetMappingFailed(const std::string &filePath);
+
+#endif

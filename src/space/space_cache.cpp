@@ -1,0 +1,126 @@
+#include "space/space_cache.h"
+
+#include "base/log.h"
+#include "base/malloc_text.h"
+#include "space/space.h"
+
+#include "vesk/flash_cache.h"
+
+#include <cstring>
+#include <memory>
+
+namespace {
+
+const int configBySpaceUuid = 2;
+const int statBySsdPath = 3;
+
+struct ConfigDeleter {
+    void operator()(VESKFlashCacheConfig *config) const { VESKFlashCacheConfigFree(config); }
+};
+using CacheConfig = std::unique_ptr<VESKFlashCacheConfig, ConfigDeleter>;
+
+struct StatDeleter {
+    void operator()(VESKFlashCacheStat *stat) const { VESKFlashCacheStatFree(&stat); }
+};
+using CacheStat = std::unique_ptr<VESKFlashCacheStat, StatDeleter>;
+
+} // namespace
+
+VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid) {
+    VESKFlashCacheConfigQuery query{};
+    query.kind = configBySpaceUuid;
+    query.spaceUuid = uuid;
+    VESKFlashCacheConfig *config = nullptr;
+    const int result = VESKFlashCacheConfigTmpGet(&query, &config);
+    if (result == 0) {
+        LogVerbose("Can't find cache in the config file. Space UUID is (%s)", uuid);
+    } else if (result == -1) {
+        LogError("Fail to get SSD cache config");
+    }
+    return config;
+}
+
+int SpaceHasCache(const char *uuid) {
+    const CacheConfig config(SpaceGetCacheConfig(uuid));
+    if (!config) {
+        LogVerbose("Space (%s) doesn't be found in the config", uuid);
+        return 0;
+    }
+    // The number in this message has always been 0, and log readers know it so.
+    LogVerbose("Check Space (%s) ret=%d", uuid, 0);
+    return 1;
+}
+
+char *SpaceGetCacheSsdPath(const char *uuid) {
+    const CacheConfig config(SpaceGetCacheConfig(uuid));
+    if (!config || config->ssdPath == nullptr) {
+        return nullptr;
+    }
+    return strdup(config->ssdPath);
+}
+
+char *SpaceGetCachePath(const char *uuid) {
+    const MallocText ssdPath(SpaceGetCacheSsdPath(uuid));
+    if (!ssdPath) {
+        LogError("Can't get cache's ssd path");
+        return nullptr;
+    }
+    char cachePath[512] = {};
+    if (VESKFlashcacheGetCachePath(ssdPath.get(), cachePath, sizeof(cachePath)) != 1) {
+        LogError("Can't get cache path");
+        return nullptr;
+    }
+    return strndup(cachePath, sizeof(cachePath) - 1);
+}
+
+char *SpaceGetCachePathByMountPath(const char *mountPath) {
+    const MallocText uuid(SpaceGetUUID(mountPath));
+    if (!uuid) {
+        LogError("Can't get space uuid from reference path (%s)", mountPath);
+        return nullptr;
+    }
+    char *cachePath = SpaceGetCachePath(uuid.get());
+    if (cachePath == nullptr) {
+        LogError("Can't get cache path");
+    }
+    return cachePath;
+}
+
+int SpaceHasCacheAndSupportPin(const char *mountPath) {
+    const MallocText uuid(SpaceGetUUID(mountPath));
+    if (!uuid) {
+        LogError("Can't get space uuid from mount path (%s)", mountPath);
+        return 0;
+    }
+    const int supportPin = SpaceHasCacheAndSupportPinByUUID(uuid.get());
+    if (supportPin == 1) {
+        LogVerbose("Volume (%s) support pin", mountPath);
+    }
+    return supportPin;
+}
+
+int SpaceHasCacheAndSupportPinByUUID(const char *uuid) {
+    if (!SpaceHasCache(uuid)) {
+        LogVerbose("Space (UUID = %s) doesn't has cache", uuid);
+        return 0;
+    }
+    const MallocText ssdPath(SpaceGetCacheSsdPath(uuid));
+    if (!ssdPath) {
+        LogError("Can't get cache's ssd path");
+        return 0;
+    }
+    VESKFlashCacheStatQuery query{};
+    query.kind = statBySsdPath;
+    query.ssdPath = ssdPath.get();
+    VESKFlashCacheStat *answer = nullptr;
+    const int result = VESKFlashCacheStatGet(&query, &answer);
+    const CacheStat stat(answer);
+    if (result < 1 || !stat) {
+        LogVerbose(
+            "Failed to get status of flashcache, ssd = %s. (Might be due to cache is not estabilied yet)",
+            ssdPath.get());
+        return 0;
+    }
+    LogVerbose("supportPin=%d", stat->supportPin);
+    return stat->state == 1 && stat->supportPin == 1 ? 1 : 0;
+}

@@ -1,0 +1,276 @@
+#include "tests/support/fake_libc.h"
+
+#include <algorithm>
+#include <atomic>
+#include <cerrno>
+#include <cstdarg>
+#include <cstddef>
+#include <dlfcn.h>
+#include <fcntl.h>
+#include <map>
+#include <mutex>
+#include <pthread.h>
+#include <sys/stat.h>
+#include <sys/time.h>
+#include <sys/types.h>
+
+int FakeLibc::sleeps = 0;
+int FakeLibc::alarmFactor = 1;
+int FakeLibc::pauseFactor = 1;
+int FakeLibc::syncs = 0;
+std::function<void()> FakeLibc::onSleep;
+std::function<void()> FakeLibc::onSync;
+std::function<int(unsigned long, void *)> FakeLibc::onIoctl;
+std::function<void(struct stat *)> FakeLibc::onStat;
+std::function<void(int, long long, size_t)> FakeLibc::onRead;
+
+namespace {
+
+struct Order {
+    int calls = 0;
+    int failAt = 0; // 0: never
+    bool onwards = false;
+    int error = 0;
+    int limitAt = 0; // 0: never
+    size_t limit = 0;
+};
+
+std::mutex ordersMutex;
+std::map<std::string, Order> &Orders() {
+    static auto *orders = new std::map<std::string, Order>;
+    return *orders;
+}
+std::atomic<bool> anyOrder{false}; // spares the ordinary call the map
+
+// The errno with which this call fails, or 0.
+int FailureOf(const char *function) {
+    if (!anyOrder) {
+        return 0;
+    }
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    const auto found = Orders().find(function);
+    if (found == Orders().end()) {
+        return 0;
+    }
+    Order &order = found->second;
+    ++order.calls;
+    const bool fails = order.failAt != 0 &&
+                       (order.onwards ? order.calls >= order.failAt : order.calls == order.failAt);
+    return fails ? order.error : 0;
+}
+
+// How many of these bytes the call that FailureOf() has just counted may move.
+size_t Limited(const char *function, size_t size) {
+    if (!anyOrder) {
+        return size;
+    }
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    const Order &order = Orders()[function];
+    return order.limitAt != 0 && order.calls == order.limitAt ? std::min(order.limit, size) : size;
+}
+
+void SetOrder(const std::string &function, int error, int nth, bool onwards) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Order &order = Orders()[function];
+    order.failAt = order.calls + nth;
+    order.onwards = onwards;
+    order.error = error;
+    anyOrder = true;
+}
+
+template <typename Function> Function Real(const char *name) {
+    return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
+}
+
+} // namespace
+
+void FakeLibc::Reset() {
+    sleeps = 0;
+    alarmFactor = 1;
+    pauseFactor = 1;
+    syncs = 0;
+    onSleep = nullptr;
+    onSync = nullptr;
+    onIoctl = nullptr;
+    onStat = nullptr;
+    onRead = nullptr;
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Orders().clear();
+    anyOrder = false;
+}
+
+void FakeLibc::Fail(const std::string &function, int error, int nth) {
+    SetOrder(function, error, nth, false);
+}
+
+void FakeLibc::FailFrom(const std::string &function, int error, int nth) {
+    SetOrder(function, error, nth, true);
+}
+
+void FakeLibc::Limit(const std::string &function, size_t bytes, int nth) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Order &order = Orders()[function];
+    order.limitAt = order.calls + nth;
+    order.limit = bytes;
+    anyOrder = true;
+}
+
+void FakeLibc::Count(const std::string &function) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    Orders()[function];
+    anyOrder = true;
+}
+
+int FakeLibc::Calls(const std::string &function) {
+    const std::lock_guard<std::mutex> lock(ordersMutex);
+    return Orders()[function].calls;
+}
+
+// Fails the call when ordered to, otherwise calls the real function.
+#define PASS_OR_FAIL(failure, name, type, ...)                                                     \
+    const int error = FailureOf(#name);                                                            \
+    if (error != 0) {                                                                              \
+        errno = error;                                                                             \
+        return failure;                                                                            \
+    }                                                                                              \
+    static const auto real = Real<type>(#name);                                                    \
+    return real(__VA_ARGS__)
+
+using sighandler = void (*)(int);
+struct msqid_ds;
+
+extern "C" {
+
+unsigned sleep(unsigned /*seconds*/) {
+    ++FakeLibc::sleeps;
+    if (FakeLibc::onSleep) {
+        FakeLibc::onSleep();
+    }
+    return 0;
+}
+
+int usleep(useconds_t microseconds) {
+    static const auto real = Real<int (*)(useconds_t)>("usleep");
+    return real(microseconds * static_cast<useconds_t>(FakeLibc::pauseFactor));
+}
+
+int setitimer(__itimer_which_t which, const itimerval *value, itimerval *old) noexcept {
+    static const auto real =
+        Real<int (*)(__itimer_which_t, const itimerval *, itimerval *)>("setitimer");
+    const long long microseconds =
+        (value->it_value.tv_sec * 1000000LL + value->it_value.tv_usec) * FakeLibc::alarmFactor;
+    itimerval later = *value;
+    later.it_value.tv_sec = static_cast<time_t>(microseconds / 1000000);
+    later.it_value.tv_usec = static_cast<suseconds_t>(microseconds % 1000000);
+    return real(which, &later, old);
+}
+
+void sync() noexcept {
+    ++FakeLibc::syncs;
+    if (FakeLibc::onSync) {
+        FakeLibc::onSync();
+    }
+}
+
+int ioctl(int fd, unsigned long request, ...) noexcept {
+    va_list arguments;
+    va_start(arguments, request);
+    void *argument = va_arg(arguments, void *);
+    va_end(arguments);
+    if (FakeLibc::onIoctl) {
+        return FakeLibc::onIoctl(request, argument);
+    }
+    PASS_OR_FAIL(-1, ioctl, int (*)(int, unsigned long, ...), fd, request, argument);
+}
+
+int msgctl(int id, int command, msqid_ds *data) noexcept {
+    PASS_OR_FAIL(-1, msgctl, int (*)(int, int, msqid_ds *), id, command, data);
+}
+
+int msgget(key_t key, int flags) noexcept {
+    PASS_OR_FAIL(-1, msgget, int (*)(key_t, int), key, flags);
+}
+
+int msgsnd(int id, const void *message, size_t size, int flags) {
+    PASS_OR_FAIL(-1, msgsnd, int (*)(int, const void *, size_t, int), id, message, size, flags);
+}
+
+key_t ftok(const char *path, int project) noexcept {
+    PASS_OR_FAIL(-1, ftok, key_t(*)(const char *, int), path, project);
+}
+
+ssize_t write(int fd, const void *data, size_t size) {
+    PASS_OR_FAIL(-1, write, ssize_t(*)(int, const void *, size_t), fd, data,
+                 Limited("write", size));
+}
+
+ssize_t read(int fd, void *data, size_t size) {
+    if (FakeLibc::onRead) {
+        static const auto realSeek = Real<off_t (*)(int, off_t, int)>("lseek64");
+        FakeLibc::onRead(fd, realSeek(fd, 0, SEEK_CUR), size);
+    }
+    PASS_OR_FAIL(-1, read, ssize_t(*)(int, void *, size_t), fd, data, Limited("read", size));
+}
+
+off_t lseek64(int fd, off_t offset, int whence) noexcept {
+    const int error = FailureOf("lseek");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    // Not "lseek", whose offset has 32 bits on a 32-bit platform.
+    static const auto real = Real<off_t (*)(int, off_t, int)>("lseek64");
+    return real(fd, offset, whence);
+}
+
+// Under whatever name the platform's 64-bit variant has; the real answer comes by another call.
+int stat(const char *path, struct stat *status) noexcept {
+    const int error = FailureOf("stat");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    const int result = fstatat(AT_FDCWD, path, status, 0);
+    if (result == 0 && FakeLibc::onStat) {
+        FakeLibc::onStat(status);
+    }
+    return result;
+}
+
+int fsync(int fd) {
+    PASS_OR_FAIL(-1, fsync, int (*)(int), fd);
+}
+
+int renameat(int oldFolder, const char *oldName, int newFolder, const char *newName) noexcept {
+    const int error = FailureOf("rename");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    static const auto real = Real<int (*)(int, const char *, int, const char *)>("renameat");
+    return real(oldFolder, oldName, newFolder, newName);
+}
+
+int fchown(int fd, uid_t owner, gid_t group) noexcept {
+    PASS_OR_FAIL(-1, fchown, int (*)(int, uid_t, gid_t), fd, owner, group);
+}
+
+int pthread_mutex_init(pthread_mutex_t *mutex, const pthread_mutexattr_t *attributes) noexcept {
+    const int error = FailureOf("pthread_mutex_init");
+    if (error != 0) {
+        return error;
+    }
+    static const auto real =
+        Real<int (*)(pthread_mutex_t *, const pthread_mutexattr_t *)>("pthread_mutex_init");
+    return real(mutex, attributes);
+}
+
+sighandler signal(int number, sighandler handler) noexcept {
+    PASS_OR_FAIL(reinterpret_cast<sighandler>(-1), signal, sighandler(*)(int, sighandler), number,
+                 handler);
+}
+
+void *aligned_alloc(size_t alignment, size_t size) noexcept {
+    PASS_OR_FAIL(nullptr, aligned_alloc, void *(*)(size_t, size_t), alignment, size);
+}
+}

@@ -1,0 +1,17 @@
+// What the program under test sends to the system log: this test program defines the C library's
+// syslog functions itself, so nothing reaches the machine's log.
+#ifndef TESTS_SUPPORT_SYSLOG_CAPTURE_H
+#define TESTS_SUPPORT_SYSLOG_CAPTURE_H
+
+#include <string>
+#include <vector>
+
+struct SyslogRecord {
+    int priority;
+    std::string text; // formatted
+};
+
+// Everything since the last clear(), oldest first.
+std::vector<SyslogRecord> &SyslogRecords();
+
+#endif

@@ -1,0 +1,160 @@
+#include "space/fault_injection.h"
+
+#include "tests/support/captured_log.h"
+#include "tests/support/leak_checked_test.h"
+#include "tests/support/private_mounts.h"
+#include "tests/support/temp_dir.h"
+
+#include <cerrno>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+namespace {
+
+const bool privateMounts = UsePrivateMounts();
+const char controlFile[] = "/tmp/veskcachepinfiletool.debug";
+const char file[] = "/volume1/photo/a.jpg";
+
+class FileSimulateGetMappingFailedTest : public LeakCheckedTest {
+protected:
+    void SetUp() override {
+        SKIP_WITHOUT_PRIVATE_MOUNTS();
+        LeakCheckedTest::SetUp();
+    }
+    void TearDown() override {
+        if (!PrivateMountsMissing().empty()) {
+            return;
+        }
+        std::filesystem::remove(controlFile);
+        LeakCheckedTest::TearDown();
+    }
+    static int WithControl(const std::string &content, const std::string &path = file) {
+        WriteWhole(controlFile, content);
+        return FileSimulateGetMappingFailed(path);
+    }
+};
+
+} // namespace
+
+TEST_F(FileSimulateGetMappingFailedTest, NothingFailsWithoutAControlFile) {
+    CapturedLog log(3);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(""), 0);
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ThePathOfTheFileMatches) {
+    CapturedLog log(2);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg"), 1);
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, OneLineFeedIsIgnoredTwoAreNot) {
+    CapturedLog log;
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n\n"), 0);
+    EXPECT_EQ(WithControl("\n/volume1/photo/a.jpg"), 0);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\r\n"), 0);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n/volume1/photo/b.jpg\n"), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ThePathIsComparedWhole) {
+    CapturedLog log;
+    EXPECT_EQ(WithControl("/volume1/photo/a.jp"), 0);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg2"), 0);
+    EXPECT_EQ(WithControl("/volume1/photo/A.jpg"), 0);
+    EXPECT_EQ(WithControl("photo/a.jpg"), 0);
+    EXPECT_EQ(WithControl(" /volume1/photo/a.jpg"), 0);
+    EXPECT_EQ(WithControl(std::string("/volume1/photo/a.jpg\0", 21)), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, EmptyControlFileMatchesNoFile) {
+    CapturedLog log;
+    EXPECT_EQ(WithControl(""), 0);
+    EXPECT_EQ(WithControl("\n"), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, LongPathsAreComparedWhole) {
+    CapturedLog log;
+    const std::string path = "/" + std::string(4000, 'x');
+    EXPECT_EQ(WithControl(path + "\n", path), 1);
+    EXPECT_EQ(WithControl(path + "y\n", path), 0);
+    EXPECT_EQ(WithControl(path + std::string(100000, 'y'), path), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ControlFileThatComesInPiecesIsReadWhole) {
+    CapturedLog log;
+    FakeLibc::Limit("read", 5);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ControlFileIsReadAnewEveryTime) {
+    CapturedLog log;
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
+    EXPECT_EQ(WithControl("/volume1/photo/b.jpg\n"), 0);
+    std::filesystem::remove(controlFile);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, LinkToAControlFileIsFollowed) {
+    CapturedLog log;
+    const TempDir folder;
+    WriteWhole(folder.Path("control"), "/volume1/photo/a.jpg\n");
+    ASSERT_EQ(symlink(folder.Path("control").c_str(), controlFile), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 1);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, FifoDoesNotBlockAndCountsAsAbsent) {
+    CapturedLog log(3);
+    ASSERT_EQ(mkfifo(controlFile, 0666), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, FolderSocketAndDeviceCountAsAbsent) {
+    CapturedLog log(3);
+    ASSERT_EQ(mkdir(controlFile, 0777), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    std::filesystem::remove(controlFile);
+    ASSERT_EQ(mknod(controlFile, S_IFSOCK | 0666, 0), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    std::filesystem::remove(controlFile);
+    ASSERT_EQ(symlink("/dev/zero", controlFile), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ControlFileThatCannotBeReadCountsAsAbsent) {
+    CapturedLog log;
+    FakeLibc::Fail("read", EIO);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ControlFileWithoutPermissionCountsAsAbsent) {
+    WriteWhole(controlFile, "/volume1/photo/a.jpg\n");
+    ASSERT_EQ(chmod(controlFile, 0600), 0);
+    fflush(stdout);
+    const pid_t child = fork();
+    if (child == 0) {
+        const CapturedLog log;
+        _exit(setuid(65534) == 0 ? FileSimulateGetMappingFailed(file) : 99);
+    }
+    int status = -1; // of no process, where there is none
+    waitpid(child, &status, 0);
+    ASSERT_TRUE(WIFEXITED(status));
+    EXPECT_EQ(WEXITSTATUS(status), 0);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ComparisonIsToldAtLevel3) {
+    CapturedLog log(3);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
+    EXPECT_EQ(WithControl("/other"), 0);
+    EXPECT_EQ(log.Messages(),
+              (std::vector<std::string>{
+                  "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
+                  "failed failed=/volume1/photo/a.jpg ret=1",
+                  "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
+                  "failed failed=/other ret=0"}));
+}
