@@ -6,7 +6,7 @@
 #include "tests/unit/formats/doc_examples.h"
 
 #include "bitmap/bitmap_file.h"
-#include "commands/client_requests.h"
+#include "commands/files_request.h"
 #include "config/config_document.h"
 #include "config/json_file.h"
 #include "config/pinned_files.h"

@@ -1,7 +1,7 @@
-#include "commands/volume_events.h"
+#include "commands/handle_mount.h"
 
 #include "tests/support/ordinary_user.h"
-#include "tests/unit/commands/commands_fixture.h"
+#include "tests/unit/commands/volume_events_fixture.h"
 
 #include <json/reader.h>
 #include <sstream>
@@ -17,26 +17,14 @@ Json::Value Parse(const std::string &text) {
     return root;
 }
 
-} // namespace
-
-class VolumeEventsTest : public CommandsTest {
+class HandleMountTest : public VolumeEventsTest {
 protected:
-    void SetUp() override {
-        CommandsTest::SetUp();
-        WriteWhole(config_, document_);
-    }
     int Mount() const { return HandleSpaceMount(config_.c_str(), Volume()); }
-    const std::string config_ = folder_.Path("conf.json");
-    const std::string document_ = R"({"requestQueue" : ["0"],
-        "requests" : {"0" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
-                                  volume_ + R"("}},
-        "volumes" : {")" + volume_ +
-                                  R"(" : {"files" : {"1" : "a"}},
-                     "/volume2" : {"files" : {"2" : "b"}}}})";
-    const std::string recordsRemoved_ = "Remove pin file volume (" + volume_ + ") from config file";
 };
 
-TEST_F(VolumeEventsTest, MountOfAVolumeThatSupportsPinningTouchesNothing) {
+} // namespace
+
+TEST_F(HandleMountTest, MountOfAVolumeThatSupportsPinningTouchesNothing) {
     WriteWhole(bitmapFile_, "ab");
     CapturedLog log;
     EXPECT_EQ(Mount(), 0);
@@ -45,7 +33,7 @@ TEST_F(VolumeEventsTest, MountOfAVolumeThatSupportsPinningTouchesNothing) {
     EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
 }
 
-TEST_F(VolumeEventsTest, MountOfAVolumeWithoutCacheRemovesRecordsAndBitmap) {
+TEST_F(HandleMountTest, MountOfAVolumeWithoutCacheRemovesRecordsAndBitmap) {
     FakeAppliance::caches.clear();
     WriteWhole(bitmapFile_, "ab");
     CapturedLog log;
@@ -57,7 +45,7 @@ TEST_F(VolumeEventsTest, MountOfAVolumeWithoutCacheRemovesRecordsAndBitmap) {
     EXPECT_EQ(Parse(ReadWhole(config_)), expected); // its requests stay
 }
 
-TEST_F(VolumeEventsTest, MountLogsAtLevel2) {
+TEST_F(HandleMountTest, MountLogsAtLevel2) {
     FakeAppliance::caches[0].state = 0;
     CapturedLog log(2);
     EXPECT_EQ(Mount(), 0);
@@ -65,13 +53,13 @@ TEST_F(VolumeEventsTest, MountLogsAtLevel2) {
               Messages{"HandleSpaceMount() [N]: Space (" + volume_ + ") doesn't support pin"});
 }
 
-TEST_F(VolumeEventsTest, MountWithoutABitmapFileStillRemovesTheRecords) {
+TEST_F(HandleMountTest, MountWithoutABitmapFileStillRemovesTheRecords) {
     FakeAppliance::caches.clear();
     EXPECT_EQ(Mount(), 0);
     EXPECT_FALSE(Parse(ReadWhole(config_))["volumes"].isMember(volume_));
 }
 
-TEST_F(VolumeEventsTest, MountWithoutAConfigurationStillRemovesTheBitmap) {
+TEST_F(HandleMountTest, MountWithoutAConfigurationStillRemovesTheBitmap) {
     FakeAppliance::caches.clear();
     std::filesystem::remove(config_);
     WriteWhole(bitmapFile_, "ab");
@@ -82,7 +70,7 @@ TEST_F(VolumeEventsTest, MountWithoutAConfigurationStillRemovesTheBitmap) {
     EXPECT_FALSE(std::filesystem::exists(config_));
 }
 
-TEST_F(VolumeEventsTest, MountLeavesADirectoryAtTheBitmapPath) {
+TEST_F(HandleMountTest, MountLeavesADirectoryAtTheBitmapPath) {
     FakeAppliance::caches.clear();
     std::filesystem::create_directory(bitmapFile_);
     CapturedLog log;
@@ -91,7 +79,7 @@ TEST_F(VolumeEventsTest, MountLeavesADirectoryAtTheBitmapPath) {
     EXPECT_TRUE(std::filesystem::is_directory(bitmapFile_));
 }
 
-TEST_F(VolumeEventsTest, MountWithADamagedConfigurationKeepsTheBitmap) {
+TEST_F(HandleMountTest, MountWithADamagedConfigurationKeepsTheBitmap) {
     FakeAppliance::caches.clear();
     WriteWhole(config_, R"({"volumes" : []})");
     WriteWhole(bitmapFile_, "ab");
@@ -105,7 +93,7 @@ TEST_F(VolumeEventsTest, MountWithADamagedConfigurationKeepsTheBitmap) {
     EXPECT_EQ(ReadWhole(config_), R"({"volumes" : []})");
 }
 
-TEST_F(VolumeEventsTest, MountThatCannotDeleteTheBitmapHasRemovedTheRecords) {
+TEST_F(HandleMountTest, MountThatCannotDeleteTheBitmapHasRemovedTheRecords) {
     FakeAppliance::caches.clear();
     WriteWhole(bitmapFile_, "ab");
     chmod(folder_.Path().c_str(), 0777);
@@ -125,7 +113,7 @@ TEST_F(VolumeEventsTest, MountThatCannotDeleteTheBitmapHasRemovedTheRecords) {
     EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
 }
 
-TEST_F(VolumeEventsTest, MountOfAnUnknownVolumeRemovesItsRecords) {
+TEST_F(HandleMountTest, MountOfAnUnknownVolumeRemovesItsRecords) {
     FakeAppliance::spaces.clear();
     CapturedLog log;
     EXPECT_EQ(Mount(), 0);
@@ -133,59 +121,4 @@ TEST_F(VolumeEventsTest, MountOfAnUnknownVolumeRemovesItsRecords) {
                                   "Can't get space uuid from mount path (" + volume_ + ")",
                                   recordsRemoved_,
                               }));
-}
-
-TEST_F(VolumeEventsTest, UmountChangesNothing) {
-    WriteWhole(bitmapFile_, "ab");
-    CapturedLog log;
-    EXPECT_EQ(HandleSpaceUmount(Volume()), 0);
-    EXPECT_EQ(log.Messages(), Messages{});
-    FakeAppliance::caches.clear();
-    EXPECT_EQ(HandleSpaceUmount(Volume()), 0);
-    EXPECT_EQ(log.Messages(), Messages{"Space (" + volume_ + ") doesn't support pin"});
-    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
-    EXPECT_EQ(ReadWhole(config_), document_);
-    EXPECT_EQ(device_->events, Events{});
-}
-
-TEST_F(VolumeEventsTest, UmountOfAVolumeWithoutPinningIsANotice) {
-    FakeAppliance::caches.clear();
-    CapturedLog log(2);
-    EXPECT_EQ(HandleSpaceUmount(Volume()), 0);
-    EXPECT_EQ(MessagesOf(log, "HandleSpaceUmount"),
-              Messages{"HandleSpaceUmount() [N] : Space (" + volume_ + ") doesn't support pin"});
-}
-
-TEST_F(VolumeEventsTest, DeleteBitmapDeletesTheFileAndNothingElse) {
-    WriteWhole(bitmapFile_, "ab");
-    CapturedLog log(2);
-    EXPECT_EQ(DeleteBitmap(Volume()), 0);
-    EXPECT_EQ(log.Messages(), Messages{});
-    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
-    EXPECT_EQ(ReadWhole(config_), document_);
-    EXPECT_EQ(device_->events, Events{});
-}
-
-TEST_F(VolumeEventsTest, DeleteBitmapWithoutAFileSucceeds) {
-    CapturedLog log;
-    EXPECT_EQ(DeleteBitmap(Volume()), 0);
-    EXPECT_EQ(log.Messages(), Messages{});
-    CapturedLog verbose(2);
-    EXPECT_EQ(DeleteBitmap(Volume()), 0);
-    EXPECT_EQ(verbose.Messages(),
-              Messages{"DeleteBitmap() [N]: bitmap (" + bitmapFile_ + ") doesn't exist"});
-}
-
-TEST_F(VolumeEventsTest, DeleteBitmapOfAVolumeThatIsNoSpaceWorksToo) {
-    FakeAppliance::spaces.clear();
-    WriteWhole(bitmapFile_, "ab");
-    EXPECT_EQ(DeleteBitmap(Volume()), 0);
-    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
-}
-
-TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {
-    std::filesystem::create_directory(bitmapFile_);
-    CapturedLog log;
-    EXPECT_EQ(DeleteBitmap(Volume()), -1);
-    EXPECT_EQ(log.Messages(), Messages{"Can't delete bitmap (" + bitmapFile_ + ")"});
 }

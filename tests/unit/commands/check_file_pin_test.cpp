@@ -1,11 +1,11 @@
 // Whether one file is pinned.
-#include "commands/inspection.h"
+#include "commands/check_file_pin.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <sys/stat.h>
 
-class InspectionFileTest : public CommandsTest {
+class CheckFilePinTest : public CommandsTest {
 protected:
     void SetUp() override {
         CommandsTest::SetUp();
@@ -26,14 +26,14 @@ protected:
     const std::string topDir_ = file_.substr(0, file_.find('/', 1));
 };
 
-TEST_F(InspectionFileTest, ARecordedInodeIsPinned) {
+TEST_F(CheckFilePinTest, ARecordedInodeIsPinned) {
     StoreFiles("{\"" + Inode() + "\" : \"any/path\"}");
     CapturedLog log;
     EXPECT_EQ(Check(), 0);
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
-TEST_F(InspectionFileTest, TheTopDirectoryIsLoggedAtLevel2) {
+TEST_F(CheckFilePinTest, TheTopDirectoryIsLoggedAtLevel2) {
     StoreFiles("{}");
     CapturedLog log(2);
     EXPECT_EQ(Check(), 1);
@@ -41,7 +41,7 @@ TEST_F(InspectionFileTest, TheTopDirectoryIsLoggedAtLevel2) {
               Messages{"CheckFileIsPin() [N]: Mount path = " + topDir_});
 }
 
-TEST_F(InspectionFileTest, OtherInodesAreNotPinned) {
+TEST_F(CheckFilePinTest, OtherInodesAreNotPinned) {
     CapturedLog log;
     for (const std::string &files :
          {std::string("{}"), std::string("null"), "{\"" + Inode() + "0\" : \"file\"}",
@@ -52,14 +52,14 @@ TEST_F(InspectionFileTest, OtherInodesAreNotPinned) {
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
-TEST_F(InspectionFileTest, AReplacedFileIsNotPinned) {
+TEST_F(CheckFilePinTest, AReplacedFileIsNotPinned) {
     StoreFiles("{\"" + Inode() + "\" : \"file\"}");
     WriteWhole(folder_.Path("new"), "y"); // while the old inode is still in use
     std::filesystem::rename(folder_.Path("new"), file_);
     EXPECT_EQ(Check(), 1);
 }
 
-TEST_F(InspectionFileTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
+TEST_F(CheckFilePinTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
     std::filesystem::remove(file_);
     CapturedLog log;
     for (const std::string &text :
@@ -72,13 +72,13 @@ TEST_F(InspectionFileTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
-TEST_F(InspectionFileTest, WithoutAConfigurationItIsAnError) {
+TEST_F(CheckFilePinTest, WithoutAConfigurationItIsAnError) {
     CapturedLog log;
     EXPECT_EQ(CheckFileIsPin(config_.c_str(), "no top directory"), 2);
     EXPECT_EQ(log.Messages(), Messages{"Can't find config file (" + config_ + ")"});
 }
 
-TEST_F(InspectionFileTest, APathWithoutATopDirectoryIsAnError) {
+TEST_F(CheckFilePinTest, APathWithoutATopDirectoryIsAnError) {
     WriteWhole(config_, "damaged"); // not looked at yet
     CapturedLog log;
     EXPECT_EQ(CheckFileIsPin(config_.c_str(), "volume1/a"), 2);
@@ -89,7 +89,7 @@ TEST_F(InspectionFileTest, APathWithoutATopDirectoryIsAnError) {
                               }));
 }
 
-TEST_F(InspectionFileTest, AConfigurationThatCannotBeUsedIsAnError) {
+TEST_F(CheckFilePinTest, AConfigurationThatCannotBeUsedIsAnError) {
     for (const char *text : {"[]", "5", R"({"volumes" : []})", R"({"volumes" : {"/x" : "y"}})",
                              R"({"volumes" : {"/x" : {"files" : []}}})"}) {
         WriteWhole(config_, text);
@@ -107,7 +107,7 @@ TEST_F(InspectionFileTest, AConfigurationThatCannotBeUsedIsAnError) {
                               }));
 }
 
-TEST_F(InspectionFileTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
+TEST_F(CheckFilePinTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
     StoreFiles("{\"1\" : \"file\"}");
     std::filesystem::remove(file_);
     CapturedLog log(2);

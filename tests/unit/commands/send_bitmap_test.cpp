@@ -1,64 +1,12 @@
-#include "commands/inspection.h"
+#include "commands/send_bitmap.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <cerrno>
 
-class InspectionTest : public CommandsTest {};
+class SendBitmapTest : public CommandsTest {};
 
-TEST_F(InspectionTest, CheckBitmapAnswersTheDriversState) {
-    for (const int state : {0, 1, 7, -1}) {
-        device_->bitmapSet = state;
-        CapturedLog log;
-        EXPECT_EQ(CheckBitmapSet(Volume()), state);
-        EXPECT_EQ(log.Messages(), Messages{});
-    }
-    EXPECT_EQ(device_->events, Events(4, "query"));
-    CapturedLog log(2);
-    CheckBitmapSet(Volume());
-    EXPECT_EQ(MessagesOf(log, "CheckBitmapSet"),
-              Messages{"CheckBitmapSet() [N]: Bitmap set state = -1"});
-}
-
-TEST_F(InspectionTest, CheckBitmapOfAVolumeWithoutPinningIs0) {
-    FakeAppliance::caches[0].supportPin = 0;
-    CapturedLog log(2);
-    EXPECT_EQ(CheckBitmapSet(Volume()), 0);
-    EXPECT_EQ(MessagesOf(log, "CheckBitmapSet"),
-              (Messages{
-                  "CheckBitmapSet() [N]: Volume (" + volume_ + ") doesn't support pin",
-                  "CheckBitmapSet() [N]: Bitmap set state = 0",
-              }));
-    EXPECT_EQ(device_->events, Events{});
-    CapturedLog quiet;
-    EXPECT_EQ(CheckBitmapSet(Volume()), 0);
-    EXPECT_EQ(quiet.Messages(), Messages{});
-}
-
-TEST_F(InspectionTest, CheckBitmapWithoutACachePathIs0) {
-    FakeAppliance::caches[0].cachePathResult = 0;
-    CapturedLog log(2);
-    EXPECT_EQ(CheckBitmapSet(Volume()), 0);
-    EXPECT_EQ(MessagesOf(log, "CheckBitmapSet"),
-              (Messages{
-                  "CheckBitmapSet() [N] : ***** Can't get cache path",
-                  "CheckBitmapSet() [N]: Bitmap set state = 0",
-              }));
-}
-
-TEST_F(InspectionTest, CheckBitmapThatTheDriverRefusesIs0) {
-    device_->bitmapSet = 1;
-    device_->failingRequest = 0x8004FECF;
-    CapturedLog log(2);
-    EXPECT_EQ(CheckBitmapSet(Volume()), 0);
-    EXPECT_EQ(MessagesOf(log, "CheckBitmapSet"),
-              (Messages{
-                  "CheckBitmapSet() [N] : ***** Can't get cache's bitmap status",
-                  "CheckBitmapSet() [N]: Bitmap set state = 0",
-              }));
-}
-
-TEST_F(InspectionTest, SendBitmapSendsTheStoredBitmapAsItIs) {
+TEST_F(SendBitmapTest, SendBitmapSendsTheStoredBitmapAsItIs) {
     WriteWhole(bitmapFile_, "\x81\x01");
     FakeLibc::Count("write");
     CapturedLog log;
@@ -68,7 +16,7 @@ TEST_F(InspectionTest, SendBitmapSendsTheStoredBitmapAsItIs) {
     EXPECT_EQ(device_->events, (Events{"query", "bitmap 8101 file 8101"}));
 }
 
-TEST_F(InspectionTest, SendBitmapWritesABitmapWhoseSizeHasChangedBackFirst) {
+TEST_F(SendBitmapTest, SendBitmapWritesABitmapWhoseSizeHasChangedBackFirst) {
     WriteWhole(bitmapFile_, "\x81");
     CapturedLog log;
     EXPECT_EQ(SendBitmap(Volume()), 0);
@@ -76,7 +24,7 @@ TEST_F(InspectionTest, SendBitmapWritesABitmapWhoseSizeHasChangedBackFirst) {
     EXPECT_EQ(device_->events, (Events{"query", "bitmap 8100 file 8100"}));
 }
 
-TEST_F(InspectionTest, SendBitmapSendsNothingToADriverThatHoldsOne) {
+TEST_F(SendBitmapTest, SendBitmapSendsNothingToADriverThatHoldsOne) {
     WriteWhole(bitmapFile_, "\x81\x01");
     device_->bitmapSet = -1;
     CapturedLog log;
@@ -85,7 +33,7 @@ TEST_F(InspectionTest, SendBitmapSendsNothingToADriverThatHoldsOne) {
     EXPECT_EQ(device_->events, Events{"query"});
 }
 
-TEST_F(InspectionTest, SendBitmapWithoutABitmapFileSucceeds) {
+TEST_F(SendBitmapTest, SendBitmapWithoutABitmapFileSucceeds) {
     CapturedLog log;
     EXPECT_EQ(SendBitmap(Volume()), 0);
     EXPECT_EQ(log.Messages(), Messages{"Bitmap file (" + bitmapFile_ +
@@ -94,7 +42,7 @@ TEST_F(InspectionTest, SendBitmapWithoutABitmapFileSucceeds) {
     EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
 }
 
-TEST_F(InspectionTest, SendBitmapsGoodEndsAreNotices) {
+TEST_F(SendBitmapTest, SendBitmapsGoodEndsAreNotices) {
     CapturedLog log(2);
     SendBitmap(Volume());
     device_->bitmapSet = 1;
@@ -106,7 +54,7 @@ TEST_F(InspectionTest, SendBitmapsGoodEndsAreNotices) {
                                              }));
 }
 
-TEST_F(InspectionTest, SendBitmapOfAVolumeWithoutPinningFails) {
+TEST_F(SendBitmapTest, SendBitmapOfAVolumeWithoutPinningFails) {
     FakeAppliance::caches[0].state = 2;
     CapturedLog log;
     EXPECT_EQ(SendBitmap(Volume()), -1);
@@ -114,14 +62,14 @@ TEST_F(InspectionTest, SendBitmapOfAVolumeWithoutPinningFails) {
     EXPECT_EQ(device_->events, Events{});
 }
 
-TEST_F(InspectionTest, SendBitmapWithoutACachePathFails) {
+TEST_F(SendBitmapTest, SendBitmapWithoutACachePathFails) {
     FakeAppliance::caches[0].cachePathResult = 0;
     CapturedLog log;
     EXPECT_EQ(SendBitmap(Volume()), -1);
     EXPECT_EQ(log.Messages(), (Messages{"Can't get cache path", "Can't get cache path"}));
 }
 
-TEST_F(InspectionTest, SendBitmapWithoutAnAnswerOfTheDriverFails) {
+TEST_F(SendBitmapTest, SendBitmapWithoutAnAnswerOfTheDriverFails) {
     device_->failingRequest = 0x8004FECF;
     WriteWhole(bitmapFile_, "\x81\x01");
     CapturedLog log(2);
@@ -131,7 +79,7 @@ TEST_F(InspectionTest, SendBitmapWithoutAnAnswerOfTheDriverFails) {
     EXPECT_EQ(device_->events, Events{"query"});
 }
 
-TEST_F(InspectionTest, SendBitmapOfAVolumeThatHasGoneMeanwhileFails) {
+TEST_F(SendBitmapTest, SendBitmapOfAVolumeThatHasGoneMeanwhileFails) {
     device_->onQuery = [] { FakeAppliance::enumResult = -1; };
     CapturedLog log;
     EXPECT_EQ(SendBitmap(Volume()), -1);
@@ -142,7 +90,7 @@ TEST_F(InspectionTest, SendBitmapOfAVolumeThatHasGoneMeanwhileFails) {
                               }));
 }
 
-TEST_F(InspectionTest, SendBitmapOfAFileThatIsTooLongFails) {
+TEST_F(SendBitmapTest, SendBitmapOfAFileThatIsTooLongFails) {
     WriteWhole(bitmapFile_, "abc");
     CapturedLog log;
     EXPECT_EQ(SendBitmap(Volume()), -1);
@@ -153,7 +101,7 @@ TEST_F(InspectionTest, SendBitmapOfAFileThatIsTooLongFails) {
     EXPECT_EQ(ReadWhole(bitmapFile_), "abc");
 }
 
-TEST_F(InspectionTest, SendBitmapToADeviceThatHasGoneMeanwhileFails) {
+TEST_F(SendBitmapTest, SendBitmapToADeviceThatHasGoneMeanwhileFails) {
     WriteWhole(bitmapFile_, "\x81\x01");
     device_->onQuery = [] { FakeAppliance::caches[0].cachePath = "/missing/device"; };
     CapturedLog log;
@@ -167,7 +115,7 @@ TEST_F(InspectionTest, SendBitmapToADeviceThatHasGoneMeanwhileFails) {
                               }));
 }
 
-TEST_F(InspectionTest, SendBitmapThatCannotBeWrittenBackIsNotSent) {
+TEST_F(SendBitmapTest, SendBitmapThatCannotBeWrittenBackIsNotSent) {
     WriteWhole(bitmapFile_, "\x81");
     FakeLibc::Fail("write", ENOSPC);
     CapturedLog log(2);
@@ -177,7 +125,7 @@ TEST_F(InspectionTest, SendBitmapThatCannotBeWrittenBackIsNotSent) {
     EXPECT_EQ(device_->events, Events{"query"});
 }
 
-TEST_F(InspectionTest, SendBitmapThatTheDriverRefusesFails) {
+TEST_F(SendBitmapTest, SendBitmapThatTheDriverRefusesFails) {
     WriteWhole(bitmapFile_, "\x81\x01");
     device_->failingRequest = 0xFECF;
     CapturedLog log(2);

@@ -1,4 +1,4 @@
-#include "commands/volume_events.h"
+#include "commands/handle_mount.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
@@ -28,30 +28,6 @@ int HandleSpaceMount(const char *configPath, const char *mountPath) {
     }
     if (unlink(bitmapPath.get()) < 0) {
         LogError("Can't delete bitmap file (%s)", bitmapPath.get());
-        return -1;
-    }
-    return 0;
-}
-
-int HandleSpaceUmount(const char *mountPath) {
-    if (!SpaceHasCacheAndSupportPin(mountPath)) {
-        LogNotice("Space (%s) doesn't support pin", mountPath);
-    }
-    return 0;
-}
-
-int DeleteBitmap(const char *mountPath) {
-    const MallocText bitmapPath(BitmapGetPathByReferencePath(mountPath));
-    if (!bitmapPath) {
-        LogError("Can't get bitmap path");
-        return -1;
-    }
-    if (!PathExists(bitmapPath.get())) {
-        LogVerbose("bitmap (%s) doesn't exist", bitmapPath.get());
-        return 0;
-    }
-    if (unlink(bitmapPath.get()) < 0) {
-        LogError("Can't delete bitmap (%s)", bitmapPath.get());
         return -1;
     }
     return 0;

@@ -1,4 +1,4 @@
-#include "commands/bitmap_development.h"
+#include "commands/modify_bitmap.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
@@ -77,19 +77,6 @@ int SetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) 
 int UnsetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
     if (ModifyBitmap(mountPath, startSector, numSectors, opUnset) != 0) {
         LogError("Set bitmap failed");
-        return -1;
-    }
-    return 0;
-}
-
-int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
-    const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
-    if (!cachePath) {
-        LogError("Get cache path from mount path (%s) failed", mountPath);
-        return -1;
-    }
-    if (BitmapGetNeededSizeByte(cachePath.get(), size) < 0) {
-        LogError("Get bitmap size for cache (%s) failed", cachePath.get());
         return -1;
     }
     return 0;

@@ -1,19 +1,19 @@
-#include "commands/bitmap_development.h"
+#include "commands/modify_bitmap.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <cerrno>
 
-class BitmapDevelopmentTest : public CommandsTest {};
+class ModifyBitmapTest : public CommandsTest {};
 
-TEST_F(BitmapDevelopmentTest, SettingARangeWritesTheFileThenSendsTheBitmap) {
+TEST_F(ModifyBitmapTest, SettingARangeWritesTheFileThenSendsTheBitmap) {
     CapturedLog log;
     EXPECT_EQ(SetBitmap(Volume(), 127, 2), 0);
     EXPECT_EQ(log.Messages(), Messages{});
     EXPECT_EQ(device_->events, Events{"bitmap 0300 file 0300"}); // and nothing is read
 }
 
-TEST_F(BitmapDevelopmentTest, SettingWhatIsSetWritesAndSendsAgain) {
+TEST_F(ModifyBitmapTest, SettingWhatIsSetWritesAndSendsAgain) {
     WriteWhole(bitmapFile_, std::string("\x03\x00", 2));
     FakeLibc::Count("write");
     EXPECT_EQ(SetBitmap(Volume(), 0, 256), 0);
@@ -21,7 +21,7 @@ TEST_F(BitmapDevelopmentTest, SettingWhatIsSetWritesAndSendsAgain) {
     EXPECT_EQ(device_->events, Events{"bitmap 0300 file 0300"});
 }
 
-TEST_F(BitmapDevelopmentTest, ClearingARangeKeepsTheOthers) {
+TEST_F(ModifyBitmapTest, ClearingARangeKeepsTheOthers) {
     WriteWhole(bitmapFile_, "\xff\xff");
     CapturedLog log;
     EXPECT_EQ(UnsetBitmap(Volume(), 128, 1024), 0);
@@ -29,18 +29,18 @@ TEST_F(BitmapDevelopmentTest, ClearingARangeKeepsTheOthers) {
     EXPECT_EQ(device_->events, Events{"bitmap 01fe file 01fe"});
 }
 
-TEST_F(BitmapDevelopmentTest, AGrownVolumesBitmapIsWrittenWhole) {
+TEST_F(ModifyBitmapTest, AGrownVolumesBitmapIsWrittenWhole) {
     WriteWhole(bitmapFile_, "\x80");
     EXPECT_EQ(UnsetBitmap(Volume(), 0, 128), 0);
     EXPECT_EQ(device_->events, Events{"bitmap 8000 file 8000"});
 }
 
-TEST_F(BitmapDevelopmentTest, ARangePastTheEndChangesNothing) {
+TEST_F(ModifyBitmapTest, ARangePastTheEndChangesNothing) {
     EXPECT_EQ(SetBitmap(Volume(), 16 * 128, 128), 0);
     EXPECT_EQ(device_->events, Events{"bitmap 0000 file 0000"});
 }
 
-TEST_F(BitmapDevelopmentTest, AnUnknownOperationWritesAndSendsNothing) {
+TEST_F(ModifyBitmapTest, AnUnknownOperationWritesAndSendsNothing) {
     WriteWhole(bitmapFile_, "\xff\xff");
     for (const int op : {2, -1}) {
         CapturedLog log(2);
@@ -52,13 +52,13 @@ TEST_F(BitmapDevelopmentTest, AnUnknownOperationWritesAndSendsNothing) {
     EXPECT_EQ(device_->events, Events{});
 }
 
-TEST_F(BitmapDevelopmentTest, ModifyTakes1AsSetAnd0AsClear) {
+TEST_F(ModifyBitmapTest, ModifyTakes1AsSetAnd0AsClear) {
     EXPECT_EQ(ModifyBitmap(Volume(), 0, 256, 1), 0);
     EXPECT_EQ(ModifyBitmap(Volume(), 0, 128, 0), 0);
     EXPECT_EQ(device_->events, (Events{"bitmap 0300 file 0300", "bitmap 0200 file 0200"}));
 }
 
-TEST_F(BitmapDevelopmentTest, WithoutTheSpaceItFails) {
+TEST_F(ModifyBitmapTest, WithoutTheSpaceItFails) {
     FakeAppliance::spaces.clear();
     CapturedLog log;
     EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
@@ -70,7 +70,7 @@ TEST_F(BitmapDevelopmentTest, WithoutTheSpaceItFails) {
               }));
 }
 
-TEST_F(BitmapDevelopmentTest, FailuresNameTheirFunctions) {
+TEST_F(ModifyBitmapTest, FailuresNameTheirFunctions) {
     FakeAppliance::caches.clear();
     CapturedLog log(2);
     EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
@@ -82,7 +82,7 @@ TEST_F(BitmapDevelopmentTest, FailuresNameTheirFunctions) {
               Messages{"UnsetBitmap() [N] : ***** Set bitmap failed"});
 }
 
-TEST_F(BitmapDevelopmentTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
+TEST_F(ModifyBitmapTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
     WriteWhole(bitmapFile_, "abc");
     CapturedLog log;
     EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
@@ -94,7 +94,7 @@ TEST_F(BitmapDevelopmentTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
     EXPECT_EQ(ReadWhole(bitmapFile_), "abc");
 }
 
-TEST_F(BitmapDevelopmentTest, ADeviceWithoutASizeFails) {
+TEST_F(ModifyBitmapTest, ADeviceWithoutASizeFails) {
     FakeAppliance::caches[0].cachePath = "/missing/device";
     CapturedLog log;
     EXPECT_EQ(ModifyBitmap(Volume(), 0, 128, 1), -1);
@@ -107,7 +107,7 @@ TEST_F(BitmapDevelopmentTest, ADeviceWithoutASizeFails) {
                               }));
 }
 
-TEST_F(BitmapDevelopmentTest, ABitmapThatCannotBeWrittenIsNotSent) {
+TEST_F(ModifyBitmapTest, ABitmapThatCannotBeWrittenIsNotSent) {
     FakeLibc::Fail("write", ENOSPC);
     CapturedLog log;
     EXPECT_EQ(UnsetBitmap(Volume(), 0, 128), -1);
@@ -120,41 +120,11 @@ TEST_F(BitmapDevelopmentTest, ABitmapThatCannotBeWrittenIsNotSent) {
     EXPECT_EQ(device_->events, Events{});
 }
 
-TEST_F(BitmapDevelopmentTest, ADriverThatRefusesLeavesTheFileChanged) {
+TEST_F(ModifyBitmapTest, ADriverThatRefusesLeavesTheFileChanged) {
     device_->failingRequest = 0xFECF;
     CapturedLog log(2);
     EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
     EXPECT_EQ(MessagesOf(log, "ModifyBitmap"),
               Messages{"ModifyBitmap() [N] : ***** Can't send bitmap to driver"});
     EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "0100");
-}
-
-TEST_F(BitmapDevelopmentTest, TheBitmapSizeIsThatOfTheCacheDevice) {
-    CapturedLog log;
-    uint64_t size = 0;
-    EXPECT_EQ(GetBitmapSizeByte(Volume(), &size), 0);
-    EXPECT_EQ(size, 2U);
-    EXPECT_EQ(log.Messages(), Messages{});
-}
-
-TEST_F(BitmapDevelopmentTest, TheBitmapSizeNeedsACache) {
-    FakeAppliance::caches.clear();
-    uint64_t size = 0;
-    CapturedLog log(2);
-    EXPECT_EQ(GetBitmapSizeByte(Volume(), &size), -1);
-    EXPECT_EQ(MessagesOf(log, "GetBitmapSizeByte"),
-              Messages{"GetBitmapSizeByte() [N] : ***** Get cache path from mount path (" +
-                       volume_ + ") failed"});
-}
-
-TEST_F(BitmapDevelopmentTest, TheBitmapSizeNeedsTheDevice) {
-    FakeAppliance::caches[0].cachePath = "/missing/device";
-    uint64_t size = 0;
-    CapturedLog log;
-    EXPECT_EQ(GetBitmapSizeByte(Volume(), &size), -1);
-    EXPECT_EQ(log.Messages(), (Messages{
-                                  "Can't open device (/missing/device)",
-                                  "Can't get block device path",
-                                  "Get bitmap size for cache (/missing/device) failed",
-                              }));
 }

@@ -1,0 +1,13 @@
+// Asking the configuration whether a file is pinned.
+// Thread rule: for one-shot processes; no lock is taken.
+#ifndef COMMANDS_CHECK_FILE_PIN_H
+#define COMMANDS_CHECK_FILE_PIN_H
+
+const int checkPinPinned = 0;
+const int checkPinNotPinned = 1;
+const int checkPinError = 2; // after an error message
+
+// Whether the file's inode number is recorded for the volume of its top directory.
+int CheckFileIsPin(const char *configPath, const char *filePath);
+
+#endif

@@ -1,0 +1,58 @@
+#include "commands/files_request.h"
+
+#include "base/log.h"
+#include "commands/client_message.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
+#include "request/tool_parameters.h"
+#include "space/space_cache.h"
+
+#include <cerrno>
+#include <cstring>
+
+namespace {
+
+bool IsFilesRequest(int requestType) {
+    return requestType == requestPinFiles || requestType == requestUnpinFiles;
+}
+
+} // namespace
+
+int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) {
+    LogTraceScope();
+    if (!IsFilesRequest(requestType) && requestType != requestReloadPinBlocks) {
+        LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
+        return -1;
+    }
+    if (!SpaceHasCacheAndSupportPin(parameters->mountPath)) {
+        LogError("Volume (%s) doesn't support pin", parameters->mountPath);
+        return -1;
+    }
+    const int queueId = MsgQueueGet(messageKeyFile);
+    if (queueId == -1) {
+        LogError("Can't get server messsage queue: %s", strerror(errno));
+        return -1;
+    }
+    LogVerbose("Server mesage queue id = %d", queueId);
+    RequestMessage message = BuildMessage(requestType, parameters->mountPath);
+    if (IsFilesRequest(requestType)) {
+        CopyToField(message.record.data, parameters->files);
+    }
+    if (MsgQueueSend(queueId, &message, requestMessageBytes) == -1) {
+        LogError("Send message failed: %s", strerror(errno));
+        return -1;
+    }
+    return 0;
+}
+
+int PinFilesRequest(const ToolParameters *parameters) {
+    return HandleFilesByRequestType(parameters, requestPinFiles);
+}
+
+int UnpinFilesRequest(const ToolParameters *parameters) {
+    return HandleFilesByRequestType(parameters, requestUnpinFiles);
+}
+
+int ReloadPinBlocksRequest(const ToolParameters *parameters) {
+    return HandleFilesByRequestType(parameters, requestReloadPinBlocks);
+}

@@ -1,0 +1,11 @@
+#include "commands/handle_umount.h"
+
+#include "base/log.h"
+#include "space/space_cache.h"
+
+int HandleSpaceUmount(const char *mountPath) {
+    if (!SpaceHasCacheAndSupportPin(mountPath)) {
+        LogNotice("Space (%s) doesn't support pin", mountPath);
+    }
+    return 0;
+}

