@@ -3,9 +3,9 @@
 #include "tests/support/fake_libc.h"
 #include "tests/support/temp_dir.h"
 
+#include "base/scoped_fd.h"
 #include "bitmap/pin_bitmap.h"
 #include "driver/pin_interface.h"
-#include "platform/scoped_fd.h"
 
 #include <cerrno>
 #include <climits>
