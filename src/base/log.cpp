@@ -47,9 +47,9 @@ private:
     std::unique_ptr<char[]> grown_;
 };
 
-void WriteShort(int line, const char *core) {
+void WriteShort(const LogPlace &place, const char *core) {
     if (LogToSyslog == 1) {
-        syslog(LOG_ERR, "%s:%d %s", sourceFileName, line, core);
+        syslog(LOG_ERR, "%s:%d %s", sourceFileName, place.line, core);
     } else {
         printf("%s: %s\n", ProgramName, core);
     }
@@ -57,46 +57,52 @@ void WriteShort(int line, const char *core) {
 
 // `colon` is what stands between the line and the text on standard output, `marker` precedes the
 // text.
-void WriteLong(int line, const char *function, const char *colon, const char *marker,
-               const char *core) {
+void WriteLong(const LogPlace &place, const char *colon, const char *marker, const char *core) {
     if (LogToSyslog == 1) {
-        syslog(LOG_ERR, "%s:%d %s() [%d] : %s%s", sourceFileName, line, function, line, marker,
-               core);
+        syslog(LOG_ERR, "%s:%d %s() [%d] : %s%s", sourceFileName, place.line, place.function,
+               place.line, marker, core);
     } else {
-        printf("%s: %s() [%d]%s%s%s\n", ProgramName, function, line, colon, marker, core);
+        printf("%s: %s() [%d]%s%s%s\n", ProgramName, place.function, place.line, colon, marker,
+               core);
     }
 }
 
+void WriteOut(LogClass logClass, const LogPlace &place, const char *core) {
+    if (logClass == LogClass::Verbose || logClass == LogClass::Debug) {
+        // Readers of verbose output on a terminal see no blank before this colon.
+        WriteLong(place, ": ", "", core);
+    } else if (LogLevel <= 1) {
+        WriteShort(place, core);
+    } else {
+        WriteLong(place, " : ", logClass == LogClass::Error ? "***** " : "", core);
+    }
+}
+
+LogSink currentSink = WriteOut;
+
 } // namespace
 
-void LogWrite(LogClass logClass, int line, const char *function, const char *format, ...) {
+void LogSetSink(LogSink sink) {
+    currentSink = sink != nullptr ? sink : WriteOut;
+}
+
+void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...) {
+    if ((logClass == LogClass::Verbose && LogLevel <= 1) ||
+        (logClass == LogClass::Debug && LogLevel <= 2)) {
+        return;
+    }
     const int savedErrno = errno;
     va_list arguments;
     va_start(arguments, format);
     const MessageText core(format, arguments);
     va_end(arguments);
-
-    const bool detail = logClass == LogClass::Verbose || logClass == LogClass::Debug;
-    if (detail) {
-        // Readers of verbose output on a terminal see no blank before this colon.
-        WriteLong(line, function, ": ", "", core.Get());
-    } else if (LogLevel <= 1) {
-        WriteShort(line, core.Get());
-    } else {
-        WriteLong(line, function, " : ", logClass == LogClass::Error ? "***** " : "", core.Get());
-    }
+    currentSink(logClass, place, core.Get());
     errno = savedErrno;
 }
 
-LogTrace::LogTrace(int line, const char *function) : line_(line), function_(function) {
+void LogTraceMark(const char *mark, const LogPlace &place) {
     if (LogLevel > 1) {
-        LogWrite(LogClass::Notice, line_, function_, "+++++");
-    }
-}
-
-LogTrace::~LogTrace() {
-    if (LogLevel > 1) {
-        LogWrite(LogClass::Notice, line_, function_, "-----");
+        LogWrite(LogClass::Notice, place, "%s", mark);
     }
 }
 

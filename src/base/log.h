@@ -21,57 +21,62 @@ extern const char *ProgramName; // begins every line on standard output; null un
 
 enum class LogClass { Error, Notice, Verbose, Debug };
 
-// Writes one message, printf-like. Use the macros below: they add the calling place.
-void LogWrite(LogClass logClass, int line, const char *function, const char *format, ...)
-    __attribute__((format(printf, 4, 5)));
+// The place that a message names. A helper that fails on behalf of the function that calls it takes
+// its caller's place and logs there: readers of the log search for the function's name.
+struct LogPlace {
+    const char *function;
+    int line;
+};
+#define LogHere() (LogPlace{__func__, __LINE__})
+
+// Writes one message, printf-like; verbose and debug ones only where the level asks for them. Use
+// the macros below, which add the calling place; LogWrite itself in a helper that was given one.
+void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
+    __attribute__((format(printf, 3, 4)));
 
 // Error and notice messages are always written, the error's long form carries a marker.
-#define LogError(...) LogWrite(LogClass::Error, __LINE__, __func__, __VA_ARGS__)
-#define LogNotice(...) LogWrite(LogClass::Notice, __LINE__, __func__, __VA_ARGS__)
+#define LogError(...) LogWrite(LogClass::Error, LogHere(), __VA_ARGS__)
+#define LogNotice(...) LogWrite(LogClass::Notice, LogHere(), __VA_ARGS__)
 
 // The arguments of verbose and debug messages are evaluated only when the level asks for them.
 #define LogVerbose(...)                                                                            \
     do {                                                                                           \
         if (LogLevel > 1) {                                                                        \
-            LogWrite(LogClass::Verbose, __LINE__, __func__, __VA_ARGS__);                          \
+            LogWrite(LogClass::Verbose, LogHere(), __VA_ARGS__);                                   \
         }                                                                                          \
     } while (0)
 #define LogDebug(...)                                                                              \
     do {                                                                                           \
         if (LogLevel > 2) {                                                                        \
-            LogWrite(LogClass::Debug, __LINE__, __func__, __VA_ARGS__);                            \
+            LogWrite(LogClass::Debug, LogHere(), __VA_ARGS__);                                     \
         }                                                                                          \
     } while (0)
 
 // The entry/exit trace: "+++++" and "-----", written at level 2 and above in the long form of a
 // notice.
-#define LogTraceEntry()                                                                            \
-    do {                                                                                           \
-        if (LogLevel > 1) {                                                                        \
-            LogNotice("+++++");                                                                    \
-        }                                                                                          \
-    } while (0)
-#define LogTraceExit()                                                                             \
-    do {                                                                                           \
-        if (LogLevel > 1) {                                                                        \
-            LogNotice("-----");                                                                    \
-        }                                                                                          \
-    } while (0)
+void LogTraceMark(const char *mark, const LogPlace &place);
+#define LogTraceEntry() LogTraceMark("+++++", LogHere())
+#define LogTraceExit() LogTraceMark("-----", LogHere())
 
 // Both for a whole scope. Not for a function whose callee ends the thread: the thread's end unwinds
 // the scope, and a trace would tell of a return that never was.
 class LogTrace {
 public:
-    LogTrace(int line, const char *function);
-    ~LogTrace();
+    explicit LogTrace(const LogPlace &place) : place_(place) { LogTraceMark("+++++", place_); }
+    ~LogTrace() { LogTraceMark("-----", place_); }
     LogTrace(const LogTrace &) = delete;
     LogTrace &operator=(const LogTrace &) = delete;
 
 private:
-    int line_;
-    const char *function_;
+    LogPlace place_;
 };
-#define LogTraceScope() const LogTrace logTrace(__LINE__, __func__)
+#define LogTraceScope() const LogTrace logTrace(LogHere())
+
+// Takes every message in the place of the system log and standard output; the text is without place
+// and marker and ends with the call. Null: back to those. For programs that show messages in their
+// own way.
+using LogSink = void (*)(LogClass logClass, const LogPlace &place, const char *text);
+void LogSetSink(LogSink sink);
 
 // The argument of a %llu conversion, whatever type 64-bit integers have on the platform.
 inline unsigned long long LogU64(uint64_t value) {
