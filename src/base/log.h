@@ -38,13 +38,15 @@ void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
 #define LogError(...) LogWrite(LogClass::Error, LogHere(), __VA_ARGS__)
 #define LogNotice(...) LogWrite(LogClass::Notice, LogHere(), __VA_ARGS__)
 
-// The arguments of verbose and debug messages are evaluated only when the level asks for them.
-#define LogVerbose(...)                                                                            \
+// The arguments of verbose and debug messages are evaluated only when the level asks for them: some
+// of them log for themselves.
+#define LogVerboseAt(place, ...)                                                                   \
     do {                                                                                           \
         if (LogLevel > 1) {                                                                        \
-            LogWrite(LogClass::Verbose, LogHere(), __VA_ARGS__);                                   \
+            LogWrite(LogClass::Verbose, place, __VA_ARGS__);                                       \
         }                                                                                          \
     } while (0)
+#define LogVerbose(...) LogVerboseAt(LogHere(), __VA_ARGS__)
 #define LogDebug(...)                                                                              \
     do {                                                                                           \
         if (LogLevel > 2) {                                                                        \

@@ -144,6 +144,7 @@ TEST_F(LogToStdout, ArgumentsOfSilentMessagesAreNotEvaluated) {
     int evaluated = 0;
     LogVerbose("%d", ++evaluated);
     LogDebug("%d", ++evaluated);
+    LogVerboseAt(LogHere(), "%d", ++evaluated);
     EXPECT_EQ(evaluated, 0);
 }
 
