@@ -6,55 +6,133 @@
 #include "files/path.h"
 #include "space/space_cache.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <getopt.h>
+#include <iterator>
 
 namespace {
 
-// Options that exist only in their long form have small values, which no character can have.
-enum : int {
-    optionStartSector = 0,
-    optionNumSectors = 1,
-    optionUnsetBitmap = 2,
-    optionUnpinRange = 3,
-    optionGetBitmapSizeByte = 4,
-    optionCachePath = 5,
+// An option where it was met on the command line; messages about it name that place.
+struct MetOption {
+    char *argument;
+    ToolParameters *parameters;
+    LogPlace place;
 };
 
-const option longOptions[] = {
-    {"pin-files", required_argument, nullptr, 'a'},
-    {"unpin-files", required_argument, nullptr, 'b'},
-    {"start-service", no_argument, nullptr, 'c'},
-    {"config-path", required_argument, nullptr, 'f'},
-    {"space-uuid", required_argument, nullptr, 'g'},
-    {"send-bitmap", no_argument, nullptr, 'i'},
-    {"mount-path", required_argument, nullptr, 'j'},
-    {"support-pin", no_argument, nullptr, 'k'},
-    {"stdout", no_argument, nullptr, 'l'},
-    {"check-bitmap", no_argument, nullptr, 'm'},
-    {"add-pending", no_argument, nullptr, 'n'},
-    {"remove-pending", no_argument, nullptr, 'o'},
-    {"handle-mount", no_argument, nullptr, 'p'},
-    {"handle-umount", no_argument, nullptr, 'q'},
-    {"get-uuid", no_argument, nullptr, 'r'},
-    {"delete-bitmap", no_argument, nullptr, 's'},
-    {"check-pin", required_argument, nullptr, 't'},
-    {"reload-blocks", no_argument, nullptr, 'u'},
-    {"unpin-all", no_argument, nullptr, 'v'},
-    {"is-all-unpin", required_argument, nullptr, 'w'},
-    {"set-bitmap", no_argument, nullptr, 'x'},
-    {"start-sector", required_argument, nullptr, optionStartSector},
-    {"num-sectors", required_argument, nullptr, optionNumSectors},
-    {"unset-bitmap", no_argument, nullptr, optionUnsetBitmap},
-    {"unpin-range", no_argument, nullptr, optionUnpinRange},
-    {"get-bitmap-size-byte", no_argument, nullptr, optionGetBitmapSizeByte},
-    {"cache-path", required_argument, nullptr, optionCachePath},
-    {"help", no_argument, nullptr, 'h'},
-    {"verbose", no_argument, nullptr, 'y'},
-    {"debug", no_argument, nullptr, 'z'},
-    {nullptr, 0, nullptr, 0},
+// What an option does where it is met. False, after an error message, ends the parsing at once.
+using OptionAction = bool (*)(const MetOption &met);
+
+template <const char *ToolParameters::*field> bool Keep(const MetOption &met) {
+    met.parameters->*field = met.argument;
+    return true;
+}
+
+template <uint64_t ToolParameters::*field> bool KeepNumber(const MetOption &met) {
+    const long long number = strtoll(met.argument, nullptr, 10); // NOLINT(cert-err34-c)
+    met.parameters->*field = static_cast<uint64_t>(number);
+    return true;
+}
+
+bool KeepMountPath(const MetOption &met) {
+    StripTrailingSlash(met.argument);
+    return Keep<&ToolParameters::mountPath>(met);
+}
+
+bool KeepSpaceUuid(const MetOption &met) {
+    if (!SpaceHasCache(met.argument)) {
+        LogWrite(LogClass::Error, met.place, "Space UUID %s doesn't has cache", met.argument);
+        return false;
+    }
+    return Keep<&ToolParameters::spaceUuid>(met);
+}
+
+bool KeepCheckPinFile(const MetOption &met) {
+    if (!PathExists(met.argument)) {
+        LogWrite(LogClass::Error, met.place, "File (%s) doesn't exist", met.argument);
+        return false;
+    }
+    return Keep<&ToolParameters::checkPinFilePath>(met);
+}
+
+bool LogToStandardOutput(const MetOption & /*met*/) {
+    LogToSyslog = 0;
+    return true;
+}
+
+bool EnableVerbose(const MetOption &met) {
+    LogWrite(LogClass::Notice, met.place, "Verbose mode is enable");
+    met.parameters->verbose = 1;
+    return true;
+}
+
+bool EnableDebug(const MetOption &met) {
+    LogWrite(LogClass::Notice, met.place, "Debug mode is enable");
+    met.parameters->debug = 1;
+    return true;
+}
+
+bool Help(const MetOption & /*met*/) {
+    Usage();
+    exit(0);
+}
+
+const OptionAction KeepFiles = Keep<&ToolParameters::files>;
+const OptionAction KeepConfigPath = Keep<&ToolParameters::configPath>;
+const OptionAction KeepCachePath = Keep<&ToolParameters::cachePath>;
+const OptionAction KeepStartSector = KeepNumber<&ToolParameters::startSector>;
+const OptionAction KeepNumSectors = KeepNumber<&ToolParameters::numSectors>;
+
+using Requirement = int RequiredParameters::*;
+const Requirement cache = &RequiredParameters::cachePath;
+const Requirement config = &RequiredParameters::configPath;
+const Requirement files = &RequiredParameters::files;
+const Requirement mount = &RequiredParameters::mountPath;
+const Requirement start = &RequiredParameters::startSector;
+const Requirement count = &RequiredParameters::numSectors;
+
+struct OptionRow {
+    const char *name;
+    int argument;
+    int value; // the short option; a value that no character has: there is none
+    OptionAction act = nullptr;
+    ToolCommand command = commandInvalid; // chooses none
+    Requirement needs[3] = {};
+};
+
+const OptionRow optionRows[] = {
+    {"pin-files", required_argument, 'a', KeepFiles, commandPinFiles, {files, mount}},
+    {"unpin-files", required_argument, 'b', KeepFiles, commandUnpinFiles, {files, mount}},
+    {"start-service", no_argument, 'c', nullptr, commandStartService, {config}},
+    {"config-path", required_argument, 'f', KeepConfigPath},
+    {"space-uuid", required_argument, 'g', KeepSpaceUuid},
+    {"send-bitmap", no_argument, 'i', nullptr, commandSendBitmap, {mount}},
+    {"mount-path", required_argument, 'j', KeepMountPath},
+    {"support-pin", no_argument, 'k', nullptr, commandSupportPin, {mount}},
+    {"stdout", no_argument, 'l', LogToStandardOutput},
+    {"check-bitmap", no_argument, 'm', nullptr, commandCheckBitmap, {mount}},
+    {"add-pending", no_argument, 'n', nullptr, commandAddPendingSpace, {mount}},
+    {"remove-pending", no_argument, 'o', nullptr, commandRemovePendingSpace, {mount}},
+    {"handle-mount", no_argument, 'p', nullptr, commandHandleMount, {mount, config}},
+    {"handle-umount", no_argument, 'q', nullptr, commandHandleUmount, {mount}},
+    {"get-uuid", no_argument, 'r', nullptr, commandGetUUID, {mount}},
+    {"delete-bitmap", no_argument, 's', nullptr, commandDeleteBitmap, {mount}},
+    {"check-pin", required_argument, 't', KeepCheckPinFile, commandCheckPin, {config}},
+    {"reload-blocks", no_argument, 'u', nullptr, commandReloadPinBlocks, {mount}},
+    {"unpin-all", no_argument, 'v', nullptr, commandUnpinAllBlocks},
+    {"is-all-unpin", required_argument, 'w', KeepCachePath, commandIsAllUnpin, {cache}},
+    {"set-bitmap", no_argument, 'x', nullptr, commandSetBitmap, {mount, start, count}},
+    {"start-sector", required_argument, 0, KeepStartSector},
+    {"num-sectors", required_argument, 1, KeepNumSectors},
+    {"unset-bitmap", no_argument, 2, nullptr, commandUnsetBitmap, {mount, start, count}},
+    {"unpin-range", no_argument, 3, nullptr, commandUnpinRange, {mount, start, count}},
+    {"get-bitmap-size-byte", no_argument, 4, nullptr, commandGetBitmapSizeByte, {mount}},
+    {"cache-path", required_argument, 5, KeepCachePath},
+    {"help", no_argument, 'h', Help},
+    {"verbose", no_argument, 'y', EnableVerbose},
+    {"debug", no_argument, 'z', EnableDebug},
 };
 
 // 'r' and 'x' are missing and 'd' and 'e' have no option: scripts rely on what each of them does
@@ -72,15 +150,16 @@ const char *const commandNames[] = {
     "pin-files",
 };
 
-uint64_t ParseSector(const char *text) {
-    return static_cast<uint64_t>(strtoll(text, nullptr, 10)); // NOLINT(cert-err34-c)
-}
-
-// A command that works on a sector range of a volume.
-void RequireRange(RequiredParameters *required) {
-    required->mountPath = 1;
-    required->startSector = 1;
-    required->numSectors = 1;
+bool ActOnOption(const OptionRow &row, RequiredParameters *required, const MetOption &met) {
+    if (row.command != commandInvalid) {
+        met.parameters->command = row.command;
+    }
+    for (const Requirement need : row.needs) {
+        if (need != nullptr) {
+            required->*need = 1;
+        }
+    }
+    return row.act == nullptr || row.act(met);
 }
 
 } // namespace
@@ -138,129 +217,28 @@ int CheckParameter(const RequiredParameters *required, const ToolParameters *par
 }
 
 int GetOptions(int argc, char *argv[], ToolParameters *parameters) {
+    option longOptions[std::size(optionRows) + 1] = {};
+    std::transform(std::begin(optionRows), std::end(optionRows), longOptions,
+                   [](const OptionRow &row) {
+                       return option{row.name, row.argument, nullptr, row.value};
+                   });
     RequiredParameters required;
     optind = 0; // begin anew, whoever has parsed before
     int value = 0;
     while ((value = getopt_long(argc, argv, shortOptions, longOptions, nullptr)) != -1) {
-        switch (value) {
-        case 'a':
-            parameters->command = commandPinFiles;
-            parameters->files = optarg;
-            required.files = 1;
-            required.mountPath = 1;
-            break;
-        case 'b':
-            parameters->command = commandUnpinFiles;
-            parameters->files = optarg;
-            required.files = 1;
-            required.mountPath = 1;
-            break;
-        case 'c':
-            parameters->command = commandStartService;
-            required.configPath = 1;
-            break;
-        case 'f': parameters->configPath = optarg; break;
-        case 'g':
-            if (!SpaceHasCache(optarg)) {
-                LogError("Space UUID %s doesn't has cache", optarg);
-                return -1;
-            }
-            parameters->spaceUuid = optarg;
-            break;
-        case 'h': Usage(); exit(0);
-        case 'i':
-            parameters->command = commandSendBitmap;
-            required.mountPath = 1;
-            break;
-        case 'j':
-            StripTrailingSlash(optarg);
-            parameters->mountPath = optarg;
-            break;
-        case 'k':
-            parameters->command = commandSupportPin;
-            required.mountPath = 1;
-            break;
-        case 'l': LogToSyslog = 0; break;
-        case 'm':
-            parameters->command = commandCheckBitmap;
-            required.mountPath = 1;
-            break;
-        case 'n':
-            parameters->command = commandAddPendingSpace;
-            required.mountPath = 1;
-            break;
-        case 'o':
-            parameters->command = commandRemovePendingSpace;
-            required.mountPath = 1;
-            break;
-        case 'p':
-            parameters->command = commandHandleMount;
-            required.mountPath = 1;
-            required.configPath = 1;
-            break;
-        case 'q':
-            parameters->command = commandHandleUmount;
-            required.mountPath = 1;
-            break;
-        case 'r':
-            parameters->command = commandGetUUID;
-            required.mountPath = 1;
-            break;
-        case 's':
-            parameters->command = commandDeleteBitmap;
-            required.mountPath = 1;
-            break;
-        case 't':
-            parameters->command = commandCheckPin;
-            if (!PathExists(optarg)) {
-                LogError("File (%s) doesn't exist", optarg);
-                return -1;
-            }
-            parameters->checkPinFilePath = optarg;
-            required.configPath = 1;
-            break;
-        case 'u':
-            parameters->command = commandReloadPinBlocks;
-            required.mountPath = 1;
-            break;
-        case 'v': parameters->command = commandUnpinAllBlocks; break;
-        case 'w':
-            parameters->command = commandIsAllUnpin;
-            parameters->cachePath = optarg;
-            required.cachePath = 1;
-            break;
-        case 'x':
-            parameters->command = commandSetBitmap;
-            RequireRange(&required);
-            break;
-        case optionStartSector: parameters->startSector = ParseSector(optarg); break;
-        case optionNumSectors: parameters->numSectors = ParseSector(optarg); break;
-        case optionUnsetBitmap:
-            parameters->command = commandUnsetBitmap;
-            RequireRange(&required);
-            break;
-        case optionUnpinRange:
-            parameters->command = commandUnpinRange;
-            RequireRange(&required);
-            break;
-        case optionGetBitmapSizeByte:
-            parameters->command = commandGetBitmapSizeByte;
-            required.mountPath = 1;
-            break;
-        case optionCachePath: parameters->cachePath = optarg; break;
-        case 'y':
-            LogNotice("Verbose mode is enable");
-            parameters->verbose = 1;
-            break;
-        case 'z':
-            LogNotice("Debug mode is enable");
-            parameters->debug = 1;
-            break;
-        case '?': break; // getopt_long has complained on standard error
-        default:
+        if (value == '?') {
+            continue; // getopt_long has complained on standard error
+        }
+        const OptionRow *row =
+            std::find_if(std::begin(optionRows), std::end(optionRows),
+                         [value](const OptionRow &one) { return one.value == value; });
+        if (row == std::end(optionRows)) {
             LogError("Get unhandled option = %c", value);
             fflush(stdout);
             abort();
+        }
+        if (!ActOnOption(*row, &required, {optarg, parameters, LogHere()})) {
+            return -1;
         }
     }
 
