@@ -31,6 +31,187 @@ namespace {
 
 const char buildStamp[] = "2018-06-08-15:24";
 
+const int success = 0; // exit values
+const int failure = -1;
+
+// Readers of the log look for main, whichever of its handlers speaks.
+#define AtMain() (LogPlace{"main", __LINE__})
+
+// The exit value behind the message that tells of it.
+#define Succeed(...) (LogWrite(LogClass::Notice, AtMain(), __VA_ARGS__), success)
+#define Fail(...) (LogWrite(LogClass::Error, AtMain(), __VA_ARGS__), failure)
+
+int PrintAnswer(bool yes) {
+    puts(yes ? "Yes" : "No");
+    return success;
+}
+
+int NoCommand(const ToolParameters & /*asked*/) {
+    LogWrite(LogClass::Error, AtMain(), "Invalid input");
+    Usage();
+    return success;
+}
+
+int RunPinFiles(const ToolParameters &asked) {
+    LogWrite(LogClass::Notice, AtMain(), "Send pin file request, files = %s", asked.files);
+    return PinFilesRequest(&asked) < 0 ? Fail("Pin files failed")
+                                       : Succeed("Send pin file request OK");
+}
+
+int RunUnpinFiles(const ToolParameters &asked) {
+    LogWrite(LogClass::Notice, AtMain(), "Send unpin file request, files = %s", asked.files);
+    return UnpinFilesRequest(&asked) < 0 ? Fail("Unpin files failed")
+                                         : Succeed("Send unpin files request OK");
+}
+
+int RunSendBitmap(const ToolParameters &asked) {
+    LogWrite(LogClass::Notice, AtMain(), "Start to send bitmap for volume (%s)", asked.mountPath);
+    return SendBitmap(asked.mountPath) < 0
+               ? Fail("Send bitmap to space (%s) failed", asked.mountPath)
+               : Succeed("Send bitmap OK");
+}
+
+int RunStartService(const ToolParameters &asked) {
+    LogWrite(LogClass::Notice, AtMain(), "Service starts (Build time: %s)", buildStamp);
+    return StartService(&asked) < 0 ? Fail("Can't start service") : success;
+}
+
+int RunHandleMount(const ToolParameters &asked) {
+    if (HandleSpaceMount(asked.configPath, asked.mountPath) < 0) {
+        return Fail("Handle space (%s) mount failed", asked.mountPath);
+    }
+    LogVerboseAt(AtMain(), "Handle space (%s) mount OK", asked.mountPath);
+    return success;
+}
+
+int RunHandleUmount(const ToolParameters &asked) {
+    if (HandleSpaceUmount(asked.mountPath) < 0) {
+        return Fail("Handle space (%s) umount failed", asked.mountPath);
+    }
+    LogVerboseAt(AtMain(), "Handle space (%s) umount OK", asked.mountPath);
+    return success;
+}
+
+int RunSupportPin(const ToolParameters &asked) {
+    return PrintAnswer(SpaceHasCacheAndSupportPin(asked.mountPath));
+}
+
+int RunCheckBitmap(const ToolParameters &asked) {
+    return PrintAnswer(CheckBitmapSet(asked.mountPath) != 0);
+}
+
+int RunAddPending(const ToolParameters &asked) {
+    return AddPendingSpaceRequest(asked.mountPath) < 0 ? Fail("Can't sent pending space")
+                                                       : Succeed("Set pending space OK");
+}
+
+int RunRemovePending(const ToolParameters &asked) {
+    return RemovePendingSpaceRequest(asked.mountPath) < 0 ? Fail("Can't sent pending space")
+                                                          : Succeed("Set pending space OK");
+}
+
+int RunGetUuid(const ToolParameters &asked) {
+    const MallocText uuid(SpaceGetUUID(asked.mountPath));
+    if (uuid) {
+        puts(uuid.get());
+    }
+    return success;
+}
+
+int RunDeleteBitmap(const ToolParameters &asked) {
+    return DeleteBitmap(asked.mountPath) < 0
+               ? Fail("Delete bitmap on volume (%s) failed", asked.mountPath)
+               : Succeed("Delete bitmap on volume (%s) OK", asked.mountPath);
+}
+
+int RunCheckPin(const ToolParameters &asked) {
+    switch (CheckFileIsPin(asked.configPath, asked.checkPinFilePath)) {
+    case PinCheck::Pinned: return PrintAnswer(true);
+    case PinCheck::NotPinned: return PrintAnswer(false);
+    case PinCheck::Error: puts("Error"); break;
+    }
+    return success;
+}
+
+int RunReloadPinBlocks(const ToolParameters &asked) {
+    LogWrite(LogClass::Notice, AtMain(), "Start to send reload block request");
+    return ReloadPinBlocksRequest(&asked) < 0
+               ? Fail("Reload blocks on volume (%s) failed", asked.mountPath)
+               : Succeed("Send reload block request OK");
+}
+
+int RunUnpinAll(const ToolParameters &asked) {
+    return UnpinAllBlocks(&asked) == 0 ? success : failure;
+}
+
+int RunIsAllUnpin(const ToolParameters &asked) {
+    int allUnpinned = 0;
+    if (isAllBlocksUnpin(asked.cachePath, &allUnpinned) < 0) {
+        puts("Get unpin information failed. (This cache doesn't support pin ?)");
+        return failure;
+    }
+    return PrintAnswer(allUnpinned != 0);
+}
+
+// `what` is the message's beginning, up to the mount path.
+int ReportRange(int result, const char *what, const ToolParameters &asked) {
+    LogWrite(result < 0 ? LogClass::Error : LogClass::Notice, AtMain(),
+             "%s%s) %s (Start sector = %llu Num of sector = %llu)", what, asked.mountPath,
+             result < 0 ? "failed" : "OK", LogU64(asked.startSector), LogU64(asked.numSectors));
+    return result < 0 ? failure : success;
+}
+
+int RunSetBitmap(const ToolParameters &asked) {
+    return ReportRange(SetBitmap(asked.mountPath, asked.startSector, asked.numSectors),
+                       "Set bitmap on volume (", asked);
+}
+
+int RunUnsetBitmap(const ToolParameters &asked) {
+    return ReportRange(UnsetBitmap(asked.mountPath, asked.startSector, asked.numSectors),
+                       "Unset bitmap on volume (", asked);
+}
+
+int RunUnpinRange(const ToolParameters &asked) {
+    return ReportRange(UnpinRange(asked.mountPath, asked.startSector, asked.numSectors),
+                       "Unpin range in cache (volume = ", asked);
+}
+
+int RunGetBitmapSize(const ToolParameters &asked) {
+    uint64_t size = 0;
+    if (GetBitmapSizeByte(asked.mountPath, &size) < 0) {
+        return Fail("Get bitmap size for volume (%s) failed", asked.mountPath);
+    }
+    printf("%llu\n", LogU64(size));
+    return success;
+}
+
+const struct {
+    ToolCommand command;
+    int (*run)(const ToolParameters &asked); // gives the exit value
+} handlers[] = {
+    {commandInvalid, NoCommand},
+    {commandPinFiles, RunPinFiles},
+    {commandUnpinFiles, RunUnpinFiles},
+    {commandSendBitmap, RunSendBitmap},
+    {commandStartService, RunStartService},
+    {commandHandleMount, RunHandleMount},
+    {commandHandleUmount, RunHandleUmount},
+    {commandSupportPin, RunSupportPin},
+    {commandCheckBitmap, RunCheckBitmap},
+    {commandAddPendingSpace, RunAddPending},
+    {commandRemovePendingSpace, RunRemovePending},
+    {commandGetUUID, RunGetUuid},
+    {commandDeleteBitmap, RunDeleteBitmap},
+    {commandCheckPin, RunCheckPin},
+    {commandReloadPinBlocks, RunReloadPinBlocks},
+    {commandUnpinAllBlocks, RunUnpinAll},
+    {commandIsAllUnpin, RunIsAllUnpin},
+    {commandSetBitmap, RunSetBitmap},
+    {commandUnsetBitmap, RunUnsetBitmap},
+    {commandUnpinRange, RunUnpinRange},
+    {commandGetBitmapSizeByte, RunGetBitmapSize},
+};
+
 // Static: the service's worker reads it after the first thread may have ended.
 ToolParameters parameters;
 
@@ -41,7 +222,7 @@ int main(int argc, char *argv[]) try {
     LogVerbose("Process name = %s", ProgramName);
     if (GetOptions(argc, argv, &parameters) < 0) {
         Usage();
-        return -1;
+        return failure;
     }
     if (parameters.debug != 0) {
         LogLevel = 3;
@@ -49,216 +230,16 @@ int main(int argc, char *argv[]) try {
         LogLevel = 2;
     }
     LogTraceEntry();
-
-    const char *mountPath = parameters.mountPath;
-    const unsigned long long startSector = parameters.startSector;
-    const unsigned long long numSectors = parameters.numSectors;
-    int exitValue = -1;
-
-    switch (parameters.command) {
-    case commandInvalid:
-        LogError("Invalid input");
-        Usage();
-        exitValue = 0;
-        break;
-
-    case commandPinFiles:
-        LogNotice("Send pin file request, files = %s", parameters.files);
-        if (PinFilesRequest(&parameters) < 0) {
-            LogError("Pin files failed");
-            break;
+    int exitValue = success;
+    for (const auto &handler : handlers) {
+        if (handler.command == parameters.command) {
+            exitValue = handler.run(parameters);
         }
-        LogNotice("Send pin file request OK");
-        exitValue = 0;
-        break;
-
-    case commandUnpinFiles:
-        LogNotice("Send unpin file request, files = %s", parameters.files);
-        if (UnpinFilesRequest(&parameters) < 0) {
-            LogError("Unpin files failed");
-            break;
-        }
-        LogNotice("Send unpin files request OK");
-        exitValue = 0;
-        break;
-
-    case commandSendBitmap:
-        LogNotice("Start to send bitmap for volume (%s)", mountPath);
-        if (SendBitmap(mountPath) < 0) {
-            LogError("Send bitmap to space (%s) failed", mountPath);
-            break;
-        }
-        LogNotice("Send bitmap OK");
-        exitValue = 0;
-        break;
-
-    case commandStartService:
-        LogNotice("Service starts (Build time: %s)", buildStamp);
-        if (StartService(&parameters) < 0) {
-            LogError("Can't start service");
-            break;
-        }
-        exitValue = 0;
-        break;
-
-    case commandHandleMount:
-        if (HandleSpaceMount(parameters.configPath, mountPath) < 0) {
-            LogError("Handle space (%s) mount failed", mountPath);
-            break;
-        }
-        LogVerbose("Handle space (%s) mount OK", mountPath);
-        exitValue = 0;
-        break;
-
-    case commandHandleUmount:
-        if (HandleSpaceUmount(mountPath) < 0) {
-            LogError("Handle space (%s) umount failed", mountPath);
-            break;
-        }
-        LogVerbose("Handle space (%s) umount OK", mountPath);
-        exitValue = 0;
-        break;
-
-    case commandSupportPin:
-        puts(SpaceHasCacheAndSupportPin(mountPath) ? "Yes" : "No");
-        exitValue = 0;
-        break;
-
-    case commandCheckBitmap:
-        puts(CheckBitmapSet(mountPath) ? "Yes" : "No");
-        exitValue = 0;
-        break;
-
-    case commandAddPendingSpace:
-        if (AddPendingSpaceRequest(mountPath) < 0) {
-            LogError("Can't sent pending space");
-            break;
-        }
-        LogNotice("Set pending space OK");
-        exitValue = 0;
-        break;
-
-    case commandRemovePendingSpace:
-        if (RemovePendingSpaceRequest(mountPath) < 0) {
-            LogError("Can't sent pending space");
-            break;
-        }
-        LogNotice("Set pending space OK");
-        exitValue = 0;
-        break;
-
-    case commandGetUUID: {
-        const MallocText uuid(SpaceGetUUID(mountPath));
-        if (uuid) {
-            puts(uuid.get());
-        }
-        exitValue = 0;
-        break;
     }
-
-    case commandDeleteBitmap:
-        if (DeleteBitmap(mountPath) < 0) {
-            LogError("Delete bitmap on volume (%s) failed", mountPath);
-            break;
-        }
-        LogNotice("Delete bitmap on volume (%s) OK", mountPath);
-        exitValue = 0;
-        break;
-
-    case commandCheckPin: {
-        const int result = CheckFileIsPin(parameters.configPath, parameters.checkPinFilePath);
-        if (result == checkPinPinned) {
-            puts("Yes");
-        } else if (result == checkPinNotPinned) {
-            puts("No");
-        } else if (result == checkPinError) {
-            puts("Error");
-        }
-        exitValue = 0;
-        break;
-    }
-
-    case commandReloadPinBlocks:
-        LogNotice("Start to send reload block request");
-        if (ReloadPinBlocksRequest(&parameters) < 0) {
-            LogError("Reload blocks on volume (%s) failed", mountPath);
-            break;
-        }
-        LogNotice("Send reload block request OK");
-        exitValue = 0;
-        break;
-
-    case commandUnpinAllBlocks:
-        if (UnpinAllBlocks(&parameters) == 0) {
-            exitValue = 0;
-        }
-        break;
-
-    case commandIsAllUnpin: {
-        int allUnpinned = 0;
-        if (isAllBlocksUnpin(parameters.cachePath, &allUnpinned) < 0) {
-            puts("Get unpin information failed. (This cache doesn't support pin ?)");
-            break;
-        }
-        puts(allUnpinned != 0 ? "Yes" : "No");
-        exitValue = 0;
-        break;
-    }
-
-    case commandSetBitmap:
-        if (SetBitmap(mountPath, startSector, numSectors) < 0) {
-            LogError("Set bitmap on volume (%s) failed (Start sector = %llu Num of sector = %llu)",
-                     mountPath, startSector, numSectors);
-            break;
-        }
-        LogNotice("Set bitmap on volume (%s) OK (Start sector = %llu Num of sector = %llu)",
-                  mountPath, startSector, numSectors);
-        exitValue = 0;
-        break;
-
-    case commandUnsetBitmap:
-        if (UnsetBitmap(mountPath, startSector, numSectors) < 0) {
-            LogError(
-                "Unset bitmap on volume (%s) failed (Start sector = %llu Num of sector = %llu)",
-                mountPath, startSector, numSectors);
-            break;
-        }
-        LogNotice("Unset bitmap on volume (%s) OK (Start sector = %llu Num of sector = %llu)",
-                  mountPath, startSector, numSectors);
-        exitValue = 0;
-        break;
-
-    case commandUnpinRange:
-        if (UnpinRange(mountPath, startSector, numSectors) < 0) {
-            LogError(
-                "Unpin range in cache (volume = %s) failed (Start sector = %llu Num of sector = %llu)",
-                mountPath, startSector, numSectors);
-            break;
-        }
-        LogNotice(
-            "Unpin range in cache (volume = %s) OK (Start sector = %llu Num of sector = %llu)",
-            mountPath, startSector, numSectors);
-        exitValue = 0;
-        break;
-
-    case commandGetBitmapSizeByte: {
-        uint64_t size = 0;
-        if (GetBitmapSizeByte(mountPath, &size) < 0) {
-            LogError("Get bitmap size for volume (%s) failed", mountPath);
-            break;
-        }
-        printf("%llu\n", LogU64(size));
-        exitValue = 0;
-        break;
-    }
-    }
-
     LogTraceExit();
     return exitValue;
 } catch (const std::bad_alloc &) {
-    LogError("Out of memory");
-    return -1;
+    return Fail("Out of memory");
 } catch (const Json::Exception &) { // which the JSON library throws for want of memory, too
-    LogError("Out of memory");
-    return -1;
+    return Fail("Out of memory");
 }

@@ -3,11 +3,13 @@
 #ifndef COMMANDS_CHECK_FILE_PIN_H
 #define COMMANDS_CHECK_FILE_PIN_H
 
-const int checkPinPinned = 0;
-const int checkPinNotPinned = 1;
-const int checkPinError = 2; // after an error message
+enum class PinCheck : int {
+    Pinned = 0,
+    NotPinned = 1,
+    Error = 2, // after an error message
+};
 
 // Whether the file's inode number is recorded for the volume of its top directory.
-int CheckFileIsPin(const char *configPath, const char *filePath);
+PinCheck CheckFileIsPin(const char *configPath, const char *filePath);
 
 #endif

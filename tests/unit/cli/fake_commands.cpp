@@ -68,8 +68,8 @@ int CheckBitmapSet(const char *mountPath) {
 int SendBitmap(const char *mountPath) {
     return Answer("SendBitmap", mountPath);
 }
-int CheckFileIsPin(const char *configPath, const char *filePath) {
-    return Answer("CheckFileIsPin", configPath, filePath);
+PinCheck CheckFileIsPin(const char *configPath, const char *filePath) {
+    return static_cast<PinCheck>(Answer("CheckFileIsPin", configPath, filePath));
 }
 int UnpinAllBlocks(const ToolParameters *parameters) {
     return Answer("UnpinAllBlocks", parameters->mountPath);

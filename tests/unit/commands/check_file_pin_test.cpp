@@ -20,7 +20,7 @@ protected:
     void StoreFiles(const std::string &files) const {
         WriteWhole(config_, R"({"volumes" : {")" + topDir_ + R"(" : {"files" : )" + files + "}}}");
     }
-    int Check() const { return CheckFileIsPin(config_.c_str(), file_.c_str()); }
+    PinCheck Check() const { return CheckFileIsPin(config_.c_str(), file_.c_str()); }
     const std::string config_ = folder_.Path("conf.json");
     const std::string file_ = folder_.Path("file");
     const std::string topDir_ = file_.substr(0, file_.find('/', 1));
@@ -29,14 +29,14 @@ protected:
 TEST_F(CheckFilePinTest, ARecordedInodeIsPinned) {
     StoreFiles("{\"" + Inode() + "\" : \"any/path\"}");
     CapturedLog log;
-    EXPECT_EQ(Check(), 0);
+    EXPECT_EQ(Check(), PinCheck::Pinned);
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
 TEST_F(CheckFilePinTest, TheTopDirectoryIsLoggedAtLevel2) {
     StoreFiles("{}");
     CapturedLog log(2);
-    EXPECT_EQ(Check(), 1);
+    EXPECT_EQ(Check(), PinCheck::NotPinned);
     EXPECT_EQ(MessagesOf(log, "CheckFileIsPin"),
               Messages{"CheckFileIsPin() [N]: Mount path = " + topDir_});
 }
@@ -47,7 +47,7 @@ TEST_F(CheckFilePinTest, OtherInodesAreNotPinned) {
          {std::string("{}"), std::string("null"), "{\"" + Inode() + "0\" : \"file\"}",
           "{\"0" + Inode() + "\" : \"file\"}"}) {
         StoreFiles(files);
-        EXPECT_EQ(Check(), 1) << files;
+        EXPECT_EQ(Check(), PinCheck::NotPinned) << files;
     }
     EXPECT_EQ(log.Messages(), Messages{});
 }
@@ -56,7 +56,7 @@ TEST_F(CheckFilePinTest, AReplacedFileIsNotPinned) {
     StoreFiles("{\"" + Inode() + "\" : \"file\"}");
     WriteWhole(folder_.Path("new"), "y"); // while the old inode is still in use
     std::filesystem::rename(folder_.Path("new"), file_);
-    EXPECT_EQ(Check(), 1);
+    EXPECT_EQ(Check(), PinCheck::NotPinned);
 }
 
 TEST_F(CheckFilePinTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
@@ -67,21 +67,21 @@ TEST_F(CheckFilePinTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
           std::string(R"({"volumes" : {"/other" : {"files" : {}}}})"),
           R"({"volumes" : {")" + topDir_ + R"(" : null}})"}) {
         WriteWhole(config_, text);
-        EXPECT_EQ(Check(), 1) << text;
+        EXPECT_EQ(Check(), PinCheck::NotPinned) << text;
     }
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
 TEST_F(CheckFilePinTest, WithoutAConfigurationItIsAnError) {
     CapturedLog log;
-    EXPECT_EQ(CheckFileIsPin(config_.c_str(), "no top directory"), 2);
+    EXPECT_EQ(CheckFileIsPin(config_.c_str(), "no top directory"), PinCheck::Error);
     EXPECT_EQ(log.Messages(), Messages{"Can't find config file (" + config_ + ")"});
 }
 
 TEST_F(CheckFilePinTest, APathWithoutATopDirectoryIsAnError) {
     WriteWhole(config_, "damaged"); // not looked at yet
     CapturedLog log;
-    EXPECT_EQ(CheckFileIsPin(config_.c_str(), "volume1/a"), 2);
+    EXPECT_EQ(CheckFileIsPin(config_.c_str(), "volume1/a"), PinCheck::Error);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Get top directory of file (volume1/a) error",
                                   "",
@@ -94,13 +94,13 @@ TEST_F(CheckFilePinTest, AConfigurationThatCannotBeUsedIsAnError) {
                              R"({"volumes" : {"/x" : {"files" : []}}})"}) {
         WriteWhole(config_, text);
         CapturedLog log;
-        EXPECT_EQ(Check(), 2) << text;
+        EXPECT_EQ(Check(), PinCheck::Error) << text;
         EXPECT_EQ(log.Messages(), Messages{"Can't read data from config file (" + config_ + ")"});
         EXPECT_EQ(ReadWhole(config_), text);
     }
     WriteWhole(config_, "");
     CapturedLog log;
-    EXPECT_EQ(Check(), 2);
+    EXPECT_EQ(Check(), PinCheck::Error);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Prase file " + config_ + " error",
                                   "Can't read data from config file (" + config_ + ")",
@@ -111,7 +111,7 @@ TEST_F(CheckFilePinTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
     StoreFiles("{\"1\" : \"file\"}");
     std::filesystem::remove(file_);
     CapturedLog log(2);
-    EXPECT_EQ(Check(), 2);
+    EXPECT_EQ(Check(), PinCheck::Error);
     EXPECT_EQ(LastOf(MessagesOf(log, "CheckFileIsPin")),
               "CheckFileIsPin() [N] : ***** Can't get inode number of file (" + file_ + ")");
     EXPECT_TRUE(log.Has("FileGetInodeNumber() [N] : ***** Stat file " + file_ + " error"));
