@@ -41,68 +41,81 @@ template <typename Operation> int DoPatiently(Operation operation) {
     }
 }
 
+// Waits for the next message. False after an error message.
+bool ReceiveMessage(RequestMessage *message, const LogPlace &place) {
+    ssize_t received = -1;
+    do {
+        ReceiverTakesNext();
+        received = msgrcv(ServerMsgQueueId, message, requestMessageBytes, requestMessageType, 0);
+    } while (received < 0 && errno == EINTR && ReceiverIsCalledToRest());
+    if (received < 0) {
+        LogWrite(LogClass::Error, place, "Receive messaged failed: %s", strerror(errno));
+        return false;
+    }
+    CompleteRecord(&message->record, static_cast<size_t>(received));
+    LogVerboseAt(place, "Get a new message. Request type = %s",
+                 RequestTypeForLog(message->record.type));
+    return true;
+}
+
+bool AddPendingSpace(char *mountPath, const LogPlace &place) {
+    if (ServiceIsPendingSpace(mountPath)) {
+        LogVerboseAt(place, "Space (%s) is already in pending list", mountPath);
+    } else if (DoPatiently([&] { return ServiceAddPendingSpaceAtomic(mountPath); }) < 0) {
+        LogWrite(LogClass::Error, place, "Add spend space error");
+        return false;
+    }
+    return true;
+}
+
+bool RemovePendingSpace(char *mountPath, const LogPlace &place) {
+    if (!ServiceIsPendingSpace(mountPath)) {
+        LogWrite(LogClass::Notice, place, "Space (%s) is not in pending list. Could be a new space",
+                 mountPath);
+    } else if (DoPatiently([&] { return ServiceRemovePendingSpaceAtomic(mountPath); }) < 0) {
+        LogWrite(LogClass::Error, place, "Remove pending space error");
+        return false;
+    }
+    return true;
+}
+
+bool StoreRequest(const char *configPath, const RequestMessage *message, const LogPlace &place) {
+    if (CheckNormalMsg(message) < 0) {
+        LogWrite(LogClass::Error, place, "Get wrong message format");
+        return false;
+    }
+    if (DoPatiently([&] { return ConfigAddRequest(configPath, &message->record); }) < 0) {
+        LogWrite(LogClass::Error, place, "Can't add request to config (%s)", configPath);
+        return false;
+    }
+    LogVerboseAt(place, "Signal a new request is added");
+    ServiceSignalRequest();
+    return true;
+}
+
+// Does what the message asks for. False after an error message.
+bool DoMessage(const char *configPath, RequestMessage *message, const LogPlace &place) {
+    switch (message->record.type) {
+    case requestAddPendingSpace: return AddPendingSpace(message->record.mountPath, place);
+    case requestRemovePendigSpace: return RemovePendingSpace(message->record.mountPath, place);
+    default: return StoreRequest(configPath, message, place);
+    }
+}
+
 } // namespace
 
 void GetRequests(const char *configPath) {
     {
         LogTraceScope();
-        RequestMessage message{}; // overwritten by each message
-        RequestRecord &record = message.record;
-        bool receiving = true;
         ServerMsgQueueId = MsgQueueGet(messageKeyFile);
         if (ServerMsgQueueId == -1) {
             LogError("Create server messsage queue by file (%s) failed", messageKeyFile);
-            receiving = false;
         } else {
             LogVerbose("Get server messsage queue id = %d", ServerMsgQueueId);
-        }
-        while (receiving) {
-            ReceiverTakesNext();
-            const ssize_t received =
-                msgrcv(ServerMsgQueueId, &message, requestMessageBytes, requestMessageType, 0);
-            if (received < 0 && errno == EINTR && ReceiverIsCalledToRest()) {
-                continue;
+            RequestMessage message{}; // overwritten by each message
+            while (ReceiveMessage(&message, LogHere()) &&
+                   DoMessage(configPath, &message, LogHere())) {
             }
-            if (received < 0) {
-                LogError("Receive messaged failed: %s", strerror(errno));
-                break;
-            }
-            CompleteRecord(&record, static_cast<size_t>(received));
-            LogVerbose("Get a new message. Request type = %s", RequestTypeForLog(record.type));
-
-            if (record.type == requestAddPendingSpace) {
-                if (ServiceIsPendingSpace(record.mountPath)) {
-                    LogVerbose("Space (%s) is already in pending list", record.mountPath);
-                } else if (DoPatiently([&] {
-                               return ServiceAddPendingSpaceAtomic(record.mountPath);
-                           }) < 0) {
-                    LogError("Add spend space error");
-                    break;
-                }
-                continue;
-            }
-            if (record.type == requestRemovePendigSpace) {
-                if (!ServiceIsPendingSpace(record.mountPath)) {
-                    LogNotice("Space (%s) is not in pending list. Could be a new space",
-                              record.mountPath);
-                } else if (DoPatiently([&] {
-                               return ServiceRemovePendingSpaceAtomic(record.mountPath);
-                           }) < 0) {
-                    LogError("Remove pending space error");
-                    break;
-                }
-                continue;
-            }
-            if (CheckNormalMsg(&message) < 0) {
-                LogError("Get wrong message format");
-                break;
-            }
-            if (DoPatiently([&] { return ConfigAddRequest(configPath, &record); }) < 0) {
-                LogError("Can't add request to config (%s)", configPath);
-                break;
-            }
-            LogVerbose("Signal a new request is added");
-            ServiceSignalRequest();
         }
     }
     ReceiverHasEnded();
