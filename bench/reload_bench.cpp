@@ -60,7 +60,7 @@ template <Bytes (*make)(size_t)> void Walk(benchmark::State &state) {
     MakeDevice(bytes.size());
     const PinBitmap bitmap{bytes.data(), static_cast<uint32_t>(bytes.size())};
     for (auto _ : state) {
-        if (ReloadPinBlocksToCache(&bitmap, device, "/volume1") != warmDone) {
+        if (ReloadPinBlocksToCache(&bitmap, device, "/volume1") != WorkResult::Done) {
             abort();
         }
     }

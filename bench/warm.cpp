@@ -28,8 +28,8 @@ int main(int argc, char *argv[]) {
         files.push_back({argv[i], table});
     }
     const auto start = std::chrono::steady_clock::now();
-    const int result = ReadFilesToCache(argv[1], files);
+    const WorkResult result = ReadFilesToCache(argv[1], files);
     const std::chrono::duration<double> time = std::chrono::steady_clock::now() - start;
     printf("%.6f\n", time.count());
-    return result == warmDone ? 0 : 1;
+    return result == WorkResult::Done ? 0 : 1;
 }

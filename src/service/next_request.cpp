@@ -21,8 +21,8 @@ template <size_t size> void CopyText(char (&field)[size], const std::string &tex
 
 } // namespace
 
-int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
-                                          std::string *num) {
+NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
+                                                  std::string *num) {
     const ServiceLockGuard lock;
     Json::Value root;
     for (;;) {
@@ -31,7 +31,7 @@ int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord 
             LogVerbose("Config doesn't exist");
         } else if (ConfigGetJsonAndNumRequest(configPath, &root, &count) < 0) {
             LogError("Get request from config file (%s) error", configPath);
-            return nextRequestError;
+            return NextRequest::Error;
         }
         if (count > 0) {
             break;
@@ -48,7 +48,7 @@ int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord 
         const std::string number = element.asString();
         if (!requests.isMember(number) || requests[number].isNull()) {
             LogError("Can't find request number (%s) in config", number.c_str());
-            return nextRequestError;
+            return NextRequest::Error;
         }
         const Json::Value &request = requests[number];
         char mountPath[1024];
@@ -61,7 +61,7 @@ int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord 
             if (ServiceIsPendingSpace(out->mountPath)) {
                 if (ServiceRemovePendingSpaceLocked(out->mountPath) < 0) {
                     LogError("Can't remove space from pending list");
-                    return nextRequestError;
+                    return NextRequest::Error;
                 }
                 LogVerbose("Remove space (%s) from pending list", mountPath);
             }
@@ -79,7 +79,7 @@ int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord 
         out->type = StringToRequestType(request["type"].asString());
         if (out->type == requestUnknown) {
             LogError("Can't get correct request type");
-            return nextRequestError;
+            return NextRequest::Error;
         }
         CopyText(out->mountPath, mountPath);
         CopyText(out->data, request["data"].asString());
@@ -94,15 +94,15 @@ int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord 
         for (const std::string &number : dropped) {
             if (JsonRemoveRequest(root, number) < 0) {
                 LogError("Can't remove request (%s)", number.c_str());
-                return nextRequestError;
+                return NextRequest::Error;
             }
             LogVerbose("Remove request (%s)", number.c_str());
         }
         if (WriteJsonToFile(root, configPath) < 0) {
             LogError("Can't write to files");
-            return nextRequestError;
+            return NextRequest::Error;
         }
         LogNotice("Drop requests finish");
     }
-    return found ? nextRequestTaken : nextRequestNone;
+    return found ? NextRequest::Taken : NextRequest::None;
 }

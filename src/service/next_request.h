@@ -13,13 +13,15 @@
 
 #include <string>
 
-const int nextRequestNone = 0;  // requests are queued, none may run now
-const int nextRequestTaken = 2; // a request was taken; it stays in the file until it is done
-const int nextRequestError = 3; // after an error message; the file is as it was
+enum class NextRequest : int {
+    None = 0,  // requests are queued, none may run now
+    Taken = 2, // a request was taken; it stays in the file until it is done
+    Error = 3, // after an error message; the file is as it was
+};
 
 // Fills `*out` and `*num` when a request was taken. `*out` must be zeroed. Blocks, without a time
 // limit, while the file is missing or the queue is empty.
-int ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
-                                          std::string *num) NEEDS_NO_LOCK(serviceLock);
+NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
+                                                  std::string *num) NEEDS_NO_LOCK(serviceLock);
 
 #endif

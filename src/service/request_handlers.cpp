@@ -36,8 +36,8 @@ int LoadBitmap(const char *uuid, BitmapHolder *bitmap, bool *sizeChanged) {
 
 } // namespace
 
-int HandleRequest(const RequestRecord *record) {
-    int result = handleFailed;
+WorkResult HandleRequest(const RequestRecord *record) {
+    WorkResult result = WorkResult::Failed;
     BitmapHolder bitmap;
     bool sizeChanged = false;
     MallocText uuid;
@@ -67,12 +67,10 @@ int HandleRequest(const RequestRecord *record) {
                                     bitmapPath.get());
     }
 
-    if (result == handleFailed) {
+    if (result == WorkResult::Failed) {
         LogError("Handle request failed");
-    } else if (result == handleInterrupted) {
+    } else if (result == WorkResult::Interrupted) {
         LogVerbose("Get Interruped");
-    } else {
-        result = handleDone;
     }
     // Also where there is none: its message then tells that the request ended before the bitmap was
     // loaded.
@@ -80,57 +78,58 @@ int HandleRequest(const RequestRecord *record) {
     return result;
 }
 
-int HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap, const char *mountPath,
-                     const char *cachePath, const char *bitmapPath) {
+WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
+                            const char *mountPath, const char *cachePath, const char *bitmapPath) {
     std::vector<FileToWarm> filesToWarm;
     for (const FileInfo &file : files) {
         if (file.szRelativePath[0] == '\0') {
             LogError("Info's relative path should not be NULL");
-            return handleFailed;
+            return WorkResult::Failed;
         }
         const std::string path = FullPath(mountPath, file);
         FileMappingTable table;
         if (BitmapAddFile(bitmap, mountPath, path, static_cast<uint32_t>(file.inodeNum), &table) <
             0) {
             LogError("Can't add file (%s) inode (%lu) to bitmap", path.c_str(), file.inodeNum);
-            return handleFailed;
+            return WorkResult::Failed;
         }
         filesToWarm.push_back({path, table});
     }
     if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
         LogError("Write bitmap failed");
-        return handleFailed;
+        return WorkResult::Failed;
     }
     if (BitmapSendToDriver(bitmap, cachePath) < 0) {
         LogError("Can't send bitmap to driver");
-        return handleFailed;
+        return WorkResult::Failed;
     }
     return ReadFilesToCache(mountPath, filesToWarm);
 }
 
-int HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap, const char *mountPath,
-                       const char *cachePath, const char *bitmapPath) {
+WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
+                              const char *mountPath, const char *cachePath,
+                              const char *bitmapPath) {
     std::vector<UnpinInfo> infos;
     for (const FileInfo &file : files) {
         if (UnsetBitmapAndAppendUnpinInfos(cachePath, bitmap, mountPath, FullPath(mountPath, file),
                                            static_cast<uint32_t>(file.inodeNum), &infos) < 0) {
             LogError("Unset bitmap and append unpin infos failed");
-            return handleFailed;
+            return WorkResult::Failed;
         }
     }
     if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
         LogError("Write bitmap failed");
-        return handleFailed;
+        return WorkResult::Failed;
     }
     // The bitmap goes first: were the ranges released before it, a read in between could pin them
     // again by the old one.
     if (BitmapSendToDriver(bitmap, cachePath) < 0) {
         LogError("Can't send bitmap to driver");
-        return handleFailed;
+        return WorkResult::Failed;
     }
     if (SendUnpinInfoToDriver(cachePath, infos) < 0) {
         LogError("Can't send unpin information to driver");
-        return handleFailed;
+        return WorkResult::Failed;
     }
-    return handleDone;
+    return WorkResult::Done;
 }

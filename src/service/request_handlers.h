@@ -12,22 +12,19 @@
 #include "bitmap/pin_bitmap.h"
 #include "request/file_inode_list.h"
 #include "request/request_record.h"
+#include "warming/work_result.h"
 
 #include <vector>
 
-const int handleDone = 0;
-const int handleFailed = 1;      // after an error message
-const int handleInterrupted = 2; // the volume became pending while its data was read
-
 // The record's texts are NUL-terminated.
-int HandleRequest(const RequestRecord *record);
+WorkResult HandleRequest(const RequestRecord *record);
 
 // Marks the files, writes and sends the bitmap, reads the files through the cache.
-int HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap, const char *mountPath,
-                     const char *cachePath, const char *bitmapPath);
+WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
+                            const char *mountPath, const char *cachePath, const char *bitmapPath);
 
 // Clears the files, writes and sends the bitmap, then releases the files' ranges.
-int HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap, const char *mountPath,
-                       const char *cachePath, const char *bitmapPath);
+WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
+                              const char *mountPath, const char *cachePath, const char *bitmapPath);
 
 #endif

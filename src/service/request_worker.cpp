@@ -13,37 +13,47 @@
 #include <pthread.h>
 #include <unistd.h>
 
+namespace {
+
+// Chooses one request and has it carried out. False when none can be chosen.
+bool DoNextRequest(const char *configPath, const LogPlace &place) {
+    RequestRecord record{};
+    std::string num;
+    const NextRequest next = ConfigParseAndGetNextAvailableRequest(configPath, &record, &num);
+    if (next == NextRequest::Error) {
+        return false;
+    }
+    if (next == NextRequest::Taken) {
+        const WorkResult result = HandleRequestAndModifyConfig(configPath, &record, num);
+        if (result == WorkResult::Failed) {
+            return true;
+        }
+        const char *typeName = RequestTypeToString(record.type);
+        if (result == WorkResult::Interrupted) {
+            LogWrite(LogClass::Notice, place, "Handle request (%s). Get interrupted !",
+                     num.c_str());
+        } else if (record.type == requestPinFiles || record.type == requestUnpinFiles) {
+            LogWrite(LogClass::Notice, place, "Handle request (type=%s files=%s) OK ", typeName,
+                     record.data);
+        } else {
+            LogWrite(LogClass::Notice, place, "Handle request (type=%s) OK ", typeName);
+        }
+    }
+    // Also what makes a held-back request run: the end of a pending state signals nothing.
+    sleep(1);
+    return true;
+}
+
+} // namespace
+
 void *DoRequests(void *options) {
     {
         LogTraceScope();
         const char *configPath = static_cast<const ToolParameters *>(options)->configPath;
-        for (;;) {
+        bool choosing = true;
+        while (choosing) {
             try {
-                RequestRecord record{};
-                std::string num;
-                const int taken = ConfigParseAndGetNextAvailableRequest(configPath, &record, &num);
-                if (taken == nextRequestError) {
-                    break;
-                }
-                if (taken != nextRequestTaken) {
-                    sleep(1);
-                    continue;
-                }
-                const int handled = HandleRequestAndModifyConfig(configPath, &record, num);
-                if (handled == handleFailed) {
-                    continue;
-                }
-                if (handled == handleInterrupted) {
-                    LogNotice("Handle request (%s). Get interrupted !", num.c_str());
-                } else if (record.type == requestPinFiles || record.type == requestUnpinFiles) {
-                    LogNotice("Handle request (type=%s files=%s) OK ",
-                              RequestTypeToString(record.type), record.data);
-                } else {
-                    LogNotice("Handle request (type=%s) OK ", RequestTypeToString(record.type));
-                }
-                // Also what makes a held-back request run: the end of a pending state signals
-                // nothing.
-                sleep(1);
+                choosing = DoNextRequest(configPath, LogHere());
             } catch (const std::exception &error) {
                 // Memory is short. Whatever was going on, the request is still queued.
                 LogError("Request is put off: %s", error.what());
@@ -56,26 +66,26 @@ void *DoRequests(void *options) {
     pthread_exit(nullptr);
 }
 
-int HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
-                                 const std::string &num) {
+WorkResult HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
+                                        const std::string &num) {
     const char *typeName = RequestTypeForLog(record->type);
     LogVerbose("Handle request (num = %s)", num.c_str());
-    switch (HandleRequest(record)) {
-    case handleDone:
+    const WorkResult result = HandleRequest(record);
+    switch (result) {
+    case WorkResult::Done:
         if (ConfigUpdatedByFinishedRequest(configPath, record, num) < 0) {
             LogError("Can't remove request (%s) from config file", num.c_str());
         }
-        return handleDone;
-    case handleFailed:
+        break;
+    case WorkResult::Failed:
         LogError("Handle request error (num = %s, type = %s), drop it.", num.c_str(), typeName);
         if (ConfigDropErrorRequest(configPath, record, num) < 0) {
             LogError("Can't drop request");
         }
-        return handleFailed;
-    case handleInterrupted:
+        break;
+    case WorkResult::Interrupted:
         LogVerbose("Handle request interruped (num = %s, type = %s)", num.c_str(), typeName);
-        return handleInterrupted;
-    default: // none of the above: the request stays and is taken again
-        return handleDone;
+        break;
     }
+    return result;
 }

@@ -7,6 +7,7 @@
 #define SERVICE_REQUEST_WORKER_H
 
 #include "request/request_record.h"
+#include "warming/work_result.h"
 
 #include <string>
 
@@ -14,9 +15,9 @@
 // path is used. Ends the thread when the next request cannot be chosen.
 void *DoRequests(void *options);
 
-// Carries out a taken request: 0 done and recorded (or left in the file when recording failed), 1
-// failed and dropped, 2 interrupted and left in the queue.
-int HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
-                                 const std::string &num);
+// Carries out a taken request: Done and recorded (or left in the file when recording failed),
+// Failed and dropped, Interrupted and left in the queue.
+WorkResult HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
+                                        const std::string &num);
 
 #endif

@@ -8,27 +8,27 @@
 #include <fcntl.h>
 #include <unistd.h>
 
-int FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector) {
+WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector) {
     const uint64_t bytesToRead = (lastSector + 1) << sectorByteShift;
     LogVerbose("Read file (%s) to cache. last read sector = %llu bytes to read = %llu", filePath,
                LogU64(lastSector), LogU64(bytesToRead));
     const WarmBuffer buffer = WarmBufferAllocate();
     if (!buffer) {
         LogError("Can't allocate memory\n");
-        return warmFailed;
+        return WorkResult::Failed;
     }
     LogVerbose("Read file (%s) start, Time=%s", filePath, GetTimeString());
     const ScopedFd file(open(filePath, O_RDONLY | O_DIRECT | O_CLOEXEC));
     if (!file.IsOpen()) {
         LogNotice("File (%s) doesn't exist (might due to be renamed), skip it", filePath);
-        return warmDone;
+        return WorkResult::Done;
     }
     uint64_t total = 0;
     for (;;) {
         const ssize_t result = read(file.Get(), buffer.get(), warmBufferBytes);
         if (result < 0) {
             LogError("Read error");
-            return warmFailed;
+            return WorkResult::Failed;
         }
         if (result == 0) {
             break;
@@ -40,10 +40,10 @@ int FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSe
             break;
         }
         if (ServiceIsPendingSpace(mountPath)) {
-            return warmInterrupted;
+            return WorkResult::Interrupted;
         }
     }
     LogVerbose("Read file (%s) finish, Time=%s Num read=%llu", filePath, GetTimeString(),
                LogU64(total));
-    return warmDone;
+    return WorkResult::Done;
 }

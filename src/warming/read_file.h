@@ -4,10 +4,12 @@
 #ifndef WARMING_READ_FILE_H
 #define WARMING_READ_FILE_H
 
+#include "warming/work_result.h"
+
 #include <cstdint>
 
 // Reads the file up to and including `lastSector` (512-byte sectors) or its end. A file that cannot
-// be opened is taken to have gone: warmDone. warmFailed after an error message, or warmInterrupted.
-int FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector);
+// be opened is taken to have gone: Done. Failed after an error message, or Interrupted.
+WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector);
 
 #endif

@@ -13,11 +13,6 @@
 #include <cstdint>
 #include <memory>
 
-// Results of the warming operations.
-const int warmDone = 0;
-const int warmFailed = 1;      // after an error message
-const int warmInterrupted = 2; // the volume is pending
-
 const size_t warmBufferBytes = 65536;
 const size_t warmBufferAlignment = 4096;
 const unsigned sectorByteShift = 9; // sectors to bytes

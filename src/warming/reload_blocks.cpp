@@ -28,17 +28,17 @@ size_t CountBytes(const unsigned char *data, size_t size, unsigned char value) {
 
 } // namespace
 
-int ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
-                           const char *mountPath) {
+WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
+                                  const char *mountPath) {
     const WarmBuffer buffer = WarmBufferAllocate();
     if (!buffer) {
         LogError("Can't allocate memory\n");
-        return warmFailed;
+        return WorkResult::Failed;
     }
     const ScopedFd device(open(cacheDevicePath, O_RDONLY | O_DIRECT | O_CLOEXEC));
     if (!device.IsOpen()) {
         LogError("Can't open file (%s)", cacheDevicePath);
-        return warmFailed;
+        return WorkResult::Failed;
     }
     LogVerbose("Start to read blocks");
 
@@ -63,7 +63,7 @@ int ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
             if (run.numBits > 0 &&
                 ReadFdToNullByRange(device.Get(), run, buffer.get(), warmBufferBytes) < 0) {
                 LogError("Read range to cache failed");
-                return warmFailed;
+                return WorkResult::Failed;
             }
             run.numBits = 0;
             const size_t clearBytes = atByte ? CountBytes(byte, left, 0) : 0;
@@ -71,16 +71,16 @@ int ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
         }
         if (ServiceIsPendingSpace(mountPath)) {
             LogVerbose("Interrupted due to space is pending");
-            return warmInterrupted;
+            return WorkResult::Interrupted;
         }
     }
     if (run.numBits > 0 &&
         ReadFdToNullByRange(device.Get(), run, buffer.get(), warmBufferBytes) < 0) {
         LogError("Read range to cache failed");
-        return warmFailed;
+        return WorkResult::Failed;
     }
     if (!seen) {
         LogVerbose("No pin blocks, no need to reload");
     }
-    return warmDone;
+    return WorkResult::Done;
 }

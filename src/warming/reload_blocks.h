@@ -8,9 +8,10 @@
 #define WARMING_RELOAD_BLOCKS_H
 
 #include "bitmap/pin_bitmap.h"
+#include "warming/work_result.h"
 
-// warmDone, warmFailed after an error message, or warmInterrupted.
-int ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
-                           const char *mountPath);
+// Done, Failed after an error message, or Interrupted.
+WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
+                                  const char *mountPath);
 
 #endif

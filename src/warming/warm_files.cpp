@@ -15,50 +15,50 @@ const uint32_t flagUninitialized = 1;
 
 } // namespace
 
-int ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files) {
+WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files) {
     const WarmBuffer buffer = WarmBufferAllocate();
     if (!buffer) {
         LogError("Can't allocate memory\n");
-        return warmFailed;
+        return WorkResult::Failed;
     }
     const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
     if (!cachePath) {
         LogError("Cant' get cache path from volume (%s)", mountPath);
-        return warmFailed;
+        return WorkResult::Failed;
     }
     const ScopedFd device(open(cachePath.get(), O_RDONLY | O_DIRECT | O_CLOEXEC));
     if (!device.IsOpen()) {
         LogError("Can't open file (%s)", cachePath.get());
-        return warmFailed;
+        return WorkResult::Failed;
     }
     for (const FileToWarm &file : files) {
         if (ServiceIsPendingSpace(mountPath)) {
             LogVerbose("Space is pending, Interrupted");
-            return warmInterrupted;
+            return WorkResult::Interrupted;
         }
-        const int result = ReadMappingRangesToCache(mountPath, device.Get(), file.table,
-                                                    buffer.get(), warmBufferBytes);
-        if (result == warmFailed) {
+        const WorkResult result = ReadMappingRangesToCache(mountPath, device.Get(), file.table,
+                                                           buffer.get(), warmBufferBytes);
+        if (result == WorkResult::Failed) {
             LogError("Can't read file (%s) to cache", file.path.c_str());
-            return warmFailed;
+            return WorkResult::Failed;
         }
-        if (result == warmInterrupted) {
+        if (result == WorkResult::Interrupted) {
             LogVerbose("Interrupted");
-            return warmInterrupted;
+            return WorkResult::Interrupted;
         }
     }
-    return warmDone;
+    return WorkResult::Done;
 }
 
-int ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
-                             char *buffer, size_t bufferSize) {
+WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
+                                    char *buffer, size_t bufferSize) {
     LogVerbose("Mapping entry size = %zu", table.entries.size());
     for (const FileMappingEntry &entry : table.entries) {
         const unsigned long long start = entry.deviceStartSector;
         const unsigned long long sectors = entry.numSectors;
         if (ServiceIsPendingSpace(mountPath)) {
             LogVerbose("Space is pending, Interrupted");
-            return warmInterrupted;
+            return WorkResult::Interrupted;
         }
         if (entry.flag == flagUninitialized) {
             LogVerbose("Skip uninitialized range (disk start sector = %llu num sectors = %llu)",
@@ -70,8 +70,8 @@ int ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTab
                          bufferSize) < 0) {
             LogError("Read fd to null failed (disk start sector = %llu num sectors = %llu)", start,
                      sectors);
-            return warmFailed;
+            return WorkResult::Failed;
         }
     }
-    return warmDone;
+    return WorkResult::Done;
 }

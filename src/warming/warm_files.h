@@ -7,6 +7,7 @@
 #define WARMING_WARM_FILES_H
 
 #include "vesk/storage_core.h"
+#include "warming/work_result.h"
 
 #include <cstddef>
 #include <string>
@@ -17,11 +18,11 @@ struct FileToWarm {
     FileMappingTable table; // extents on the volume's block device
 };
 
-// warmDone, warmFailed after an error message, or warmInterrupted.
-int ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files);
+// Done, Failed after an error message, or Interrupted.
+WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files);
 
 // The same for one file's extents, from the open cache device.
-int ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
-                             char *buffer, size_t bufferSize);
+WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
+                                    char *buffer, size_t bufferSize);
 
 #endif

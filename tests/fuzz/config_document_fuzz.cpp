@@ -62,9 +62,9 @@ void Select(const std::string &path, RequestRecord *record, std::string *number)
     }
     const std::string before = FuzzRead(path);
     RequestRecord taken{};
-    const int result = ConfigParseAndGetNextAvailableRequest(path.c_str(), &taken, number);
-    Check(path, before, result != nextRequestError, "selection");
-    if (result == nextRequestTaken) {
+    const NextRequest result = ConfigParseAndGetNextAvailableRequest(path.c_str(), &taken, number);
+    Check(path, before, result != NextRequest::Error, "selection");
+    if (result == NextRequest::Taken) {
         FuzzExpect(memchr(taken.mountPath, 0, sizeof(taken.mountPath)) != nullptr &&
                        memchr(taken.data, 0, sizeof(taken.data)) != nullptr,
                    "the texts of a selected request end in their fields");

@@ -30,7 +30,7 @@ protected:
     std::thread selection_;
     RequestRecord record_{};
     std::string num_;
-    int result_ = -1;
+    NextRequest result_ = NextRequest::None;
 };
 
 TEST_F(NextRequestBlockingTest, WithoutAFileItWaitsForTheFirstRequest) {
@@ -41,7 +41,7 @@ TEST_F(NextRequestBlockingTest, WithoutAFileItWaitsForTheFirstRequest) {
     ASSERT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
     ServiceSignalRequest();
     selection_.join();
-    EXPECT_EQ(result_, 2);
+    EXPECT_EQ(result_, NextRequest::Taken);
     EXPECT_EQ(num_, "0");
     EXPECT_EQ(record_.type, requestReloadPinBlocks);
     EXPECT_EQ(MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
@@ -65,7 +65,7 @@ TEST_F(NextRequestBlockingTest, ASignalWithoutARequestIsWaitedOn) {
     ASSERT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
     ServiceSignalRequest();
     selection_.join();
-    EXPECT_EQ(result_, 2);
+    EXPECT_EQ(result_, NextRequest::Taken);
     EXPECT_EQ(log.Count("ConfigParseAndGetNextAvailableRequest() [N]: Wake up"), 2);
     EXPECT_EQ(log.Count("ConfigParseAndGetNextAvailableRequest() [N]: Config doesn't exist"), 0);
 }
@@ -77,5 +77,5 @@ TEST_F(NextRequestBlockingTest, AFileThatIsDamagedMeanwhileEndsTheWaitWithAnErro
     Store("damaged");
     ServiceSignalRequest();
     selection_.join();
-    EXPECT_EQ(result_, 3);
+    EXPECT_EQ(result_, NextRequest::Error);
 }

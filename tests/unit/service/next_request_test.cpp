@@ -18,7 +18,7 @@ protected:
         ConfigTest::SetUp();
         FakeApplianceOneVolume("/dev/cachedev_0");
     }
-    int Next() {
+    NextRequest Next() {
         record_ = RequestRecord{};
         num_ = "old";
         return ConfigParseAndGetNextAvailableRequest(path_.c_str(), &record_, &num_);
@@ -42,7 +42,7 @@ protected:
 TEST_F(NextRequestTest, TheOldestRequestIsTakenAndStaysInTheFile) {
     Store(exampleDocument);
     CapturedLog log;
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "1");
     EXPECT_EQ(record_.type, requestPinFiles);
     EXPECT_STREQ(record_.mountPath, "/volume1");
@@ -54,7 +54,7 @@ TEST_F(NextRequestTest, TheOldestRequestIsTakenAndStaysInTheFile) {
 TEST_F(NextRequestTest, ATakenRequestIsLoggedWithAnOpenParenthesis) {
     Store(exampleDocument);
     CapturedLog log(2);
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
               Messages{"ConfigParseAndGetNextAvailableRequest() [N]: Get request (request num = 1 "
                        "type = pinFiles data = share/b.bin#5678"});
@@ -62,7 +62,7 @@ TEST_F(NextRequestTest, ATakenRequestIsLoggedWithAnOpenParenthesis) {
 
 TEST_F(NextRequestTest, NullDataGivesTheEmptyText) {
     StoreTwo(R"({"type" : "reloadPinBlocks", "mountPath" : "/volume1", "data" : null})", pinA);
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "0");
     EXPECT_EQ(record_.type, requestReloadPinBlocks);
     EXPECT_STREQ(record_.data, "");
@@ -75,7 +75,7 @@ TEST_F(NextRequestTest, ARequestOfAPendingSpaceIsPassedOverAndKeepsItsPlace) {
     const std::string before = Stored();
     SetPending("/volume1");
     CapturedLog log(2);
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "1");
     EXPECT_EQ(record_.type, requestUnpinFiles);
     EXPECT_STREQ(record_.mountPath, "/volume2");
@@ -93,7 +93,7 @@ TEST_F(NextRequestTest, WithOnlyPendingRequestsTheAnswerIsNoneAtOnce) {
     StoreTwo(pinA, pinA);
     SetPending("/volume1");
     CapturedLog log;
-    EXPECT_EQ(Next(), 0);
+    EXPECT_EQ(Next(), NextRequest::None);
     EXPECT_EQ(num_, "old");
     EXPECT_EQ(record_.type, 0);
     EXPECT_EQ(log.Messages(), Messages{});
@@ -102,14 +102,14 @@ TEST_F(NextRequestTest, WithOnlyPendingRequestsTheAnswerIsNoneAtOnce) {
 TEST_F(NextRequestTest, APendingSpaceIsComparedExactly) {
     StoreTwo(pinA, pinA);
     SetPending("/volume1/");
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
 }
 
 TEST_F(NextRequestTest, ARequestOfAVolumeWithoutCacheIsDroppedWithItsRecords) {
     StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})", pinA);
     FakeAppliance::spaces.push_back({"/dev/space9", "/volume9", "uuid-9"});
     CapturedLog log;
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "1");
     EXPECT_EQ(log.Messages(), Messages{"Drop requests finish"});
     EXPECT_EQ(StoredDocument(),
@@ -122,7 +122,7 @@ TEST_F(NextRequestTest, ADropIsLoggedAtLevel2) {
     StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})", pinA);
     FakeAppliance::spaces.push_back({"/dev/space9", "/volume9", "uuid-9"});
     CapturedLog log(2);
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(
         MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
         (Messages{
@@ -138,7 +138,7 @@ TEST_F(NextRequestTest, WhenAllAreDroppedTheAnswerIsNone) {
     FakeAppliance::caches[0].supportPin = 0;
     StoreTwo(pinA, pinA);
     CapturedLog log;
-    EXPECT_EQ(Next(), 0);
+    EXPECT_EQ(Next(), NextRequest::None);
     EXPECT_EQ(log.Messages(), Messages{"Drop requests finish"});
     EXPECT_EQ(StoredDocument(), ParseDocument(R"({"nextRequestNum" : 2, "requestQueue" : null,
         "requests" : {}, "volumes" : {"/volume9" : {"files" : {"8" : "y"}}}})"));
@@ -147,7 +147,7 @@ TEST_F(NextRequestTest, WhenAllAreDroppedTheAnswerIsNone) {
 TEST_F(NextRequestTest, ARunnableRequestEndsTheWalkBeforeALaterDrop) {
     StoreTwo(pinA, R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})");
     const std::string before = Stored();
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "0");
     EXPECT_EQ(Stored(), before);
 }
@@ -156,7 +156,7 @@ TEST_F(NextRequestTest, ADropLeavesTheVolumesOwnPendingStateAlone) {
     FakeAppliance::caches.clear();
     StoreTwo(pinA, pinA);
     SetPending("/volume1");
-    EXPECT_EQ(Next(), 0);
+    EXPECT_EQ(Next(), NextRequest::None);
     EXPECT_TRUE(ServiceIsPendingSpace("/volume1"));
 }
 
@@ -166,7 +166,7 @@ TEST_F(NextRequestTest, ADropTakesTheEmptyPathOutOfThePendingList) {
     SetPending("");
     SetPending("/volume1");
     CapturedLog log(2);
-    EXPECT_EQ(Next(), 0);
+    EXPECT_EQ(Next(), NextRequest::None);
     EXPECT_FALSE(ServiceIsPendingSpace(""));
     EXPECT_TRUE(ServiceIsPendingSpace("/volume1"));
     EXPECT_EQ(log.Count("ConfigParseAndGetNextAvailableRequest() [N]: Remove space (/volume1) from "
@@ -178,8 +178,8 @@ TEST_F(NextRequestTest, AQueueEntryWithoutItsRequestIsAnError) {
     Store(R"({"requestQueue" : ["4", "5"], "requests" : {"5" : {"type" : "ack"}}})");
     const std::string before = Stored();
     CapturedLog log;
-    EXPECT_EQ(Next(), 3);
-    EXPECT_EQ(Next(), 3); // for good
+    EXPECT_EQ(Next(), NextRequest::Error);
+    EXPECT_EQ(Next(), NextRequest::Error); // for good
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't find request number (4) in config",
                                   "Can't find request number (4) in config",
@@ -193,7 +193,7 @@ TEST_F(NextRequestTest, AnErrorBehindADropWritesNothing) {
     const std::string before = Stored();
     FakeAppliance::spaces.push_back({"/dev/space9", "/volume9", "uuid-9"});
     CapturedLog log;
-    EXPECT_EQ(Next(), 3);
+    EXPECT_EQ(Next(), NextRequest::Error);
     EXPECT_EQ(log.Messages(), Messages{"Can't get correct request type"});
     EXPECT_EQ(Stored(), before);
 }
@@ -204,7 +204,7 @@ TEST_F(NextRequestTest, AnUnknownTypeIsAnError) {
                      "}",
                  pinA);
         CapturedLog log;
-        EXPECT_EQ(Next(), 3) << type;
+        EXPECT_EQ(Next(), NextRequest::Error) << type;
         EXPECT_EQ(log.Messages(), Messages{"Can't get correct request type"}) << type;
     }
 }
@@ -212,7 +212,7 @@ TEST_F(NextRequestTest, AnUnknownTypeIsAnError) {
 TEST_F(NextRequestTest, ADamagedFileIsAnError) {
     Store("{");
     CapturedLog log(2);
-    EXPECT_EQ(Next(), 3);
+    EXPECT_EQ(Next(), NextRequest::Error);
     EXPECT_EQ(
         MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
         Messages{"ConfigParseAndGetNextAvailableRequest() [N] : ***** Get request from config "
@@ -226,7 +226,7 @@ TEST_F(NextRequestTest, ADropOfANumberThatStandsTwiceIsAnError) {
     Store(std::string(R"({"requestQueue" : ["0", "0"], "requests" : {"0" : )") + pinA + "}}");
     const std::string before = Stored();
     CapturedLog log;
-    EXPECT_EQ(Next(), 3);
+    EXPECT_EQ(Next(), NextRequest::Error);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Remove string error, count =2",
                                   "Can't remove request num (0) from request queue",
@@ -244,7 +244,7 @@ TEST_F(NextRequestTest, ADropThatCannotBeWrittenIsAnError) {
     CapturedLog log;
     {
         const OrdinaryUser user;
-        EXPECT_EQ(Next(), 3);
+        EXPECT_EQ(Next(), NextRequest::Error);
     }
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't open config file (" + path_ + ")",
@@ -259,7 +259,7 @@ TEST_F(NextRequestTest, LongTextsAreCutToTheRecordsFields) {
     StoreTwo(R"({"type" : "ack", "mountPath" : ")" + mountPath.substr(0, 511) + R"(", "data" : ")" +
                  std::string(2000, 'd') + "\"}",
              pinA);
-    EXPECT_EQ(Next(), 2);
+    EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(record_.type, requestAck);
     EXPECT_EQ(record_.mountPath, mountPath.substr(0, 511));
     EXPECT_EQ(record_.data, std::string(1023, 'd'));

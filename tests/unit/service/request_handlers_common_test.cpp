@@ -7,7 +7,7 @@
 
 class RequestHandlersCommonTest : public HandlerTest {
 protected:
-    int Handle(int type, const std::string &data = "") {
+    WorkResult Handle(int type, const std::string &data = "") {
         const RequestRecord record = Record(type, data);
         return HandleRequest(&record);
     }
@@ -17,7 +17,7 @@ protected:
 TEST_F(RequestHandlersCommonTest, OtherTypesAreNotHandled) {
     for (const char *name : {"unknown", "ack", "addPendingSpace", "removePendigSpace"}) {
         CapturedLog log;
-        EXPECT_EQ(Handle(StringToRequestType(name), "a#1"), 1);
+        EXPECT_EQ(Handle(StringToRequestType(name), "a#1"), WorkResult::Failed);
         EXPECT_EQ(log.Messages(), (Messages{
                                       std::string("Get unhandle request (") + name + ")",
                                       "Handle request failed",
@@ -29,7 +29,7 @@ TEST_F(RequestHandlersCommonTest, OtherTypesAreNotHandled) {
 
 TEST_F(RequestHandlersCommonTest, ATypeWithoutANameIsNotHandled) {
     CapturedLog log;
-    EXPECT_EQ(Handle(-1), 1);
+    EXPECT_EQ(Handle(-1), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Convert request type to string errror",
                                   "Get unhandle request ((null))",
@@ -42,7 +42,7 @@ TEST_F(RequestHandlersCommonTest, WithoutTheSpaceItFails) {
     FakeAppliance::spaces.clear();
     for (const int type : handledTypes_) {
         CapturedLog log;
-        EXPECT_EQ(Handle(type, "a#1"), 1);
+        EXPECT_EQ(Handle(type, "a#1"), WorkResult::Failed);
         EXPECT_EQ(log.Messages(), (Messages{
                                       "Can't get space uuid",
                                       "Handle request failed",
@@ -54,7 +54,7 @@ TEST_F(RequestHandlersCommonTest, WithoutTheSpaceItFails) {
 TEST_F(RequestHandlersCommonTest, WithoutACacheItFails) {
     FakeAppliance::caches.clear();
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), 1);
+    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't get cache's ssd path",
                                   "Can't get cache path",
@@ -66,7 +66,7 @@ TEST_F(RequestHandlersCommonTest, WithoutACacheItFails) {
 TEST_F(RequestHandlersCommonTest, FailuresNameTheirFunction) {
     FakeAppliance::caches.clear();
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), 1);
+    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleRequest"),
               (Messages{
                   "HandleRequest() [N] : ***** Can't get cache path",
@@ -79,7 +79,7 @@ TEST_F(RequestHandlersCommonTest, FailuresNameTheirFunction) {
 TEST_F(RequestHandlersCommonTest, ADeviceWithoutASizeLeavesAnEmptyBitmapToFree) {
     FakeAppliance::caches[0].cachePath = "/missing/device";
     CapturedLog log;
-    EXPECT_EQ(Handle(requestReloadPinBlocks), 1);
+    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't open device (/missing/device)",
                                   "Can't get block device path",
@@ -93,7 +93,7 @@ TEST_F(RequestHandlersCommonTest, ADeviceWithoutASizeLeavesAnEmptyBitmapToFree) 
 TEST_F(RequestHandlersCommonTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
     WriteWhole(bitmapFile_, "abc");
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), 1);
+    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Incorrect bitmap size (2), file size (3)",
                                   "Allocate bitmap failed",
@@ -107,7 +107,7 @@ TEST_F(RequestHandlersCommonTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
 TEST_F(RequestHandlersCommonTest, AListThatDoesNotParseFails) {
     for (const int type : {requestPinFiles, requestUnpinFiles}) {
         CapturedLog log;
-        EXPECT_EQ(Handle(type, "a#1;b%s"), 1);
+        EXPECT_EQ(Handle(type, "a#1;b%s"), WorkResult::Failed);
         EXPECT_EQ(log.Messages(), (Messages{
                                       "Parse file inode from string (b%s) failed",
                                       "Can't parse file inodes from request's data (a#1;b%s)",
@@ -120,7 +120,7 @@ TEST_F(RequestHandlersCommonTest, AListThatDoesNotParseFails) {
 TEST_F(RequestHandlersCommonTest, AReloadReadsTheStoredBitmapsBlocks) {
     WriteWhole(bitmapFile_, std::string("\x28\x80", 2));
     CapturedLog log;
-    EXPECT_EQ(Handle(requestReloadPinBlocks, "what#is this"), 0); // has no files
+    EXPECT_EQ(Handle(requestReloadPinBlocks, "what#is this"), WorkResult::Done); // has no files
     EXPECT_EQ(device_->events,
               (Events{"read 196608+65536", "read 327680+65536", "read 983040+65536"}));
     EXPECT_EQ(log.Messages(), Messages{});
@@ -129,7 +129,7 @@ TEST_F(RequestHandlersCommonTest, AReloadReadsTheStoredBitmapsBlocks) {
 
 TEST_F(RequestHandlersCommonTest, AReloadWithoutABitmapFileReadsNothing) {
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestReloadPinBlocks), 0);
+    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{});
     EXPECT_EQ(MessagesOf(log, "ReloadPinBlocksToCache"),
               (Messages{
@@ -143,7 +143,7 @@ TEST_F(RequestHandlersCommonTest, AReloadIsInterrupted) {
     WriteWhole(bitmapFile_, std::string("\x28\x80", 2));
     device_->onRead = [this] { SetPending(); };
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestReloadPinBlocks), 2);
+    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{"read 196608+65536"});
     EXPECT_EQ(MessagesOf(log, "HandleRequest"), Messages{"HandleRequest() [N]: Get Interruped"});
 }
@@ -152,7 +152,7 @@ TEST_F(RequestHandlersCommonTest, AReloadWhoseReadFailsFails) {
     WriteWhole(bitmapFile_, std::string("\x28\x80", 2));
     device_->onRead = [] { FakeLibc::Fail("read", EIO); };
     CapturedLog log;
-    EXPECT_EQ(Handle(requestReloadPinBlocks), 1);
+    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Read block error (seek = 196608 num bytes = 65536",
                                   "Read range to cache failed",

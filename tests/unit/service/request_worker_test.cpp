@@ -40,7 +40,7 @@ protected:
                                 R"(, "requestQueue" : [)" + queue + R"(], "requests" : {)" +
                                 members + "}}");
     }
-    int HandleAndModify(int type, const std::string &data, const std::string &num) {
+    WorkResult HandleAndModify(int type, const std::string &data, const std::string &num) {
         RequestRecord record = Record(type, data);
         return HandleRequestAndModifyConfig(config_.c_str(), &record, num);
     }
@@ -71,7 +71,7 @@ protected:
 TEST_F(RequestWorkerTest, ADoneRequestIsRecordedAndRemoved) {
     Queue({{"pinFiles", "a#1"}, {"reloadPinBlocks", "null"}});
     CapturedLog log;
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "0"), 0);
+    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "0"), WorkResult::Done);
     EXPECT_EQ(log.Messages(), Messages{});
     EXPECT_EQ(Compact(ReadWhole(config_)), Compact(R"({"nextRequestNum" : 2,
         "requestQueue" : ["1"], "requests" : {"1" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
@@ -83,7 +83,7 @@ TEST_F(RequestWorkerTest, ADoneRequestThatCannotBeRecordedStaysAndIsDone) {
     Queue({{"pinFiles", "a#1"}});
     const std::string before = ReadWhole(config_);
     CapturedLog log(2);
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "7"), 0);
+    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "7"), WorkResult::Done);
     EXPECT_EQ(
         MessagesOf(log, "HandleRequestAndModifyConfig"),
         (Messages{
@@ -96,7 +96,7 @@ TEST_F(RequestWorkerTest, ADoneRequestThatCannotBeRecordedStaysAndIsDone) {
 TEST_F(RequestWorkerTest, AFailedRequestIsDropped) {
     Queue({{"pinFiles", "x#77"}});
     CapturedLog log;
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "x#77", "0"), 1);
+    EXPECT_EQ(HandleAndModify(requestPinFiles, "x#77", "0"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Get mapping result fail.",
                                   "Can't add file (" + volume_ + "/x) inode (77) to bitmap",
@@ -111,7 +111,7 @@ TEST_F(RequestWorkerTest, AFailedRequestThatCannotBeDroppedStays) {
     Queue({{"pinFiles", "x#77"}});
     const std::string before = ReadWhole(config_);
     CapturedLog log(2);
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "x#77", "7"), 1);
+    EXPECT_EQ(HandleAndModify(requestPinFiles, "x#77", "7"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleRequestAndModifyConfig"),
               (Messages{
                   "HandleRequestAndModifyConfig() [N]: Handle request (num = 7)",
@@ -125,7 +125,7 @@ TEST_F(RequestWorkerTest, AFailedRequestThatCannotBeDroppedStays) {
 TEST_F(RequestWorkerTest, ARequestWithoutATypeNameIsDroppedWithoutPrintingANull) {
     Queue({{"ack", "null"}});
     CapturedLog log;
-    EXPECT_EQ(HandleAndModify(7, "", "0"), 1);
+    EXPECT_EQ(HandleAndModify(7, "", "0"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Convert request type to string errror",
                                   "Convert request type to string errror",
@@ -141,7 +141,7 @@ TEST_F(RequestWorkerTest, AnInterruptedRequestStaysUntouched) {
     const std::string before = ReadWhole(config_);
     SetPending();
     CapturedLog log(2);
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "0"), 2);
+    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "0"), WorkResult::Interrupted);
     EXPECT_EQ(MessagesOf(log, "HandleRequestAndModifyConfig"),
               (Messages{
                   "HandleRequestAndModifyConfig() [N]: Handle request (num = 0)",

@@ -30,11 +30,11 @@ const std::vector<Operation> &Operations() {
          [](const char *path) { return ConfigUpdatedByFinishedRequest(path, &pin, "1"); }},
         {"remove volume", -1, "Can't read data from config file (%)",
          [](const char *path) { return ConfigRemovePinFileVolume(path, "/volume1"); }},
-        {"select", 3, "Get request from config file (%) error",
+        {"select", static_cast<int>(NextRequest::Error), "Get request from config file (%) error",
          [](const char *path) {
              RequestRecord record{};
              std::string num;
-             return ConfigParseAndGetNextAvailableRequest(path, &record, &num);
+             return static_cast<int>(ConfigParseAndGetNextAvailableRequest(path, &record, &num));
          }},
     };
     return operations;

@@ -23,7 +23,7 @@ Messages WithoutTimes(const Messages &messages) {
 
 class ReadFileTest : public WarmingTest {
 protected:
-    int Read(uint64_t lastSector) {
+    WorkResult Read(uint64_t lastSector) {
         return FileReadToCache("/volume1", device_->Path().c_str(), lastSector);
     }
 };
@@ -32,7 +32,7 @@ TEST_F(ReadFileTest, TheFileIsReadUpToTheLastSector) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log;
-    EXPECT_EQ(Read(255), 0); // 128 KiB
+    EXPECT_EQ(Read(255), WorkResult::Done); // 128 KiB
     EXPECT_EQ(device_->events, (Events{"read 0+65536", "read 65536+65536"}));
     EXPECT_EQ(log.Messages(), Messages{});
 }
@@ -40,10 +40,10 @@ TEST_F(ReadFileTest, TheFileIsReadUpToTheLastSector) {
 TEST_F(ReadFileTest, APartOfAChunkCostsAWholeOne) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
-    EXPECT_EQ(Read(0), 0);
+    EXPECT_EQ(Read(0), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{"read 0+65536"});
     device_->events.clear();
-    EXPECT_EQ(Read(128), 0);
+    EXPECT_EQ(Read(128), WorkResult::Done);
     EXPECT_EQ(device_->events, (Events{"read 0+65536", "read 65536+65536"}));
 }
 
@@ -51,7 +51,7 @@ TEST_F(ReadFileTest, AtLevel2BeginAndEndAreLogged) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
-    EXPECT_EQ(Read(127), 0);
+    EXPECT_EQ(Read(127), WorkResult::Done);
     const std::string &path = device_->Path();
     EXPECT_EQ(WithoutTimes(log.Messages()),
               (Messages{
@@ -67,7 +67,7 @@ TEST_F(ReadFileTest, TheEndOfTheFileIsSuccess) {
     UseDevice(65536 + 4096);
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
-    EXPECT_EQ(Read(1000), 0);
+    EXPECT_EQ(Read(1000), WorkResult::Done);
     EXPECT_EQ(device_->events, (Events{"read 0+65536", "read 65536+65536", "read 69632+65536"}));
     EXPECT_EQ(LastOf(WithoutTimes(log.Messages())), "FileReadToCache() [N]: Read file (" +
                                                         device_->Path() +
@@ -76,11 +76,11 @@ TEST_F(ReadFileTest, TheEndOfTheFileIsSuccess) {
 
 TEST_F(ReadFileTest, AFileThatHasGoneIsSkipped) {
     CapturedLog log;
-    EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), 0);
+    EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), WorkResult::Done);
     EXPECT_EQ(log.Messages(),
               Messages{"File (/missing/file) doesn't exist (might due to be renamed), skip it"});
     CapturedLog verbose(2);
-    EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), 0);
+    EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), WorkResult::Done);
     EXPECT_EQ(LastOf(verbose.Messages()),
               "FileReadToCache() [N] : File (/missing/file) doesn't exist (might due to be "
               "renamed), skip it");
@@ -91,14 +91,14 @@ TEST_F(ReadFileTest, AFailingReadFails) {
     SKIP_WITHOUT_DIRECT_READS();
     FakeLibc::Fail("read", EIO, 2);
     CapturedLog log;
-    EXPECT_EQ(Read(2000), 1);
+    EXPECT_EQ(Read(2000), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), Messages{"Read error"});
 }
 
 TEST_F(ReadFileTest, WithoutMemoryItFails) {
     FakeLibc::Fail("aligned_alloc", ENOMEM);
     CapturedLog log;
-    EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), 1);
+    EXPECT_EQ(FileReadToCache("/volume1", "/missing/file", 7), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{"Can't allocate memory", ""}));
 }
 
@@ -107,7 +107,7 @@ TEST_F(ReadFileTest, APendingVolumeInterruptsAfterAChunk) {
     SKIP_WITHOUT_DIRECT_READS();
     SetPending();
     CapturedLog log;
-    EXPECT_EQ(Read(2000), 2);
+    EXPECT_EQ(Read(2000), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{"read 0+65536"});
     EXPECT_EQ(log.Messages(), Messages{});
 }
@@ -116,5 +116,5 @@ TEST_F(ReadFileTest, WhatIsReadWholeIsDoneEvenOnAPendingVolume) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
     SetPending();
-    EXPECT_EQ(Read(127), 0);
+    EXPECT_EQ(Read(127), WorkResult::Done);
 }

@@ -71,7 +71,7 @@ std::string RandomBitmap(std::mt19937 &random, size_t size) {
 
 class ReloadBlocksTest : public WarmingTest {
 protected:
-    int Reload(std::string bytes) {
+    WorkResult Reload(std::string bytes) {
         const PinBitmap bitmap{reinterpret_cast<unsigned char *>(&bytes[0]),
                                static_cast<uint32_t>(bytes.size())};
         return ReloadPinBlocksToCache(&bitmap, device_->Path().c_str(), "/volume1");
@@ -82,7 +82,7 @@ TEST_F(ReloadBlocksTest, Bits3To5And9AreTwoRanges) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
-    EXPECT_EQ(Reload(std::string("\x38\x02", 2)), 0);
+    EXPECT_EQ(Reload(std::string("\x38\x02", 2)), WorkResult::Done);
     EXPECT_EQ(device_->events, (Events{"read 196608+65536", "read 262144+65536",
                                        "read 327680+65536", "read 589824+65536"}));
     EXPECT_EQ(log.Messages(),
@@ -100,7 +100,7 @@ TEST_F(ReloadBlocksTest, AClearBitmapReadsNothing) {
     SKIP_WITHOUT_DIRECT_READS();
     for (const size_t size : {size_t{1}, size_t{2}, size_t{9}, size_t{10000}}) {
         CapturedLog log(2);
-        EXPECT_EQ(Reload(std::string(size, '\0')), 0);
+        EXPECT_EQ(Reload(std::string(size, '\0')), WorkResult::Done);
         EXPECT_EQ(device_->events, Events{});
         EXPECT_EQ(log.Messages(),
                   (Messages{
@@ -113,14 +113,14 @@ TEST_F(ReloadBlocksTest, AClearBitmapReadsNothing) {
 TEST_F(ReloadBlocksTest, ABitmapOfNoBytesReadsNothing) {
     UseDevice(4096);
     SKIP_WITHOUT_DIRECT_READS();
-    EXPECT_EQ(Reload(""), 0);
+    EXPECT_EQ(Reload(""), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{});
 }
 
 TEST_F(ReloadBlocksTest, TheLastBitIsReadAfterTheWalk) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
-    EXPECT_EQ(Reload(std::string("\x00\x80", 2)), 0);
+    EXPECT_EQ(Reload(std::string("\x00\x80", 2)), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{"read 983040+65536"});
 }
 
@@ -128,7 +128,7 @@ TEST_F(ReloadBlocksTest, AFullBitmapIsOneRange) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
-    EXPECT_EQ(Reload("\xff\xff"), 0);
+    EXPECT_EQ(Reload("\xff\xff"), WorkResult::Done);
     EXPECT_EQ(device_->events.size(), 16U);
     EXPECT_EQ(MessagesOf(log, "ReadFdToNullByRange"),
               Messages{"ReadFdToNullByRange() [N]: Range's bitStart=0 numBits=16 (size = 1048576 "
@@ -147,7 +147,7 @@ TEST_F(ReloadBlocksTest, RandomBitmapsAreReadAsABitByBitWalkReadsThem) {
         const std::vector<BitRun> runs = RunsOf(bytes);
         device_->events.clear();
         CapturedLog log(2);
-        ASSERT_EQ(Reload(bytes), 0) << i << " " << Hex(bytes);
+        ASSERT_EQ(Reload(bytes), WorkResult::Done) << i << " " << Hex(bytes);
         ASSERT_EQ(device_->events, ReadsOf(runs)) << i << " " << Hex(bytes);
         ASSERT_EQ(MessagesOf(log, "ReadFdToNullByRange"), RangeLinesOf(runs));
     }
@@ -159,14 +159,14 @@ TEST_F(ReloadBlocksTest, APendingVolumeIsNotRead) {
     SetPending();
     for (const char *bytes : {"\x01\x01", "\xff\xff", "\x80\x01"}) {
         CapturedLog log(2);
-        EXPECT_EQ(Reload(bytes), 2);
+        EXPECT_EQ(Reload(bytes), WorkResult::Interrupted);
         EXPECT_EQ(log.Messages(),
                   (Messages{
                       "ReloadPinBlocksToCache() [N]: Start to read blocks",
                       "ReloadPinBlocksToCache() [N]: Interrupted due to space is pending",
                   }));
     }
-    EXPECT_EQ(Reload(std::string(2, '\0')), 2);
+    EXPECT_EQ(Reload(std::string(2, '\0')), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{});
 }
 
@@ -197,7 +197,8 @@ TEST_F(ReloadBlocksTest, AVolumeThatTurnsPendingIsLeftAfterTheRangeBeingRead) {
                     SetPending();
                 }
             };
-            EXPECT_EQ(Reload(bytes), unnoticed ? 0 : 2) << Hex(bytes) << " " << call;
+            EXPECT_EQ(Reload(bytes), unnoticed ? WorkResult::Done : WorkResult::Interrupted)
+                << Hex(bytes) << " " << call;
             EXPECT_EQ(device_->events, ReadsOf(expected)) << Hex(bytes) << " " << call;
         }
     }
@@ -208,7 +209,7 @@ TEST_F(ReloadBlocksTest, AnotherVolumesPendingStateDoesNotMatter) {
     SKIP_WITHOUT_DIRECT_READS();
     char other[] = "/volume10";
     ASSERT_EQ(ServiceAddPendingSpaceAtomic(other), 0);
-    EXPECT_EQ(Reload("\x01"), 0);
+    EXPECT_EQ(Reload("\x01"), WorkResult::Done);
     EXPECT_EQ(device_->events.size(), 1U);
 }
 
@@ -217,7 +218,7 @@ TEST_F(ReloadBlocksTest, AFailingReadEndsTheWalk) {
     SKIP_WITHOUT_DIRECT_READS();
     FakeLibc::Fail("read", EIO, 2);
     CapturedLog log;
-    EXPECT_EQ(Reload("\x15"), 1);
+    EXPECT_EQ(Reload("\x15"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Read block error (seek = 131072 num bytes = 65536",
                                   "Read range to cache failed",
@@ -229,7 +230,7 @@ TEST_F(ReloadBlocksTest, AFailingLastRangeFails) {
     UseDevice(7 * 65536);
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
-    EXPECT_EQ(Reload("\x80"), 1);
+    EXPECT_EQ(Reload("\x80"), WorkResult::Failed);
     EXPECT_EQ(LastOf(log.Messages()),
               "ReloadPinBlocksToCache() [N] : ***** Read range to cache failed");
 }
@@ -238,7 +239,7 @@ TEST_F(ReloadBlocksTest, WithoutMemoryItFailsFirst) {
     UseDevice(4096);
     FakeLibc::Fail("aligned_alloc", ENOMEM);
     CapturedLog log;
-    EXPECT_EQ(Reload("\x01"), 1);
+    EXPECT_EQ(Reload("\x01"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{"Can't allocate memory", ""}));
 }
 
@@ -246,6 +247,6 @@ TEST_F(ReloadBlocksTest, WithoutADeviceItFails) {
     unsigned char byte = 1;
     const PinBitmap bitmap{&byte, 1};
     CapturedLog log;
-    EXPECT_EQ(ReloadPinBlocksToCache(&bitmap, "/missing/device", "/volume1"), 1);
+    EXPECT_EQ(ReloadPinBlocksToCache(&bitmap, "/missing/device", "/volume1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), Messages{"Can't open file (/missing/device)"});
 }

@@ -32,7 +32,7 @@ protected:
 TEST_F(WarmFilesTest, EveryExtentOfEveryFileIsReadInOrder) {
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log;
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_, b_}), 0);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_, b_}), WorkResult::Done);
     EXPECT_EQ(device_->events,
               (Events{"read 1048576+5120", "read 2097152+4096", "read 8192+4096"}));
     EXPECT_EQ(log.Messages(), Messages{});
@@ -41,7 +41,7 @@ TEST_F(WarmFilesTest, EveryExtentOfEveryFileIsReadInOrder) {
 TEST_F(WarmFilesTest, AtLevel2EachStepIsLogged) {
     SKIP_WITHOUT_DIRECT_READS();
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), 0);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), WorkResult::Done);
     EXPECT_EQ(MessagesOf(log, "ReadMappingRangesToCache"),
               (Messages{
                   "ReadMappingRangesToCache() [N]: Mapping entry size = 1",
@@ -53,7 +53,7 @@ TEST_F(WarmFilesTest, AtLevel2EachStepIsLogged) {
 
 TEST_F(WarmFilesTest, NoFilesReadNothing) {
     SKIP_WITHOUT_DIRECT_READS();
-    EXPECT_EQ(ReadFilesToCache("/volume1", {}), 0);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {}), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{});
 }
 
@@ -63,7 +63,7 @@ TEST_F(WarmFilesTest, UnwrittenExtentsAreSkipped) {
         MakeFile("/volume1/a", {FakeExtent(0, 8, 1024, 1), FakeExtent(8, 8, 2048, 0),
                                 FakeExtent(16, 8, 3072, 2)}); // any other flag is data
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {file}), 0);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {file}), WorkResult::Done);
     EXPECT_EQ(device_->events, (Events{"read 1048576+4096", "read 1572864+4096"}));
     EXPECT_EQ(log.Count("ReadMappingRangesToCache() [N]: Skip uninitialized range (disk start "
                         "sector = 1024 num sectors = 8)"),
@@ -74,7 +74,7 @@ TEST_F(WarmFilesTest, AFileWithoutWrittenExtentsCausesNoRead) {
     SKIP_WITHOUT_DIRECT_READS();
     EXPECT_EQ(ReadFilesToCache("/volume1", {MakeFile("/volume1/a", {FakeExtent(0, 8, 64, 1)}),
                                             MakeFile("/volume1/b", {})}),
-              0);
+              WorkResult::Done);
     EXPECT_EQ(device_->events, Events{});
 }
 
@@ -82,7 +82,7 @@ TEST_F(WarmFilesTest, AFailingReadNamesTheFileOnce) {
     SKIP_WITHOUT_DIRECT_READS();
     const FileToWarm past = MakeFile("/volume1/past", {FakeExtent(0, 8, 16384)});
     CapturedLog log;
-    EXPECT_EQ(ReadFilesToCache("/volume1", {b_, past, a_}), 1);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {b_, past, a_}), WorkResult::Failed);
     EXPECT_EQ(log.Messages(),
               (Messages{
                   "Read block error (seek = 8388608 num bytes = 4096",
@@ -96,7 +96,7 @@ TEST_F(WarmFilesTest, FailuresNameTheirFunctions) {
     SKIP_WITHOUT_DIRECT_READS();
     FakeLibc::Fail("read", EIO);
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), 1);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), WorkResult::Failed);
     EXPECT_TRUE(log.Has("ReadMappingRangesToCache() [N] : ***** Read fd to null failed (disk start "
                         "sector = 16 num sectors = 8)"));
     EXPECT_TRUE(log.Has("ReadFilesToCache() [N] : ***** Can't read file (/volume1/b) to cache"));
@@ -106,7 +106,7 @@ TEST_F(WarmFilesTest, AFailingSeekFailsTheFile) {
     SKIP_WITHOUT_DIRECT_READS();
     FakeLibc::Fail("lseek", EIO);
     CapturedLog log;
-    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), 1);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't seek to 8192",
                                   "Read fd to null failed (disk start sector = 16 num sectors = 8)",
@@ -118,7 +118,7 @@ TEST_F(WarmFilesTest, APendingVolumeIsNotRead) {
     SKIP_WITHOUT_DIRECT_READS();
     SetPending();
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), 2);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{});
     EXPECT_EQ(MessagesOf(log, "ReadFilesToCache"),
               Messages{"ReadFilesToCache() [N]: Space is pending, Interrupted"});
@@ -127,14 +127,14 @@ TEST_F(WarmFilesTest, APendingVolumeIsNotRead) {
 TEST_F(WarmFilesTest, APendingVolumeWithoutFilesIsDone) {
     SKIP_WITHOUT_DIRECT_READS();
     SetPending();
-    EXPECT_EQ(ReadFilesToCache("/volume1", {}), 0);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {}), WorkResult::Done);
 }
 
 TEST_F(WarmFilesTest, PendingInsideAFileEndsBeforeTheNextExtent) {
     SKIP_WITHOUT_DIRECT_READS();
     device_->onRead = [] { SetPending(); };
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_, b_}), 2);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_, b_}), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{"read 1048576+5120"});
     EXPECT_TRUE(log.Has("ReadMappingRangesToCache() [N]: Space is pending, Interrupted"));
     EXPECT_EQ(MessagesOf(log, "ReadFilesToCache"), Messages{"ReadFilesToCache() [N]: Interrupted"});
@@ -144,7 +144,7 @@ TEST_F(WarmFilesTest, PendingInTheLastExtentEndsBeforeTheNextFile) {
     SKIP_WITHOUT_DIRECT_READS();
     device_->onRead = [] { SetPending(); };
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {b_, a_}), 2);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {b_, a_}), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{"read 8192+4096"});
     EXPECT_EQ(MessagesOf(log, "ReadFilesToCache"),
               Messages{"ReadFilesToCache() [N]: Space is pending, Interrupted"});
@@ -153,14 +153,14 @@ TEST_F(WarmFilesTest, PendingInTheLastExtentEndsBeforeTheNextFile) {
 TEST_F(WarmFilesTest, PendingInTheVeryLastReadIsDone) {
     SKIP_WITHOUT_DIRECT_READS();
     device_->onRead = [] { SetPending(); };
-    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), 0);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {b_}), WorkResult::Done);
 }
 
 TEST_F(WarmFilesTest, AnInterruptionIsSilentAtLevel1) {
     SKIP_WITHOUT_DIRECT_READS();
     SetPending();
     CapturedLog log;
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), 2);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), WorkResult::Interrupted);
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
@@ -168,14 +168,14 @@ TEST_F(WarmFilesTest, WithoutMemoryItFailsFirst) {
     FakeAppliance::spaces.clear();
     FakeLibc::Fail("aligned_alloc", ENOMEM);
     CapturedLog log;
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), 1);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{"Can't allocate memory", ""}));
 }
 
 TEST_F(WarmFilesTest, WithoutACachePathItFails) {
     FakeAppliance::caches[0].cachePathResult = 0;
     CapturedLog log;
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), 1);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't get cache path",
                                   "Can't get cache path",
@@ -186,7 +186,7 @@ TEST_F(WarmFilesTest, WithoutACachePathItFails) {
 TEST_F(WarmFilesTest, WithoutADeviceItFails) {
     FakeAppliance::caches[0].cachePath = "/missing/device";
     CapturedLog log(2);
-    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), 1);
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_}), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "ReadFilesToCache"),
               Messages{"ReadFilesToCache() [N] : ***** Can't open file (/missing/device)"});
 }
@@ -194,6 +194,6 @@ TEST_F(WarmFilesTest, WithoutADeviceItFails) {
 TEST_F(WarmFilesTest, AnExtentOf4GiBIsCutTo32Bits) {
     SKIP_WITHOUT_DIRECT_READS();
     EXPECT_EQ(ReadFilesToCache("/volume1", {MakeFile("/volume1/a", {FakeExtent(0, 8388616, 0)})}),
-              0);
+              WorkResult::Done);
     EXPECT_EQ(device_->events, Events{"read 0+4096"});
 }

@@ -1,0 +1,11 @@
+// What becomes of a request and of the warming that it asks for.
+#ifndef WARMING_WORK_RESULT_H
+#define WARMING_WORK_RESULT_H
+
+enum class WorkResult : int {
+    Done = 0,
+    Failed = 1,      // after an error message
+    Interrupted = 2, // the volume became pending while its data was read
+};
+
+#endif
