@@ -34,6 +34,19 @@ int LoadBitmap(const char *uuid, BitmapHolder *bitmap, bool *sizeChanged) {
     return result;
 }
 
+bool WriteAndSendBitmap(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
+                        const LogPlace &place) {
+    if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
+        LogWrite(LogClass::Error, place, "Write bitmap failed");
+        return false;
+    }
+    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
+        LogWrite(LogClass::Error, place, "Can't send bitmap to driver");
+        return false;
+    }
+    return true;
+}
+
 } // namespace
 
 WorkResult HandleRequest(const RequestRecord *record) {
@@ -95,12 +108,7 @@ WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitma
         }
         filesToWarm.push_back({path, table});
     }
-    if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
-        LogError("Write bitmap failed");
-        return WorkResult::Failed;
-    }
-    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
-        LogError("Can't send bitmap to driver");
+    if (!WriteAndSendBitmap(bitmap, bitmapPath, cachePath, LogHere())) {
         return WorkResult::Failed;
     }
     return ReadFilesToCache(mountPath, filesToWarm);
@@ -117,14 +125,9 @@ WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bit
             return WorkResult::Failed;
         }
     }
-    if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
-        LogError("Write bitmap failed");
-        return WorkResult::Failed;
-    }
     // The bitmap goes first: were the ranges released before it, a read in between could pin them
     // again by the old one.
-    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
-        LogError("Can't send bitmap to driver");
+    if (!WriteAndSendBitmap(bitmap, bitmapPath, cachePath, LogHere())) {
         return WorkResult::Failed;
     }
     if (SendUnpinInfoToDriver(cachePath, infos) < 0) {
