@@ -23,6 +23,7 @@
 #include "space/space_cache.h"
 
 #include <cstdio>
+#include <iterator>
 #include <json/value.h>
 #include <libgen.h>
 #include <new>
@@ -185,32 +186,15 @@ int RunGetBitmapSize(const ToolParameters &asked) {
     return success;
 }
 
-const struct {
-    ToolCommand command;
-    int (*run)(const ToolParameters &asked); // gives the exit value
-} handlers[] = {
-    {commandInvalid, NoCommand},
-    {commandPinFiles, RunPinFiles},
-    {commandUnpinFiles, RunUnpinFiles},
-    {commandSendBitmap, RunSendBitmap},
-    {commandStartService, RunStartService},
-    {commandHandleMount, RunHandleMount},
-    {commandHandleUmount, RunHandleUmount},
-    {commandSupportPin, RunSupportPin},
-    {commandCheckBitmap, RunCheckBitmap},
-    {commandAddPendingSpace, RunAddPending},
-    {commandRemovePendingSpace, RunRemovePending},
-    {commandGetUUID, RunGetUuid},
-    {commandDeleteBitmap, RunDeleteBitmap},
-    {commandCheckPin, RunCheckPin},
-    {commandReloadPinBlocks, RunReloadPinBlocks},
-    {commandUnpinAllBlocks, RunUnpinAll},
-    {commandIsAllUnpin, RunIsAllUnpin},
-    {commandSetBitmap, RunSetBitmap},
-    {commandUnsetBitmap, RunUnsetBitmap},
-    {commandUnpinRange, RunUnpinRange},
-    {commandGetBitmapSizeByte, RunGetBitmapSize},
+// In value order of the commands; each gives the exit value.
+int (*const handlers[])(const ToolParameters &asked) = {
+    NoCommand,        RunPinFiles,     RunUnpinFiles,   RunSendBitmap,  RunStartService,
+    RunHandleMount,   RunHandleUmount, RunSupportPin,   RunCheckBitmap, RunAddPending,
+    RunRemovePending, RunGetUuid,      RunDeleteBitmap, RunCheckPin,    RunReloadPinBlocks,
+    RunUnpinAll,      RunIsAllUnpin,   RunSetBitmap,    RunUnsetBitmap, RunUnpinRange,
+    RunGetBitmapSize,
 };
+static_assert(std::size(handlers) == commandGetBitmapSizeByte + 1, "a handler for every command");
 
 // Static: the service's worker reads it after the first thread may have ended.
 ToolParameters parameters;
@@ -230,12 +214,7 @@ int main(int argc, char *argv[]) try {
         LogLevel = 2;
     }
     LogTraceEntry();
-    int exitValue = success;
-    for (const auto &handler : handlers) {
-        if (handler.command == parameters.command) {
-            exitValue = handler.run(parameters);
-        }
-    }
+    const int exitValue = handlers[parameters.command](parameters);
     LogTraceExit();
     return exitValue;
 } catch (const std::bad_alloc &) {
