@@ -1,6 +1,7 @@
 #include "config/config_document.h"
 
 #include "config/json_file.h"
+#include "files/path.h"
 
 #include <algorithm>
 
@@ -53,4 +54,45 @@ int ConfigReadDocument(const char *configPath, Json::Value *root) {
         return -1;
     }
     return ConfigHasShape(*root) ? 0 : -1;
+}
+
+int ConfigUpdate(const char *configPath, MissingConfig missing,
+                 const std::function<ConfigChange(Json::Value &root)> &change,
+                 const LogPlace &place) {
+    const bool creates = missing == MissingConfig::Created;
+    // A file that cannot be looked up is not taken for a missing one: writing a new document over
+    // it would lose every record.
+    const bool absent = creates ? PathIsMissing(configPath) == 1 : PathExists(configPath) == 0;
+    if (absent && missing == MissingConfig::Skipped) {
+        LogWrite(LogClass::Verbose, place, "No config file (%s), skip it", configPath);
+        return 0;
+    }
+    if (absent && !creates) {
+        LogWrite(LogClass::Error, place, "Can't find config file (%s)", configPath);
+        return -1;
+    }
+    Json::Value root;
+    if (!absent && ConfigReadDocument(configPath, &root) < 0) {
+        LogWrite(LogClass::Error, place, "Can't read data from config file (%s)", configPath);
+        return -1;
+    }
+    const ConfigChange result = change(root);
+    if (result.failure != nullptr) {
+        LogWrite(LogClass::Error, place, "%s", result.failure);
+        return -1;
+    }
+    return result.made ? ConfigWrite(root, configPath, missing, place) : 0;
+}
+
+int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig missing,
+                const LogPlace &place) {
+    if (WriteJsonToFile(root, configPath) == 0) {
+        return 0;
+    }
+    if (missing == MissingConfig::Created) {
+        LogWrite(LogClass::Error, place, "Can't write to files");
+    } else {
+        LogWrite(LogClass::Error, place, "Write json data to config (%s) failed", configPath);
+    }
+    return -1;
 }

@@ -1,4 +1,4 @@
-// The configuration document: reading it with its shape checked.
+// The configuration document: reading it with its shape checked, and the read-change-write cycle.
 //
 // The shape (docs/formats.md): an object with "nextRequestNum" (integer), "requestQueue" (array of
 // request numbers), "requests" (object of request objects) and "volumes" (object of volume objects
@@ -9,6 +9,9 @@
 #ifndef CONFIG_CONFIG_DOCUMENT_H
 #define CONFIG_CONFIG_DOCUMENT_H
 
+#include "base/log.h"
+
+#include <functional>
 #include <json/value.h>
 
 // Whether the operations on the document can work on it without a type error.
@@ -16,5 +19,25 @@ bool ConfigHasShape(const Json::Value &root);
 
 // ReadFileToJson and the shape: 0, or -1 when the file cannot be read, parsed or used.
 int ConfigReadDocument(const char *configPath, Json::Value *root);
+
+// What a file that is not there means to a change.
+enum class MissingConfig { Created, IsAnError, Skipped };
+
+// What a change has made of the document in memory.
+struct ConfigChange {
+    const char *failure = nullptr; // error message; nothing is written then
+    bool made = true;              // false: there is nothing to write
+};
+
+// Reads the document, changes it and writes it, logging at the caller's place. 0, or -1 after an
+// error message with the file as it was. Takes no lock.
+int ConfigUpdate(const char *configPath, MissingConfig missing,
+                 const std::function<ConfigChange(Json::Value &root)> &change,
+                 const LogPlace &place);
+
+// The cycle's last step: 0, or -1 after the error message of a change that may create the file or
+// of one that does not.
+int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig missing,
+                const LogPlace &place);
 
 #endif

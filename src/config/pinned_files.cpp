@@ -2,9 +2,7 @@
 
 #include "base/log.h"
 #include "config/config_document.h"
-#include "config/json_file.h"
 #include "config/request_queue.h"
-#include "files/path.h"
 #include "request/file_inode_list.h"
 #include "request/request_type.h"
 #include "state/service_state.h"
@@ -76,51 +74,29 @@ int JsonRemovePinFileVolume(Json::Value &root, const char *mountPath) {
 int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *record,
                                    const std::string &num) {
     const ServiceLockGuard lock;
-    if (!PathExists(configPath)) {
-        LogError("Can't find config file (%s)", configPath);
-        return -1;
-    }
-    Json::Value root;
-    if (ConfigReadDocument(configPath, &root) < 0) {
-        LogError("Can't read data from config file (%s)", configPath);
-        return -1;
-    }
-    if (JsonUpdatePinFileInfo(root, record) < 0) {
-        LogError("Can't update pin file list");
-        return -1;
-    }
-    if (JsonRemoveRequest(root, num) < 0) {
-        LogError("Can't remove request");
-        return -1;
-    }
-    if (WriteJsonToFile(root, configPath) < 0) {
-        LogError("Write json data to config (%s) failed", configPath);
-        return -1;
-    }
-    return 0;
+    const auto finish = [record, &num](Json::Value &root) {
+        if (JsonUpdatePinFileInfo(root, record) < 0) {
+            return ConfigChange{"Can't update pin file list"};
+        }
+        return ConfigChange{JsonRemoveRequest(root, num) < 0 ? "Can't remove request" : nullptr};
+    };
+    return ConfigUpdate(configPath, MissingConfig::IsAnError, finish, LogHere());
 }
 
 int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
-    if (!PathExists(configPath)) {
-        LogVerbose("No config file (%s), skip it", configPath);
-        return 0;
-    }
-    Json::Value root;
-    if (ConfigReadDocument(configPath, &root) < 0) {
-        LogError("Can't read data from config file (%s)", configPath);
-        return -1;
-    }
-    switch (JsonRemovePinFileVolume(root, mountPath)) {
-    case volumeAbsent:
-        LogVerbose("Volume (%s) deson't has pin files, no need to remove", mountPath);
-        return 0;
-    case volumeRemoved:
-        if (WriteJsonToFile(root, configPath) < 0) {
-            LogError("Write json data to config (%s) failed", configPath);
-            return -1;
+    const LogPlace place = LogHere();
+    bool removed = false;
+    const auto remove = [mountPath, &place, &removed](Json::Value &root) {
+        removed = JsonRemovePinFileVolume(root, mountPath) == volumeRemoved;
+        if (!removed) {
+            LogWrite(LogClass::Verbose, place,
+                     "Volume (%s) deson't has pin files, no need to remove", mountPath);
         }
+        return ConfigChange{nullptr, removed};
+    };
+    const int result = ConfigUpdate(configPath, MissingConfig::Skipped, remove, place);
+    if (result == 0 && removed) {
         LogNotice("Remove pin file volume (%s) from config file", mountPath);
-        return 0;
-    default: LogError("Can't remove pin files in volume (%s)", mountPath); return -1;
     }
+    return result;
 }

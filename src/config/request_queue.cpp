@@ -3,8 +3,6 @@
 #include "base/log.h"
 #include "config/config_document.h"
 #include "config/json_array.h"
-#include "config/json_file.h"
-#include "files/path.h"
 #include "request/file_inode_list.h"
 #include "request/request_type.h"
 #include "state/service_state.h"
@@ -60,22 +58,11 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
 
 int ConfigAddRequest(const char *configPath, const RequestRecord *record) {
     const ServiceLockGuard lock;
-    Json::Value root;
-    // A file that cannot be looked up is not taken for a missing one: writing a new document over
-    // it would lose every record.
-    if (!PathIsMissing(configPath) && ConfigReadDocument(configPath, &root) < 0) {
-        LogError("Can't read data from config file (%s)", configPath);
-        return -1;
-    }
-    if (JsonAddRequest(root, record) < 0) {
-        LogError("Can't add request to json");
-        return -1;
-    }
-    if (WriteJsonToFile(root, configPath) < 0) {
-        LogError("Can't write to files");
-        return -1;
-    }
-    return 0;
+    const auto add = [record](Json::Value &root) {
+        return ConfigChange{JsonAddRequest(root, record) < 0 ? "Can't add request to json"
+                                                             : nullptr};
+    };
+    return ConfigUpdate(configPath, MissingConfig::Created, add, LogHere());
 }
 
 int JsonRemoveRequest(Json::Value &root, const std::string &num) {
@@ -114,22 +101,8 @@ int ConfigGetJsonAndNumRequest(const char *configPath, Json::Value *root, int *c
 int ConfigDropErrorRequest(const char *configPath, const RequestRecord * /*record*/,
                            const std::string &num) {
     const ServiceLockGuard lock;
-    if (!PathExists(configPath)) {
-        LogError("Can't find config file (%s)", configPath);
-        return -1;
-    }
-    Json::Value root;
-    if (ConfigReadDocument(configPath, &root) < 0) {
-        LogError("Can't read data from config file (%s)", configPath);
-        return -1;
-    }
-    if (JsonRemoveRequest(root, num) < 0) {
-        LogError("Can't remove request");
-        return -1;
-    }
-    if (WriteJsonToFile(root, configPath) < 0) {
-        LogError("Write json data to config (%s) failed", configPath);
-        return -1;
-    }
-    return 0;
+    const auto remove = [&num](Json::Value &root) {
+        return ConfigChange{JsonRemoveRequest(root, num) < 0 ? "Can't remove request" : nullptr};
+    };
+    return ConfigUpdate(configPath, MissingConfig::IsAnError, remove, LogHere());
 }

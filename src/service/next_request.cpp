@@ -1,7 +1,7 @@
 #include "service/next_request.h"
 
 #include "base/log.h"
-#include "config/json_file.h"
+#include "config/config_document.h"
 #include "config/request_queue.h"
 #include "files/path.h"
 #include "request/request_type.h"
@@ -19,28 +19,52 @@ template <size_t size> void CopyText(char (&field)[size], const std::string &tex
     snprintf(field, size, "%s", text.c_str());
 }
 
+// Blocks while the file is missing or the queue is empty. 0, or -1 after an error message.
+int WaitForQueuedRequest(const char *configPath, Json::Value *root, const LogPlace &place)
+    NEEDS_LOCK(serviceLock) {
+    for (;;) {
+        int count = 0;
+        if (!PathExists(configPath)) {
+            LogWrite(LogClass::Verbose, place, "Config doesn't exist");
+        } else if (ConfigGetJsonAndNumRequest(configPath, root, &count) < 0) {
+            LogWrite(LogClass::Error, place, "Get request from config file (%s) error", configPath);
+            return -1;
+        }
+        if (count > 0) {
+            return 0;
+        }
+        LogWrite(LogClass::Verbose, place, "Go to block mode");
+        ServiceWaitForRequest();
+        LogWrite(LogClass::Verbose, place, "Wake up");
+    }
+}
+
+// Removes the requests and writes the document. 0, or -1 after an error message.
+int DropRequests(const std::vector<std::string> &numbers, Json::Value &root, const char *configPath,
+                 const LogPlace &place) {
+    for (const std::string &number : numbers) {
+        if (JsonRemoveRequest(root, number) < 0) {
+            LogWrite(LogClass::Error, place, "Can't remove request (%s)", number.c_str());
+            return -1;
+        }
+        LogWrite(LogClass::Verbose, place, "Remove request (%s)", number.c_str());
+    }
+    if (ConfigWrite(root, configPath, MissingConfig::Created, place) < 0) {
+        return -1;
+    }
+    LogWrite(LogClass::Notice, place, "Drop requests finish");
+    return 0;
+}
+
 } // namespace
 
 NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
                                                   std::string *num) {
     const ServiceLockGuard lock;
     Json::Value root;
-    for (;;) {
-        int count = 0;
-        if (!PathExists(configPath)) {
-            LogVerbose("Config doesn't exist");
-        } else if (ConfigGetJsonAndNumRequest(configPath, &root, &count) < 0) {
-            LogError("Get request from config file (%s) error", configPath);
-            return NextRequest::Error;
-        }
-        if (count > 0) {
-            break;
-        }
-        LogVerbose("Go to block mode");
-        ServiceWaitForRequest();
-        LogVerbose("Wake up");
+    if (WaitForQueuedRequest(configPath, &root, LogHere()) < 0) {
+        return NextRequest::Error;
     }
-
     bool found = false;
     std::vector<std::string> dropped;
     Json::Value &requests = root["requests"];
@@ -53,7 +77,6 @@ NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, Reques
         const Json::Value &request = requests[number];
         char mountPath[1024];
         CopyText(mountPath, request["mountPath"].asString());
-
         if (!SpaceHasCacheAndSupportPin(mountPath)) {
             // The request can never run. The pending test looks at the record that is still to be
             // filled, so it concerns the empty path and leaves the pending spaces' own entries
@@ -89,20 +112,8 @@ NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, Reques
         found = true;
         break;
     }
-
-    if (!dropped.empty()) {
-        for (const std::string &number : dropped) {
-            if (JsonRemoveRequest(root, number) < 0) {
-                LogError("Can't remove request (%s)", number.c_str());
-                return NextRequest::Error;
-            }
-            LogVerbose("Remove request (%s)", number.c_str());
-        }
-        if (WriteJsonToFile(root, configPath) < 0) {
-            LogError("Can't write to files");
-            return NextRequest::Error;
-        }
-        LogNotice("Drop requests finish");
+    if (!dropped.empty() && DropRequests(dropped, root, configPath, LogHere()) < 0) {
+        return NextRequest::Error;
     }
     return found ? NextRequest::Taken : NextRequest::None;
 }

@@ -2,6 +2,8 @@
 
 #include "tests/support/config_fixture.h"
 
+#include <cerrno>
+
 class ConfigDocumentTest : public ConfigTest {};
 
 TEST_F(ConfigDocumentTest, DocumentedShapesAreAccepted) {
@@ -80,4 +82,95 @@ TEST_F(ConfigDocumentTest, ReadingReportsNothingItselfAboutAShape) {
     CapturedLog log;
     EXPECT_EQ(ConfigReadDocument(path_.c_str(), &root), -1);
     EXPECT_EQ(log.Messages(), Messages{});
+}
+
+namespace {
+
+const LogPlace caller{"Caller", 1};
+
+ConfigChange AddMember(Json::Value &root) {
+    root["new"] = 1;
+    return {};
+}
+
+ConfigChange NotReached(Json::Value & /*root*/) {
+    ADD_FAILURE() << "there was nothing to change";
+    return {};
+}
+
+} // namespace
+
+TEST_F(ConfigDocumentTest, AnUpdateReadsChangesAndWrites) {
+    CapturedLog log;
+    for (const MissingConfig missing :
+         {MissingConfig::Created, MissingConfig::IsAnError, MissingConfig::Skipped}) {
+        Store(R"({"old" : 2})");
+        EXPECT_EQ(ConfigUpdate(path_.c_str(), missing, AddMember, caller), 0);
+        ExpectStored(R"({"old" : 2, "new" : 1})");
+    }
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(ConfigDocumentTest, AnUpdateOfAMissingFileHasThreeOutcomes) {
+    CapturedLog log(2);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Skipped, NotReached, caller), 0);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::IsAnError, NotReached, caller), -1);
+    EXPECT_EQ(log.Messages(),
+              (Messages{"Caller() [N]: No config file (" + path_ + "), skip it",
+                        "Caller() [N] : ***** Can't find config file (" + path_ + ")"}));
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, AddMember, caller), 0);
+    ExpectStored(R"({"new" : 1})");
+}
+
+TEST_F(ConfigDocumentTest, OnlyAnUpdateThatCreatesTakesAFailedLookUpForAFile) {
+    Store(R"({"old" : 2})");
+    const Messages expected[] = {{}, {"Can't find config file (" + path_ + ")"}, {}};
+    const MissingConfig missing[] = {MissingConfig::Created, MissingConfig::IsAnError,
+                                     MissingConfig::Skipped};
+    for (int i = 0; i < 3; ++i) {
+        FakeLibc::Fail("stat", EIO);
+        CapturedLog log;
+        EXPECT_EQ(ConfigUpdate(path_.c_str(), missing[i], i == 0 ? AddMember : NotReached, caller),
+                  i == 1 ? -1 : 0);
+        EXPECT_EQ(log.Messages(), expected[i]);
+    }
+    ExpectStored(R"({"old" : 2, "new" : 1})");
+}
+
+TEST_F(ConfigDocumentTest, AnUpdateThatFailsOrChangesNothingWritesNothing) {
+    Store("{}");
+    CapturedLog log(2);
+    const auto fail = [](Json::Value &root) {
+        root["half"] = 1;
+        return ConfigChange{"Can't be changed"};
+    };
+    const auto leave = [](Json::Value &root) {
+        root["half"] = 1;
+        return ConfigChange{nullptr, false};
+    };
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, fail, caller), -1);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, leave, caller), 0);
+    EXPECT_EQ(Stored(), "{}");
+    EXPECT_EQ(MessagesOf(log, "Caller"), Messages{"Caller() [N] : ***** Can't be changed"});
+}
+
+TEST_F(ConfigDocumentTest, AnUpdateOfADamagedFileKeepsIt) {
+    Store("[]");
+    CapturedLog log(2);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, NotReached, caller), -1);
+    EXPECT_EQ(MessagesOf(log, "Caller"),
+              Messages{"Caller() [N] : ***** Can't read data from config file (" + path_ + ")"});
+    EXPECT_EQ(Stored(), "[]");
+}
+
+TEST_F(ConfigDocumentTest, AFailedWriteNamesTheFileUnlessItMayHaveBeenCreated) {
+    const std::string path = folder_.Path("no/such/conf.json");
+    CapturedLog log(2);
+    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::Created, caller), -1);
+    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::IsAnError, caller), -1);
+    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::Skipped, caller), -1);
+    const std::string named =
+        "Caller() [N] : ***** Write json data to config (" + path + ") failed";
+    EXPECT_EQ(MessagesOf(log, "Caller"),
+              (Messages{"Caller() [N] : ***** Can't write to files", named, named}));
 }
