@@ -12,11 +12,8 @@ int UnpinAllBlocksByCachePath(const char *cachePath) {
         LogError("Incorrect parameter");
         return -1;
     }
-    if (DoIoctl(cachePath, pinIoctlUnpinAll, nullptr, 0) < 0) {
-        LogError("Ioctl for unpin all cache blocks failed");
-        return -1;
-    }
-    return 0;
+    return DoIoctlOrSay("Ioctl for unpin all cache blocks failed", cachePath, pinIoctlUnpinAll,
+                        nullptr, 0, LogHere());
 }
 
 int UnpinAllBlocksByMouhtPath(const char *mountPath) {
@@ -25,30 +22,22 @@ int UnpinAllBlocksByMouhtPath(const char *mountPath) {
         LogError("Can't get the cache path of volume (%s)", mountPath);
         return -1;
     }
-    return UnpinAllBlocksByCachePath(cachePath.get()) == 0 ? 0 : -1;
+    return UnpinAllBlocksByCachePath(cachePath.get());
 }
 
 int UnpinAllBlocks(const ToolParameters *parameters) {
-    const char *mountPath = parameters->mountPath;
-    const char *cachePath = parameters->cachePath;
-    if (mountPath != nullptr) {
-        LogNotice("Start to unpin all blocks of volume (%s)", mountPath);
-        if (UnpinAllBlocksByMouhtPath(mountPath) < 0) {
-            LogError("Can't unpin all block of volume (%s)", mountPath);
-            return -1;
-        }
-        LogNotice("Unpin all blocks of volume (%s) finish", mountPath);
-        return 0;
+    const bool byVolume = parameters->mountPath != nullptr;
+    const char *kind = byVolume ? "volume" : "cache";
+    const char *path = byVolume ? parameters->mountPath : parameters->cachePath;
+    if (path == nullptr) {
+        LogError("One of --mount-path or --cache-path could be set");
+        return -1;
     }
-    if (cachePath != nullptr) {
-        LogNotice("Start to unpin all blocks of cache (%s)", cachePath);
-        if (UnpinAllBlocksByCachePath(cachePath) < 0) {
-            LogError("Can't unpin all block of cache (%s)", cachePath);
-            return -1;
-        }
-        LogNotice("Unpin all blocks of cache (%s) finish", cachePath);
-        return 0;
+    LogNotice("Start to unpin all blocks of %s (%s)", kind, path);
+    if ((byVolume ? UnpinAllBlocksByMouhtPath(path) : UnpinAllBlocksByCachePath(path)) < 0) {
+        LogError("Can't unpin all block of %s (%s)", kind, path);
+        return -1;
     }
-    LogError("One of --mount-path or --cache-path could be set");
-    return -1;
+    LogNotice("Unpin all blocks of %s (%s) finish", kind, path);
+    return 0;
 }

@@ -2,8 +2,7 @@
 
 #include "base/log.h"
 #include "base/malloc_text.h"
-#include "driver/device_ioctl.h"
-#include "driver/pin_interface.h"
+#include "driver/unpin_ranges.h"
 #include "space/space_cache.h"
 
 int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
@@ -15,9 +14,5 @@ int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors)
     }
     UnpinList list{};
     list.ranges[0] = {startSector, numSectors};
-    if (DoIoctl(cachePath.get(), pinIoctlUnpinRanges, &list, unpinListBytes) < 0) {
-        LogError("Send unpin inctl to driver failed");
-        return -1;
-    }
-    return 0;
+    return SendUnpinList(cachePath.get(), &list, LogHere());
 }

@@ -12,16 +12,13 @@ int BitmapSendToDriver(PinBitmap *bitmap, const char *cachePath) {
         LogError("Incorrect parameter");
         return -1;
     }
-    if (DoIoctl(cachePath, pinIoctlSetBitmap, bitmap, pinBitmapDescriptorBytes) < 0) {
-        LogError("Ioctl error");
-        return -1;
-    }
-    return 0;
+    return DoIoctlOrSay("Ioctl error", cachePath, pinIoctlSetBitmap, bitmap,
+                        pinBitmapDescriptorBytes, LogHere());
 }
 
 int BitmapIsSet(const char *cachePath, int *isSet) {
-    if (DoIoctl(cachePath, pinIoctlQueryBitmapSet, isSet, sizeof(*isSet)) < 0) {
-        LogError("Ioctl error");
+    if (DoIoctlOrSay("Ioctl error", cachePath, pinIoctlQueryBitmapSet, isSet, sizeof(*isSet),
+                     LogHere()) < 0) {
         return -1;
     }
     LogVerbose("Bitmap is set = %d", *isSet);
@@ -31,8 +28,8 @@ int BitmapIsSet(const char *cachePath, int *isSet) {
 int isAllBlocksUnpin(const char *cachePath, int *allUnpinned) {
     LogTraceScope();
     LogVerbose("Cache path = %s", cachePath);
-    if (DoIoctl(cachePath, pinIoctlQueryAllUnpinned, allUnpinned, sizeof(*allUnpinned)) != 0) {
-        LogError("Ioctl error");
+    if (DoIoctlOrSay("Ioctl error", cachePath, pinIoctlQueryAllUnpinned, allUnpinned,
+                     sizeof(*allUnpinned), LogHere()) < 0) {
         return -1;
     }
     LogVerbose("Is all block unpin = %d", *allUnpinned);

@@ -1,6 +1,5 @@
 #include "driver/device_ioctl.h"
 
-#include "base/log.h"
 #include "base/scoped_fd.h"
 
 #include <fcntl.h>
@@ -21,4 +20,13 @@ int DoIoctl(const char *devicePath, unsigned request, void *data, int size) {
         return -1;
     }
     return 0;
+}
+
+int DoIoctlOrSay(const char *failure, const char *devicePath, unsigned request, void *data,
+                 int size, const LogPlace &place) {
+    const int result = DoIoctl(devicePath, request, data, size);
+    if (result < 0) {
+        LogWrite(LogClass::Error, place, "%s", failure);
+    }
+    return result;
 }

@@ -2,9 +2,15 @@
 #ifndef DRIVER_DEVICE_IOCTL_H
 #define DRIVER_DEVICE_IOCTL_H
 
+#include "base/log.h"
+
 // Opens the device for reading and writing, issues the request (with no third argument when `data`
 // is null) and closes it. `size` (bytes of `data`) is for the error message only. 0 when the
 // request returned 0 or more, else -1 after an error message.
 int DoIoctl(const char *devicePath, unsigned request, void *data, int size);
+
+// The same for a caller whose own error message is `failure`.
+int DoIoctlOrSay(const char *failure, const char *devicePath, unsigned request, void *data,
+                 int size, const LogPlace &place);
 
 #endif

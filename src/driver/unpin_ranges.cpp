@@ -1,6 +1,5 @@
 #include "driver/unpin_ranges.h"
 
-#include "base/log.h"
 #include "driver/device_ioctl.h"
 
 #include <sys/types.h>
@@ -11,6 +10,11 @@ void DumpRanges(const UnpinInfo *ranges, size_t count) {
                   static_cast<ssize_t>(i), LogU64(ranges[i].startSector),
                   LogU64(ranges[i].numSectors));
     }
+}
+
+int SendUnpinList(const char *cachePath, UnpinList *list, const LogPlace &place) {
+    return DoIoctlOrSay("Send unpin inctl to driver failed", cachePath, pinIoctlUnpinRanges, list,
+                        unpinListBytes, place);
 }
 
 int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &ranges) {
@@ -34,8 +38,7 @@ int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &r
                        static_cast<ssize_t>(unpinListBytes));
             DumpRanges(list.ranges, count);
         }
-        if (DoIoctl(cachePath, pinIoctlUnpinRanges, &list, unpinListBytes) < 0) {
-            LogError("Send unpin inctl to driver failed");
+        if (SendUnpinList(cachePath, &list, LogHere()) < 0) {
             return -1;
         }
         list = UnpinList{};

@@ -4,6 +4,7 @@
 #ifndef DRIVER_UNPIN_RANGES_H
 #define DRIVER_UNPIN_RANGES_H
 
+#include "base/log.h"
 #include "driver/pin_interface.h"
 
 #include <cstddef>
@@ -11,6 +12,9 @@
 
 // Logs each range, at every level.
 void DumpRanges(const UnpinInfo *ranges, size_t count);
+
+// Sends one list. 0, or -1 after an error message at the caller's place.
+int SendUnpinList(const char *cachePath, UnpinList *list, const LogPlace &place);
 
 // Releases the ranges, 1024 to a request. The range whose turn comes when a full list is sent is
 // dropped: of 1025 ranges the last stays pinned, of 1026 the second list holds only the last. 0, or

@@ -132,3 +132,15 @@ TEST_F(DoIoctlTest, IsTracedAtLevel2) {
                                         "DoIoctl() [N] : ***** Open device path (/no/such) error",
                                         "", "DoIoctl() [N] : -----"}));
 }
+
+TEST_F(DoIoctlTest, CallersFailureIsLoggedAtItsPlaceBehindItsCause) {
+    int result = 5;
+    FakeLibc::onIoctl = [&result](unsigned long, void *) { return result; };
+    CapturedLog log(2);
+    EXPECT_EQ(DoIoctlOrSay("No answer", device.c_str(), 7, &data, 4, {"Caller", 1}), 0);
+    EXPECT_EQ(log.Count("Caller() [N] : ***** No answer"), 0);
+    result = -1;
+    EXPECT_EQ(DoIoctlOrSay("No answer", device.c_str(), 7, &data, 4, {"Caller", 1}), -1);
+    EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** No answer");
+    EXPECT_EQ(log.Count("DoIoctl() [N] : -----"), 2);
+}

@@ -147,3 +147,20 @@ TEST(DumpRanges, LogsEveryRangeAtEveryLevel) {
     EXPECT_EQ(marked.Messages(),
               Messages{"DumpRanges() [N] : Unpin range [0] start sector = 0 num sectors = 0"});
 }
+
+TEST_F(SendUnpinInfoToDriverTest, OneListIsSentAsItIs) {
+    UnpinList list{};
+    list.ranges[0] = Range(3);
+    CapturedLog log;
+    EXPECT_EQ(SendUnpinList(device, &list, {"Caller", 1}), 0);
+    ExpectSent({Request(3, 4)});
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(SendUnpinInfoToDriverTest, OneListThatIsRefusedFailsAtTheCallersPlace) {
+    refused = 1;
+    UnpinList list{};
+    CapturedLog log(2);
+    EXPECT_EQ(SendUnpinList(device, &list, {"Caller", 1}), -1);
+    EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Send unpin inctl to driver failed");
+}
