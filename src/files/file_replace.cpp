@@ -122,6 +122,18 @@ FileReplaceResult WriteInPlace(const char *path, const std::string &content) {
     return WriteAll(file.Get(), content) ? FileReplaceResult::Done : FileReplaceResult::NotWritten;
 }
 
+// By rename, or in place where the folder does not allow that.
+FileReplaceResult Replace(const char *path, const std::string &target, const struct stat *old,
+                          const std::string &content) {
+    switch (ReplaceByRename(target, old, content)) {
+    case Attempt::Done: return FileReplaceResult::Done;
+    case Attempt::NotCreated: return FileReplaceResult::CannotOpen;
+    case Attempt::NotWritten: return FileReplaceResult::NotWritten;
+    case Attempt::NotAllowed: break;
+    }
+    return WriteInPlace(path, content);
+}
+
 FileReplaceResult ReplaceExisting(const char *path, const struct stat &old,
                                   const std::string &content) {
     // Renaming asks only the folder; a file that may not be written must stay as it is all the
@@ -134,13 +146,7 @@ FileReplaceResult ReplaceExisting(const char *path, const struct stat &old,
         // A file without a name any more can only be written in place.
         return errno == ENOENT ? WriteInPlace(path, content) : FileReplaceResult::CannotOpen;
     }
-    switch (ReplaceByRename(target.get(), &old, content)) {
-    case Attempt::Done: return FileReplaceResult::Done;
-    case Attempt::NotCreated: return FileReplaceResult::CannotOpen;
-    case Attempt::NotWritten: return FileReplaceResult::NotWritten;
-    case Attempt::NotAllowed: break;
-    }
-    return WriteInPlace(path, content);
+    return Replace(path, target.get(), &old, content);
 }
 
 } // namespace
@@ -153,12 +159,7 @@ FileReplaceResult FileReplaceContent(const char *path, const std::string &conten
     }
     // Nothing there. A link that points nowhere is written through, which creates its target.
     if (errno == ENOENT && lstat(path, &status) < 0 && errno == ENOENT) {
-        switch (ReplaceByRename(path, nullptr, content)) {
-        case Attempt::Done: return FileReplaceResult::Done;
-        case Attempt::NotCreated: return FileReplaceResult::CannotOpen;
-        case Attempt::NotWritten: return FileReplaceResult::NotWritten;
-        case Attempt::NotAllowed: break;
-        }
+        return Replace(path, path, nullptr, content);
     }
     return WriteInPlace(path, content);
 }

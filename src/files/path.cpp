@@ -10,6 +10,15 @@ namespace {
 const mode_t fileBit = 0x8000;
 const mode_t directoryBit = 0x4000;
 
+int HasModeBit(const char *path, mode_t bit, const LogPlace &place) {
+    struct stat status {};
+    if (stat(path, &status) < 0) {
+        LogWrite(LogClass::Error, place, "Path (%s) doesn't exist", path);
+        return 0;
+    }
+    return (status.st_mode & bit) != 0 ? 1 : 0;
+}
+
 } // namespace
 
 int FileGetSizeByte(const char *path, uint64_t *sizeBytes) {
@@ -46,19 +55,9 @@ int PathIsMissing(const char *path) {
 }
 
 int PathIsFile(const char *path) {
-    struct stat status {};
-    if (stat(path, &status) < 0) {
-        LogError("Path (%s) doesn't exist", path);
-        return 0;
-    }
-    return (status.st_mode & fileBit) != 0 ? 1 : 0;
+    return HasModeBit(path, fileBit, LogHere());
 }
 
 int PathIsDir(const char *path) {
-    struct stat status {};
-    if (stat(path, &status) < 0) {
-        LogError("Path (%s) doesn't exist", path);
-        return 0;
-    }
-    return (status.st_mode & directoryBit) != 0 ? 1 : 0;
+    return HasModeBit(path, directoryBit, LogHere());
 }
