@@ -1,8 +1,5 @@
 #include "space/space.h"
 
-#include "base/log.h"
-#include "base/malloc_text.h"
-
 #include "vesk/storage_core.h"
 
 #include <cstring>
@@ -13,74 +10,87 @@ namespace {
 struct SpaceListDeleter {
     void operator()(VESKSpaceInfo *list) const { VESKSpaceInfoFree(list); }
 };
-using SpaceList = std::unique_ptr<VESKSpaceInfo, SpaceListDeleter>;
 
-// The library may set a list even when it fails; it is released either way.
-int EnumSpaces(SpaceList *spaces) {
+// Shows the spaces to `visit` until it answers something else than NoSpace, which is the result.
+template <typename Visit>
+SpaceCause Walk(const Visit &visit, SpaceCause *asked, const LogPlace &place) {
     VESKSpaceInfo *list = nullptr;
     const int result = VESKSpaceInfoEnum(1, &list);
-    spaces->reset(list);
-    return result < 0 ? -1 : 0;
+    // The library may set a list even when it fails; it is released either way.
+    const std::unique_ptr<VESKSpaceInfo, SpaceListDeleter> spaces(list);
+    if (result < 0) {
+        LogWrite(LogClass::Error, place, "Can't enum spaces");
+    }
+    SpaceCause cause = result < 0 ? SpaceCause::CannotEnumerate : SpaceCause::NoSpace;
+    for (; list != nullptr && cause == SpaceCause::NoSpace; list = list->next) {
+        cause = visit(*list);
+    }
+    SpaceTell(asked, cause);
+    return cause;
 }
 
 } // namespace
 
-char *SpaceGetReferencePath(const char *uuid) {
-    SpaceList spaces;
-    if (EnumSpaces(&spaces) < 0) {
-        LogError("Can't enum spaces");
-        return nullptr;
-    }
+char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause) {
+    const LogPlace place = LogHere();
     char *referencePath = nullptr;
-    for (const VESKSpaceInfo *space = spaces.get(); space != nullptr; space = space->next) {
-        const MallocText spaceUuid(VESKSpaceUUIDGet(space));
+    const auto visit = [uuid, &place, &referencePath](const VESKSpaceInfo &space) {
+        const MallocText spaceUuid(VESKSpaceUUIDGet(&space));
         if (!spaceUuid) {
-            LogError("Get space uuid failed");
-            continue;
+            LogWrite(LogClass::Error, place, "Get space uuid failed");
         }
-        if (strcmp(spaceUuid.get(), uuid) == 0) {
-            referencePath = strdup(space->referencePath);
-            break;
+        if (!spaceUuid || strcmp(spaceUuid.get(), uuid) != 0) {
+            return SpaceCause::NoSpace;
         }
+        referencePath = strdup(space.referencePath);
+        return SpaceCause::Found;
+    };
+    if (Walk(visit, cause, place) != SpaceCause::CannotEnumerate) {
+        LogVerbose("Get reference path = %s", referencePath);
     }
-    LogVerbose("Get reference path = %s", referencePath);
     return referencePath;
 }
 
-char *SpaceGetDevicePath(const char *referencePath) {
-    SpaceList spaces;
-    if (EnumSpaces(&spaces) < 0) {
-        LogError("Can't enum spaces");
-        return nullptr;
-    }
+char *SpaceGetDevicePath(const char *referencePath, SpaceCause *cause) {
+    const LogPlace place = LogHere();
     char *devicePath = nullptr;
-    for (const VESKSpaceInfo *space = spaces.get(); space != nullptr; space = space->next) {
-        if (space->referencePath[0] == '\0') {
-            LogError("Reference path should not be null");
-            return nullptr;
+    const auto visit = [referencePath, &place, &devicePath](const VESKSpaceInfo &space) {
+        if (space.referencePath[0] == '\0') {
+            LogWrite(LogClass::Error, place, "Reference path should not be null");
+            return SpaceCause::NoReferencePath;
         }
-        if (strcmp(space->referencePath, referencePath) == 0) {
-            devicePath = strdup(space->devicePath);
-            break;
+        if (strcmp(space.referencePath, referencePath) != 0) {
+            return SpaceCause::NoSpace;
         }
+        devicePath = strdup(space.devicePath);
+        return SpaceCause::Found;
+    };
+    const SpaceCause result = Walk(visit, cause, place);
+    if (result == SpaceCause::Found || result == SpaceCause::NoSpace) {
+        LogVerbose("Get device path = %s", devicePath);
     }
-    LogVerbose("Get device path = %s", devicePath);
     return devicePath;
 }
 
-char *SpaceGetUUID(const char *referencePath) {
-    SpaceList spaces;
-    if (EnumSpaces(&spaces) < 0) {
-        LogError("Can't enum spaces");
-        return nullptr;
-    }
+char *SpaceGetUUID(const char *referencePath, SpaceCause *cause) {
     char *uuid = nullptr;
-    for (const VESKSpaceInfo *space = spaces.get(); space != nullptr; space = space->next) {
-        if (strcmp(space->referencePath, referencePath) == 0) {
-            uuid = VESKSpaceUUIDGet(space);
-            break;
+    const auto visit = [referencePath, &uuid](const VESKSpaceInfo &space) {
+        if (strcmp(space.referencePath, referencePath) != 0) {
+            return SpaceCause::NoSpace;
         }
+        uuid = VESKSpaceUUIDGet(&space);
+        return uuid != nullptr ? SpaceCause::Found : SpaceCause::NoUuid;
+    };
+    if (Walk(visit, cause, LogHere()) != SpaceCause::CannotEnumerate) {
+        LogVerbose("Get UUID = %s", uuid);
     }
-    LogVerbose("Get UUID = %s", uuid);
     return uuid;
+}
+
+bool SpaceTake(char *text, MallocText *owner, const char *failure, const LogPlace &place) {
+    owner->reset(text);
+    if (text == nullptr) {
+        LogWrite(LogClass::Error, place, "%s", failure);
+    }
+    return text != nullptr;
 }

@@ -2,14 +2,45 @@
 //
 // A reference path is the mount path, the volume's top directory. Every lookup enumerates the
 // spaces afresh; nothing is kept between calls. A returned text is malloc'd for the caller (wrap it
-// in MallocText); null means not found or, after an error message, failure.
+// in MallocText); null means not found or, after an error message, failure. Whoever asks for a cause
+// is told why.
 //
 // Thread rule: no state; callable from any thread.
 #ifndef SPACE_SPACE_H
 #define SPACE_SPACE_H
 
-char *SpaceGetReferencePath(const char *uuid);
-char *SpaceGetDevicePath(const char *referencePath);
-char *SpaceGetUUID(const char *referencePath);
+#include "base/log.h"
+#include "base/malloc_text.h"
+
+// Why a look-up here or in space/space_cache.h has come to its answer.
+enum class SpaceCause {
+    Found, // a text is null all the same when memory has run out; of pin support: there is
+    CannotEnumerate,
+    NoSpace,         // no space has this UUID or reference path
+    NoUuid,          // the space is there, its UUID cannot be read
+    NoReferencePath, // a space without one stands before the one that was looked for
+    NoCache,         // the cache configuration does not know the space
+    NoCacheConfig,   // it cannot be read
+    NoSsdPath,       // it names no SSD
+    NoCachePath,     // the SSD is there, its cache device is not
+    NoCacheStatus,   // as long as a cache is being created, for instance
+    CacheNotUp,
+    NoPinSupport,
+};
+
+char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause = nullptr);
+char *SpaceGetDevicePath(const char *referencePath, SpaceCause *cause = nullptr);
+char *SpaceGetUUID(const char *referencePath, SpaceCause *cause = nullptr);
+
+// Tells the cause to a caller that has asked for it.
+inline void SpaceTell(SpaceCause *asked, SpaceCause cause) {
+    if (asked != nullptr) {
+        *asked = cause;
+    }
+}
+
+// Gives the text of a look-up to its owner. Whether there is one: where not, `failure` is logged as
+// an error at the caller's place.
+bool SpaceTake(char *text, MallocText *owner, const char *failure, const LogPlace &place);
 
 #endif

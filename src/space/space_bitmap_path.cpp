@@ -1,23 +1,19 @@
 #include "space/space_bitmap_path.h"
 
-#include "base/log.h"
-#include "base/malloc_text.h"
 #include "space/space.h"
 
 #include <cstdio>
 #include <cstring>
 
 char *SpaceGetBitmapPath(const char *uuid) {
-    const MallocText referencePath(SpaceGetReferencePath(uuid));
-    if (!referencePath) {
-        LogError("Can't get reference path");
-        return nullptr;
+    MallocText referencePath;
+    MallocText bitmapPath;
+    if (SpaceTake(SpaceGetReferencePath(uuid), &referencePath, "Can't get reference path",
+                  LogHere())) {
+        SpaceTake(BitmapGetPathByReferencePath(referencePath.get()), &bitmapPath,
+                  "Can't get bitmap path", LogHere());
     }
-    char *bitmapPath = BitmapGetPathByReferencePath(referencePath.get());
-    if (bitmapPath == nullptr) {
-        LogError("Can't get bitmap path");
-    }
-    return bitmapPath;
+    return bitmapPath.release();
 }
 
 char *BitmapGetPathByReferencePath(const char *referencePath) {

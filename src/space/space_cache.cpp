@@ -1,9 +1,5 @@
 #include "space/space_cache.h"
 
-#include "base/log.h"
-#include "base/malloc_text.h"
-#include "space/space.h"
-
 #include "vesk/flash_cache.h"
 
 #include <cstring>
@@ -26,7 +22,7 @@ using CacheStat = std::unique_ptr<VESKFlashCacheStat, StatDeleter>;
 
 } // namespace
 
-VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid) {
+VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid, SpaceCause *cause) {
     VESKFlashCacheConfigQuery query{};
     query.kind = configBySpaceUuid;
     query.spaceUuid = uuid;
@@ -37,11 +33,13 @@ VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid) {
     } else if (result == -1) {
         LogError("Fail to get SSD cache config");
     }
+    const SpaceCause missing = result == -1 ? SpaceCause::NoCacheConfig : SpaceCause::NoCache;
+    SpaceTell(cause, config != nullptr ? SpaceCause::Found : missing);
     return config;
 }
 
-int SpaceHasCache(const char *uuid) {
-    const CacheConfig config(SpaceGetCacheConfig(uuid));
+int SpaceHasCache(const char *uuid, SpaceCause *cause) {
+    const CacheConfig config(SpaceGetCacheConfig(uuid, cause));
     if (!config) {
         LogVerbose("Space (%s) doesn't be found in the config", uuid);
         return 0;
@@ -51,62 +49,65 @@ int SpaceHasCache(const char *uuid) {
     return 1;
 }
 
-char *SpaceGetCacheSsdPath(const char *uuid) {
-    const CacheConfig config(SpaceGetCacheConfig(uuid));
-    if (!config || config->ssdPath == nullptr) {
+char *SpaceGetCacheSsdPath(const char *uuid, SpaceCause *cause) {
+    const CacheConfig config(SpaceGetCacheConfig(uuid, cause));
+    if (!config) {
+        return nullptr;
+    }
+    if (config->ssdPath == nullptr) {
+        SpaceTell(cause, SpaceCause::NoSsdPath);
         return nullptr;
     }
     return strdup(config->ssdPath);
 }
 
-char *SpaceGetCachePath(const char *uuid) {
-    const MallocText ssdPath(SpaceGetCacheSsdPath(uuid));
-    if (!ssdPath) {
-        LogError("Can't get cache's ssd path");
+char *SpaceGetCachePath(const char *uuid, SpaceCause *cause) {
+    MallocText ssdPath;
+    if (!SpaceTake(SpaceGetCacheSsdPath(uuid, cause), &ssdPath, "Can't get cache's ssd path",
+                   LogHere())) {
         return nullptr;
     }
     char cachePath[512] = {};
     if (VESKFlashcacheGetCachePath(ssdPath.get(), cachePath, sizeof(cachePath)) != 1) {
         LogError("Can't get cache path");
+        SpaceTell(cause, SpaceCause::NoCachePath);
         return nullptr;
     }
     return strndup(cachePath, sizeof(cachePath) - 1);
 }
 
-char *SpaceGetCachePathByMountPath(const char *mountPath) {
-    const MallocText uuid(SpaceGetUUID(mountPath));
+char *SpaceGetCachePathByMountPath(const char *mountPath, SpaceCause *cause) {
+    const MallocText uuid(SpaceGetUUID(mountPath, cause));
     if (!uuid) {
         LogError("Can't get space uuid from reference path (%s)", mountPath);
         return nullptr;
     }
-    char *cachePath = SpaceGetCachePath(uuid.get());
-    if (cachePath == nullptr) {
-        LogError("Can't get cache path");
-    }
-    return cachePath;
+    MallocText cachePath;
+    SpaceTake(SpaceGetCachePath(uuid.get(), cause), &cachePath, "Can't get cache path", LogHere());
+    return cachePath.release();
 }
 
-int SpaceHasCacheAndSupportPin(const char *mountPath) {
-    const MallocText uuid(SpaceGetUUID(mountPath));
+int SpaceHasCacheAndSupportPin(const char *mountPath, SpaceCause *cause) {
+    const MallocText uuid(SpaceGetUUID(mountPath, cause));
     if (!uuid) {
         LogError("Can't get space uuid from mount path (%s)", mountPath);
         return 0;
     }
-    const int supportPin = SpaceHasCacheAndSupportPinByUUID(uuid.get());
+    const int supportPin = SpaceHasCacheAndSupportPinByUUID(uuid.get(), cause);
     if (supportPin == 1) {
         LogVerbose("Volume (%s) support pin", mountPath);
     }
     return supportPin;
 }
 
-int SpaceHasCacheAndSupportPinByUUID(const char *uuid) {
-    if (!SpaceHasCache(uuid)) {
+int SpaceHasCacheAndSupportPinByUUID(const char *uuid, SpaceCause *cause) {
+    if (!SpaceHasCache(uuid, cause)) {
         LogVerbose("Space (UUID = %s) doesn't has cache", uuid);
         return 0;
     }
-    const MallocText ssdPath(SpaceGetCacheSsdPath(uuid));
-    if (!ssdPath) {
-        LogError("Can't get cache's ssd path");
+    MallocText ssdPath;
+    if (!SpaceTake(SpaceGetCacheSsdPath(uuid, cause), &ssdPath, "Can't get cache's ssd path",
+                   LogHere())) {
         return 0;
     }
     VESKFlashCacheStatQuery query{};
@@ -119,8 +120,14 @@ int SpaceHasCacheAndSupportPinByUUID(const char *uuid) {
         LogVerbose(
             "Failed to get status of flashcache, ssd = %s. (Might be due to cache is not estabilied yet)",
             ssdPath.get());
+        SpaceTell(cause, SpaceCause::NoCacheStatus);
         return 0;
     }
     LogVerbose("supportPin=%d", stat->supportPin);
-    return stat->state == 1 && stat->supportPin == 1 ? 1 : 0;
+    const bool isUp = stat->state == 1;
+    const bool canPin = isUp && stat->supportPin == 1;
+    if (!canPin) {
+        SpaceTell(cause, isUp ? SpaceCause::NoPinSupport : SpaceCause::CacheNotUp);
+    }
+    return canPin ? 1 : 0;
 }

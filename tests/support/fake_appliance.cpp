@@ -43,7 +43,7 @@ void FakeAppliance::Reset() {
 void FakeApplianceOneVolume(const std::string &cachePath, const std::string &mountPath) {
     FakeAppliance::Reset();
     FakeAppliance::spaces = {{"/dev/space1", mountPath, "uuid-1"}};
-    FakeAppliance::caches = {{"uuid-1", "/dev/ssd1", cachePath, 1, 1, 1, 1}};
+    FakeAppliance::caches = {{"uuid-1", "/dev/ssd1", cachePath}};
 }
 
 FileMappingEntry FakeExtent(uint64_t fileStart, uint64_t count, uint64_t deviceStart,
@@ -153,7 +153,8 @@ int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,
     }
     for (const FakeCache &cache : FakeAppliance::caches) {
         if (cache.spaceUuid == query->spaceUuid) {
-            *config = new VESKFlashCacheConfig{0, strdup(cache.ssdPath.c_str())};
+            *config = new VESKFlashCacheConfig{0, cache.noSsdPath ? nullptr
+                                                                  : strdup(cache.ssdPath.c_str())};
             ++FakeAppliance::liveConfigs;
             return FakeAppliance::configResult;
         }

@@ -25,6 +25,7 @@ struct FakeCache {
     int supportPin = 1;
     int statResult = 1;      // of VESKFlashCacheStatGet
     int cachePathResult = 1; // of VESKFlashcacheGetCachePath
+    bool noSsdPath = false;  // the configuration has none
 };
 
 struct FakeAppliance {

@@ -245,3 +245,74 @@ TEST_F(SpaceCacheTest, CacheThatVanishesWhileItIsAskedForIsAnErrorAndHasNoPinSup
     EXPECT_EQ(SpaceHasCacheAndSupportPinByUUID("uuid-1"), 0);
     EXPECT_EQ(log.Text(), "tool: Can't get cache's ssd path\n");
 }
+
+namespace {
+
+SpaceCause CauseOfCachePath(const char *mountPath = "/volume1") {
+    SpaceCause cause = SpaceCause::NoPinSupport;
+    const bool found = Text(SpaceGetCachePathByMountPath(mountPath, &cause)) != "(none)";
+    EXPECT_EQ(found, cause == SpaceCause::Found);
+    return cause;
+}
+
+SpaceCause CauseOfPinSupport(const char *mountPath = "/volume1") {
+    SpaceCause cause = SpaceCause::NoCachePath;
+    const int supportPin = SpaceHasCacheAndSupportPin(mountPath, &cause);
+    EXPECT_EQ(supportPin, cause == SpaceCause::Found ? 1 : 0);
+    return cause;
+}
+
+} // namespace
+
+TEST_F(SpaceCacheTest, LookUpsTellTheCauseOfTheStepThatDecided) {
+    CapturedLog log;
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::Found);
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::Found);
+    EXPECT_EQ(CauseOfCachePath("/volume9"), SpaceCause::NoSpace);
+    EXPECT_EQ(CauseOfPinSupport("/volume9"), SpaceCause::NoSpace);
+    FakeAppliance::spaces[0].uuid = "";
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::NoUuid);
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::NoUuid);
+    FakeAppliance::enumResult = -1;
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::CannotEnumerate);
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::CannotEnumerate);
+}
+
+TEST_F(SpaceCacheTest, LookUpsTellWhatTheCacheLacks) {
+    CapturedLog log;
+    Cache().cachePathResult = 0;
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::NoCachePath);
+    Cache().supportPin = 0;
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::NoPinSupport);
+    Cache().state = 0;
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::CacheNotUp);
+    Cache().statResult = 0;
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::NoCacheStatus);
+    Cache().noSsdPath = true;
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::NoSsdPath);
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::NoSsdPath);
+    FakeAppliance::configResult = -1;
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::NoCacheConfig);
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::NoCacheConfig);
+    FakeAppliance::configResult = 1;
+    FakeAppliance::caches.clear();
+    EXPECT_EQ(CauseOfCachePath(), SpaceCause::NoCache);
+    EXPECT_EQ(CauseOfPinSupport(), SpaceCause::NoCache);
+}
+
+TEST_F(SpaceCacheTest, EveryLookUpByUuidTellsItsCause) {
+    CapturedLog log;
+    SpaceCause cause = SpaceCause::NoSpace;
+    EXPECT_EQ(SpaceGetCacheConfig("uuid-9", &cause), nullptr);
+    EXPECT_EQ(cause, SpaceCause::NoCache);
+    EXPECT_EQ(SpaceHasCache("uuid-1", &cause), 1);
+    EXPECT_EQ(cause, SpaceCause::Found);
+    EXPECT_EQ(SpaceHasCache("uuid-9", &cause), 0);
+    EXPECT_EQ(cause, SpaceCause::NoCache);
+    EXPECT_EQ(Text(SpaceGetCacheSsdPath("uuid-1", &cause)), "/dev/ssd1");
+    EXPECT_EQ(cause, SpaceCause::Found);
+    EXPECT_EQ(Text(SpaceGetCachePath("uuid-9", &cause)), "(none)");
+    EXPECT_EQ(cause, SpaceCause::NoCache);
+    EXPECT_EQ(SpaceHasCacheAndSupportPinByUUID("uuid-1", &cause), 1);
+    EXPECT_EQ(cause, SpaceCause::Found);
+}

@@ -4,6 +4,7 @@
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
 
+#include <cstring>
 #include <gtest/gtest.h>
 
 namespace {
@@ -158,4 +159,56 @@ TEST_F(SpaceTest, ResultsAreToldAtLevel2) {
                                   "SpaceGetReferencePath() [N]: Get reference path = (null)",
                                   "SpaceGetDevicePath() [N]: Get device path = (null)",
                                   "SpaceGetUUID() [N]: Get UUID = (null)"}));
+}
+
+TEST_F(SpaceTest, EveryLookupTellsItsCause) {
+    CapturedLog log;
+    SpaceCause cause = SpaceCause::NoPinSupport;
+    Taken(SpaceGetReferencePath("uuid-2", &cause));
+    EXPECT_EQ(cause, SpaceCause::Found);
+    Taken(SpaceGetReferencePath("uuid-3", &cause));
+    EXPECT_EQ(cause, SpaceCause::NoSpace);
+    Taken(SpaceGetDevicePath("/volume2", &cause));
+    EXPECT_EQ(cause, SpaceCause::Found);
+    Taken(SpaceGetDevicePath("/volume3", &cause));
+    EXPECT_EQ(cause, SpaceCause::NoSpace);
+    Taken(SpaceGetUUID("/volume2", &cause));
+    EXPECT_EQ(cause, SpaceCause::Found);
+    Taken(SpaceGetUUID("/volume3", &cause));
+    EXPECT_EQ(cause, SpaceCause::NoSpace);
+    EXPECT_EQ(log.Text(), "");
+}
+
+TEST_F(SpaceTest, CauseOfAFailureIsToldBesideItsMessage) {
+    CapturedLog log;
+    SpaceCause cause = SpaceCause::Found;
+    FakeAppliance::spaces[0].uuid = "";
+    FakeAppliance::spaces[1].referencePath = "";
+    EXPECT_EQ(Taken(SpaceGetUUID("/volume1", &cause)), none);
+    EXPECT_EQ(cause, SpaceCause::NoUuid);
+    EXPECT_EQ(Taken(SpaceGetReferencePath("uuid-1", &cause)), none);
+    EXPECT_EQ(cause, SpaceCause::NoSpace);
+    EXPECT_EQ(Taken(SpaceGetDevicePath("/volume2", &cause)), none);
+    EXPECT_EQ(cause, SpaceCause::NoReferencePath);
+    FakeAppliance::enumResult = -1;
+    for (const auto &lookUp : {SpaceGetReferencePath, SpaceGetDevicePath, SpaceGetUUID}) {
+        cause = SpaceCause::Found;
+        EXPECT_EQ(Taken(lookUp("/volume2", &cause)), none);
+        EXPECT_EQ(cause, SpaceCause::CannotEnumerate);
+    }
+    EXPECT_EQ(log.Text(), "tool: Get space uuid failed\n"
+                          "tool: Reference path should not be null\n"
+                          "tool: Can't enum spaces\ntool: Can't enum spaces\n"
+                          "tool: Can't enum spaces\n");
+}
+
+TEST_F(SpaceTest, TakenTextHasAnOwnerAndAMissingOneAMessageAtTheCallersPlace) {
+    CapturedLog log(2);
+    MallocText owner;
+    EXPECT_TRUE(SpaceTake(strdup("text"), &owner, "No text", {"Caller", 1}));
+    EXPECT_STREQ(owner.get(), "text");
+    EXPECT_EQ(log.Text(), "");
+    EXPECT_FALSE(SpaceTake(nullptr, &owner, "No text", {"Caller", 1}));
+    EXPECT_EQ(owner, nullptr);
+    EXPECT_EQ(log.Messages(), std::vector<std::string>{"Caller() [N] : ***** No text"});
 }
