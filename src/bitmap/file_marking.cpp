@@ -12,6 +12,24 @@ const bool timeExtentLookup = false;
 
 using Clock = std::chrono::steady_clock;
 
+// Sets the file's blocks or, with a list of ranges, clears them and appends the extents to it.
+void Apply(const FileMappingTable &table, const std::string &filePath, PinBitmap *bitmap,
+           std::vector<UnpinInfo> *cleared, const LogPlace &place) {
+    for (const FileMappingEntry &entry : table.entries) {
+        if (LogLevel > 2) {
+            LogWrite(LogClass::Debug, place,
+                     "File [%s] start sector=%llu num_sector=%llu device_start sector =%llu\n",
+                     filePath.c_str(), LogU64(entry.fileStartSector), LogU64(entry.numSectors),
+                     LogU64(entry.deviceStartSector));
+        }
+        if (cleared != nullptr) {
+            cleared->push_back({entry.deviceStartSector, entry.numSectors});
+        }
+        BitmapOperation(bitmap, entry.deviceStartSector, entry.numSectors,
+                        cleared == nullptr ? 1 : 0);
+    }
+}
+
 } // namespace
 
 int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &filePath,
@@ -31,12 +49,7 @@ int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &f
                    GetTimeString());
         LogVerbose("Spend %f seconds", std::chrono::duration<double>(Clock::now() - start).count());
     }
-    for (const FileMappingEntry &entry : table.entries) {
-        LogDebug("File [%s] start sector=%llu num_sector=%llu device_start sector =%llu\n",
-                 filePath.c_str(), LogU64(entry.fileStartSector), LogU64(entry.numSectors),
-                 LogU64(entry.deviceStartSector));
-        BitmapSetRange(bitmap, entry.deviceStartSector, entry.numSectors);
-    }
+    Apply(table, filePath, bitmap, nullptr, LogHere());
     *tableOut = table;
     LogVerbose("Add file (%s) finish", filePath.c_str());
     return 0;
@@ -50,12 +63,6 @@ int UnsetBitmapAndAppendUnpinInfos(const char * /*cachePath*/, PinBitmap *bitmap
         LogError("Get mapping table of file (%s) failed", filePath.c_str());
         return -1;
     }
-    for (const FileMappingEntry &entry : table.entries) {
-        LogDebug("File [%s] start sector=%llu num_sector=%llu device_start sector =%llu\n",
-                 filePath.c_str(), LogU64(entry.fileStartSector), LogU64(entry.numSectors),
-                 LogU64(entry.deviceStartSector));
-        infos->push_back({entry.deviceStartSector, entry.numSectors});
-        BitmapUnsetRange(bitmap, entry.deviceStartSector, entry.numSectors);
-    }
+    Apply(table, filePath, bitmap, infos, LogHere());
     return 0;
 }

@@ -1,10 +1,10 @@
 #include "bitmap/space_bitmap.h"
 
-#include "base/log.h"
-#include "base/malloc_text.h"
 #include "bitmap/bitmap_file.h"
+#include "driver/bitmap_control.h"
 #include "driver/device.h"
 #include "files/path.h"
+#include "space/space.h"
 #include "space/space_bitmap_path.h"
 #include "space/space_cache.h"
 
@@ -33,14 +33,11 @@ int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes) {
 
 int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool *sizeChanged) {
     *sizeChanged = false;
-    const MallocText bitmapPath(SpaceGetBitmapPath(spaceUUID));
-    if (!bitmapPath) {
-        LogError("Can't get bitmap path");
-        return -1;
-    }
-    const MallocText cachePath(SpaceGetCachePath(spaceUUID));
-    if (!cachePath) {
-        LogError("Can't get cache path");
+    MallocText bitmapPath;
+    MallocText cachePath;
+    if (!SpaceTake(SpaceGetBitmapPath(spaceUUID), &bitmapPath, "Can't get bitmap path",
+                   LogHere()) ||
+        !SpaceTake(SpaceGetCachePath(spaceUUID), &cachePath, "Can't get cache path", LogHere())) {
         return -1;
     }
     auto *record = static_cast<PinBitmap *>(calloc(1, sizeof(PinBitmap)));
@@ -87,6 +84,40 @@ int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool 
     if (BitmapInitByFile(bitmapPath.get(), record) < 0) {
         LogError("Read bitmap file to bitmap memory error");
         ReleaseBitmap(bitmap);
+        return -1;
+    }
+    return 0;
+}
+
+int VolumeBitmapLoad(VolumeBitmap *volume, const LogPlace &place) {
+    PinBitmap *loaded = nullptr;
+    const int result =
+        BitmapAllocateAndInitialize(volume->uuid.get(), &loaded, &volume->sizeChanged);
+    volume->bitmap.reset(loaded);
+    if (result < 0) {
+        LogWrite(LogClass::Error, place, "Allocate bitmap failed");
+    }
+    return result;
+}
+
+int VolumeBitmapOpen(const char *mountPath, VolumeBitmap *volume, const LogPlace &place) {
+    const bool found =
+        SpaceTake(SpaceGetUUID(mountPath), &volume->uuid, "Can't get space uuid", place) &&
+        SpaceTake(SpaceGetCachePath(volume->uuid.get()), &volume->cachePath, "Can't get cache path",
+                  place) &&
+        SpaceTake(SpaceGetBitmapPath(volume->uuid.get()), &volume->bitmapPath,
+                  "Can't get bitmap path", place);
+    return found ? VolumeBitmapLoad(volume, place) : -1;
+}
+
+int BitmapWriteAndSend(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
+                       const LogPlace &place) {
+    if (bitmapPath != nullptr && BitmapWriteToFile(bitmap, bitmapPath) < 0) {
+        LogWrite(LogClass::Error, place, "Write bitmap failed");
+        return -1;
+    }
+    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
+        LogWrite(LogClass::Error, place, "Can't send bitmap to driver");
         return -1;
     }
     return 0;

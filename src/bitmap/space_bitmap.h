@@ -5,6 +5,8 @@
 #ifndef BITMAP_SPACE_BITMAP_H
 #define BITMAP_SPACE_BITMAP_H
 
+#include "base/log.h"
+#include "base/malloc_text.h"
 #include "bitmap/pin_bitmap.h"
 
 #include <cstdint>
@@ -20,10 +22,29 @@ int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes);
 // it, on failure too, the caller releases with BitmapFree. Nothing is written.
 int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool *sizeChanged);
 
-// Holds a bitmap for the length of a one-shot command.
+// Holds a bitmap until its scope ends.
 struct BitmapDeleter {
     void operator()(PinBitmap *bitmap) const { BitmapFree(bitmap); }
 };
 using BitmapHolder = std::unique_ptr<PinBitmap, BitmapDeleter>;
+
+// A volume's bitmap and what it is looked up by; null what has not been found.
+struct VolumeBitmap {
+    MallocText uuid; // the space's
+    MallocText cachePath;
+    MallocText bitmapPath;
+    BitmapHolder bitmap; // also what a failed load has left
+    bool sizeChanged = false;
+};
+
+// The load alone, by `uuid`, and all the look-ups with it. 0, or -1 after an error message at the
+// caller's place.
+int VolumeBitmapLoad(VolumeBitmap *volume, const LogPlace &place);
+int VolumeBitmapOpen(const char *mountPath, VolumeBitmap *volume, const LogPlace &place);
+
+// Writes the bitmap's file, unless its path is null, and hands the bitmap to the driver. 0, or -1
+// after an error message at the caller's place.
+int BitmapWriteAndSend(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
+                       const LogPlace &place);
 
 #endif

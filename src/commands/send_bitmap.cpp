@@ -1,8 +1,6 @@
 #include "commands/send_bitmap.h"
 
 #include "base/log.h"
-#include "base/malloc_text.h"
-#include "bitmap/bitmap_file.h"
 #include "bitmap/space_bitmap.h"
 #include "driver/bitmap_control.h"
 #include "files/path.h"
@@ -15,18 +13,19 @@ int SendBitmap(const char *mountPath) {
         LogError("Volume (%s) doesn't support pin", mountPath);
         return -1;
     }
-    const MallocText uuid(SpaceGetUUID(mountPath));
-    if (!uuid) {
+    VolumeBitmap volume;
+    volume.uuid.reset(SpaceGetUUID(mountPath));
+    if (!volume.uuid) {
         LogError("Can't get space uuid from reference path (%s)", mountPath);
         return -1;
     }
-    const MallocText cachePath(SpaceGetCachePath(uuid.get()));
-    if (!cachePath) {
-        LogError("Can't get cache path");
+    const char *uuid = volume.uuid.get();
+    if (!SpaceTake(SpaceGetCachePath(uuid), &volume.cachePath, "Can't get cache path", LogHere())) {
         return -1;
     }
+    const char *cachePath = volume.cachePath.get();
     int isSet = 0;
-    if (BitmapIsSet(cachePath.get(), &isSet) < 0) {
+    if (BitmapIsSet(cachePath, &isSet) < 0) {
         LogError("Can't get cache's bitmap status");
         return -1;
     }
@@ -34,30 +33,18 @@ int SendBitmap(const char *mountPath) {
         LogNotice("Bitmap is already set");
         return 0;
     }
-    const MallocText bitmapPath(SpaceGetBitmapPath(uuid.get()));
-    if (!bitmapPath) {
-        LogError("Can't get bitmap path");
+    if (!SpaceTake(SpaceGetBitmapPath(uuid), &volume.bitmapPath, "Can't get bitmap path",
+                   LogHere())) {
         return -1;
     }
-    if (!PathExists(bitmapPath.get())) {
-        LogNotice("Bitmap file (%s) doesn't exist. No need to update to driver", bitmapPath.get());
+    const char *bitmapPath = volume.bitmapPath.get();
+    if (!PathExists(bitmapPath)) {
+        LogNotice("Bitmap file (%s) doesn't exist. No need to update to driver", bitmapPath);
         return 0;
     }
-    PinBitmap *loaded = nullptr;
-    bool sizeChanged = false;
-    const int loadResult = BitmapAllocateAndInitialize(uuid.get(), &loaded, &sizeChanged);
-    const BitmapHolder bitmap(loaded);
-    if (loadResult < 0) {
-        LogError("Allocate bitmap failed");
+    if (VolumeBitmapLoad(&volume, LogHere()) < 0) {
         return -1;
     }
-    if (sizeChanged && BitmapWriteToFile(bitmap.get(), bitmapPath.get()) < 0) {
-        LogError("Write bitmap failed");
-        return -1;
-    }
-    if (BitmapSendToDriver(bitmap.get(), cachePath.get()) < 0) {
-        LogError("Can't send bitmap to driver");
-        return -1;
-    }
-    return 0;
+    return BitmapWriteAndSend(volume.bitmap.get(), volume.sizeChanged ? bitmapPath : nullptr,
+                              cachePath, LogHere());
 }

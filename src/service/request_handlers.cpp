@@ -1,16 +1,10 @@
 #include "service/request_handlers.h"
 
 #include "base/log.h"
-#include "base/malloc_text.h"
-#include "bitmap/bitmap_file.h"
 #include "bitmap/file_marking.h"
 #include "bitmap/space_bitmap.h"
-#include "driver/bitmap_control.h"
 #include "driver/unpin_ranges.h"
 #include "request/request_type.h"
-#include "space/space.h"
-#include "space/space_bitmap_path.h"
-#include "space/space_cache.h"
 #include "warming/reload_blocks.h"
 #include "warming/warm_files.h"
 
@@ -26,58 +20,28 @@ std::string FullPath(const char *mountPath, const FileInfo &file) {
     return std::string(mountPath) + "/" + file.szRelativePath;
 }
 
-// What the load leaves, also where it fails, belongs to the holder.
-int LoadBitmap(const char *uuid, BitmapHolder *bitmap, bool *sizeChanged) {
-    PinBitmap *loaded = nullptr;
-    const int result = BitmapAllocateAndInitialize(uuid, &loaded, sizeChanged);
-    bitmap->reset(loaded);
-    return result;
-}
-
-bool WriteAndSendBitmap(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
-                        const LogPlace &place) {
-    if (BitmapWriteToFile(bitmap, bitmapPath) < 0) {
-        LogWrite(LogClass::Error, place, "Write bitmap failed");
-        return false;
-    }
-    if (BitmapSendToDriver(bitmap, cachePath) < 0) {
-        LogWrite(LogClass::Error, place, "Can't send bitmap to driver");
-        return false;
-    }
-    return true;
-}
-
 } // namespace
 
 WorkResult HandleRequest(const RequestRecord *record) {
     WorkResult result = WorkResult::Failed;
-    BitmapHolder bitmap;
-    bool sizeChanged = false;
-    MallocText uuid;
-    MallocText cachePath;
-    MallocText bitmapPath;
+    VolumeBitmap volume;
     std::vector<FileInfo> files;
 
     if (!IsHandledType(record->type)) {
         LogError("Get unhandle request (%s)", RequestTypeForLog(record->type));
-    } else if (uuid.reset(SpaceGetUUID(record->mountPath)); !uuid) {
-        LogError("Can't get space uuid");
-    } else if (cachePath.reset(SpaceGetCachePath(uuid.get())); !cachePath) {
-        LogError("Can't get cache path");
-    } else if (bitmapPath.reset(SpaceGetBitmapPath(uuid.get())); !bitmapPath) {
-        LogError("Can't get bitmap path");
-    } else if (LoadBitmap(uuid.get(), &bitmap, &sizeChanged) < 0) {
-        LogError("Allocate bitmap failed");
+    } else if (VolumeBitmapOpen(record->mountPath, &volume, LogHere()) < 0) {
+        // It has said what is missing.
     } else if (record->type == requestReloadPinBlocks) {
-        result = ReloadPinBlocksToCache(bitmap.get(), cachePath.get(), record->mountPath);
+        result =
+            ReloadPinBlocksToCache(volume.bitmap.get(), volume.cachePath.get(), record->mountPath);
     } else if (RequestDataGetFileInfos(record->data, &files) < 0) {
         LogError("Can't parse file inodes from request's data (%s)", record->data);
     } else if (record->type == requestPinFiles) {
-        result = HandlePinRequest(files, bitmap.get(), record->mountPath, cachePath.get(),
-                                  bitmapPath.get());
+        result = HandlePinRequest(files, volume.bitmap.get(), record->mountPath,
+                                  volume.cachePath.get(), volume.bitmapPath.get());
     } else {
-        result = HandleUnpinRequest(files, bitmap.get(), record->mountPath, cachePath.get(),
-                                    bitmapPath.get());
+        result = HandleUnpinRequest(files, volume.bitmap.get(), record->mountPath,
+                                    volume.cachePath.get(), volume.bitmapPath.get());
     }
 
     if (result == WorkResult::Failed) {
@@ -87,7 +51,7 @@ WorkResult HandleRequest(const RequestRecord *record) {
     }
     // Also where there is none: its message then tells that the request ended before the bitmap was
     // loaded.
-    BitmapFree(bitmap.release());
+    BitmapFree(volume.bitmap.release());
     return result;
 }
 
@@ -108,7 +72,7 @@ WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitma
         }
         filesToWarm.push_back({path, table});
     }
-    if (!WriteAndSendBitmap(bitmap, bitmapPath, cachePath, LogHere())) {
+    if (BitmapWriteAndSend(bitmap, bitmapPath, cachePath, LogHere()) < 0) {
         return WorkResult::Failed;
     }
     return ReadFilesToCache(mountPath, filesToWarm);
@@ -127,7 +91,7 @@ WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bit
     }
     // The bitmap goes first: were the ranges released before it, a read in between could pin them
     // again by the old one.
-    if (!WriteAndSendBitmap(bitmap, bitmapPath, cachePath, LogHere())) {
+    if (BitmapWriteAndSend(bitmap, bitmapPath, cachePath, LogHere()) < 0) {
         return WorkResult::Failed;
     }
     if (SendUnpinInfoToDriver(cachePath, infos) < 0) {

@@ -266,3 +266,57 @@ TEST_F(SpaceBitmapTest, HolderReleasesTheBitmap) {
     { const BitmapHolder none; }
     EXPECT_EQ(log.Text(), "");
 }
+
+TEST_F(SpaceBitmapTest, VolumeIsOpenedWithAllThatBelongsToIt) {
+    WriteWhole(path, std::string(60, '\x5A'));
+    VolumeBitmap volume;
+    CapturedLog log;
+    ASSERT_EQ(VolumeBitmapOpen(folder.Path().c_str(), &volume, {"Caller", 1}), 0);
+    EXPECT_STREQ(volume.uuid.get(), "uuid-1");
+    EXPECT_STREQ(volume.cachePath.get(), "/dev/null");
+    EXPECT_EQ(volume.bitmapPath.get(), path);
+    EXPECT_EQ(volume.bitmap->size, 100U);
+    EXPECT_EQ(volume.bitmap->data[59], 0x5A);
+    EXPECT_TRUE(volume.sizeChanged);
+    EXPECT_EQ(log.Messages(), Messages{"Bitmap size changed. Could be due to volume expansion"});
+}
+
+TEST_F(SpaceBitmapTest, VolumeNamesTheStepThatFailedAtTheCallersPlace) {
+    const auto lastMessage = [this](bool loaded) {
+        VolumeBitmap opened;
+        CapturedLog log(2);
+        EXPECT_EQ(VolumeBitmapOpen(folder.Path().c_str(), &opened, {"Caller", 1}), -1);
+        EXPECT_EQ(opened.bitmap != nullptr, loaded);
+        const std::string message = log.Messages().back();
+        CapturedLog release;
+        opened.bitmap.reset();
+        EXPECT_EQ(release.Text(), loaded ? "tool: Warning: data is NULL for free\n" : "");
+        return message;
+    };
+    RefuseDeviceSize();
+    EXPECT_EQ(lastMessage(true), "Caller() [N] : ***** Allocate bitmap failed");
+    FakeAppliance::caches[0].cachePathResult = 0;
+    EXPECT_EQ(lastMessage(false), "Caller() [N] : ***** Can't get cache path");
+    FakeAppliance::spaces[0].uuid = "";
+    EXPECT_EQ(lastMessage(false), "Caller() [N] : ***** Can't get space uuid");
+}
+
+TEST_F(SpaceBitmapTest, BitmapIsWrittenUnlessThereIsNoPathAndSent) {
+    ASSERT_EQ(Load(0), Messages{});
+    memset(bitmap->data, 0x81, bitmap->size);
+    int sent = 0;
+    FakeLibc::onIoctl = [&sent](unsigned long, void *) { return ++sent > 2 ? -1 : 0; };
+    CapturedLog log(2);
+    EXPECT_EQ(BitmapWriteAndSend(bitmap, nullptr, "/dev/null", {"Caller", 1}), 0);
+    struct stat status {};
+    EXPECT_EQ(lstat(path.c_str(), &status), -1);
+    EXPECT_EQ(sent, 1);
+    EXPECT_EQ(BitmapWriteAndSend(bitmap, path.c_str(), "/dev/null", {"Caller", 1}), 0);
+    EXPECT_EQ(ReadWhole(path), std::string(100, '\x81'));
+    EXPECT_EQ(sent, 2);
+    EXPECT_EQ(BitmapWriteAndSend(bitmap, path.c_str(), "/dev/null", {"Caller", 1}), -1);
+    EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Can't send bitmap to driver");
+    EXPECT_EQ(BitmapWriteAndSend(bitmap, "/no/such", "/dev/null", {"Caller", 1}), -1);
+    EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Write bitmap failed");
+    EXPECT_EQ(sent, 3);
+}
