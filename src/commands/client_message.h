@@ -3,16 +3,11 @@
 #ifndef COMMANDS_CLIENT_MESSAGE_H
 #define COMMANDS_CLIENT_MESSAGE_H
 
-#include "request/message.h"
+#include "base/log.h"
 
-#include <cstring>
-
-// Copies text into a field of the message; a text that fills the field has no NUL there.
-template <size_t size> void CopyToField(char (&field)[size], const char *text) {
-    memcpy(field, text, strnlen(text, size));
-}
-
-// A message of this type for the volume, without data.
-RequestMessage BuildMessage(int requestType, const char *mountPath);
+// Sends a request of this type for the volume, with `files` as its data unless null. A text that
+// fills its field has no NUL there. 0, or -1 after an error message at the caller's place.
+int SendRequest(int queueId, int requestType, const char *mountPath, const char *files,
+                const LogPlace &place);
 
 #endif

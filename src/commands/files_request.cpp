@@ -34,15 +34,8 @@ int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) 
         return -1;
     }
     LogVerbose("Server mesage queue id = %d", queueId);
-    RequestMessage message = BuildMessage(requestType, parameters->mountPath);
-    if (IsFilesRequest(requestType)) {
-        CopyToField(message.record.data, parameters->files);
-    }
-    if (MsgQueueSend(queueId, &message, requestMessageBytes) == -1) {
-        LogError("Send message failed: %s", strerror(errno));
-        return -1;
-    }
-    return 0;
+    const char *files = IsFilesRequest(requestType) ? parameters->files : nullptr;
+    return SendRequest(queueId, requestType, parameters->mountPath, files, LogHere());
 }
 
 int PinFilesRequest(const ToolParameters *parameters) {

@@ -29,12 +29,7 @@ int SetSpaceStateRequest(const char *mountPath, int requestType) {
         return -1;
     }
     LogVerbose("Get server message queue id = %d", queueId);
-    const RequestMessage message = BuildMessage(requestType, mountPath);
-    if (MsgQueueSend(queueId, &message, requestMessageBytes) == -1) {
-        LogError("Send message failed: %s", strerror(errno));
-        return -1;
-    }
-    return 0;
+    return SendRequest(queueId, requestType, mountPath, nullptr, LogHere());
 }
 
 int AddPendingSpaceRequest(const char *mountPath) {
