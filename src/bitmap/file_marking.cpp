@@ -13,20 +13,19 @@ const bool timeExtentLookup = false;
 using Clock = std::chrono::steady_clock;
 
 // Sets the file's blocks or, with a list of ranges, clears them and appends the extents to it.
-void Apply(const FileMappingTable &table, const std::string &filePath, PinBitmap *bitmap,
-           std::vector<UnpinInfo> *cleared, const LogPlace &place) {
+void ApplyExtents(const FileMappingTable &table, const std::string &filePath, PinBitmap *bitmap,
+                  std::vector<UnpinInfo> *cleared, const LogPlace &place) {
     for (const FileMappingEntry &entry : table.entries) {
-        if (LogLevel > 2) {
-            LogWrite(LogClass::Debug, place,
-                     "File [%s] start sector=%llu num_sector=%llu device_start sector =%llu\n",
-                     filePath.c_str(), LogU64(entry.fileStartSector), LogU64(entry.numSectors),
-                     LogU64(entry.deviceStartSector));
-        }
-        if (cleared != nullptr) {
+        LogWrite(LogClass::Debug, place,
+                 "File [%s] start sector=%llu num_sector=%llu device_start sector =%llu\n",
+                 filePath.c_str(), LogU64(entry.fileStartSector), LogU64(entry.numSectors),
+                 LogU64(entry.deviceStartSector));
+        if (cleared == nullptr) {
+            BitmapSetRange(bitmap, entry.deviceStartSector, entry.numSectors);
+        } else {
             cleared->push_back({entry.deviceStartSector, entry.numSectors});
+            BitmapUnsetRange(bitmap, entry.deviceStartSector, entry.numSectors);
         }
-        BitmapOperation(bitmap, entry.deviceStartSector, entry.numSectors,
-                        cleared == nullptr ? 1 : 0);
     }
 }
 
@@ -49,7 +48,7 @@ int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &f
                    GetTimeString());
         LogVerbose("Spend %f seconds", std::chrono::duration<double>(Clock::now() - start).count());
     }
-    Apply(table, filePath, bitmap, nullptr, LogHere());
+    ApplyExtents(table, filePath, bitmap, nullptr, LogHere());
     *tableOut = table;
     LogVerbose("Add file (%s) finish", filePath.c_str());
     return 0;
@@ -63,6 +62,6 @@ int UnsetBitmapAndAppendUnpinInfos(const char * /*cachePath*/, PinBitmap *bitmap
         LogError("Get mapping table of file (%s) failed", filePath.c_str());
         return -1;
     }
-    Apply(table, filePath, bitmap, infos, LogHere());
+    ApplyExtents(table, filePath, bitmap, infos, LogHere());
     return 0;
 }

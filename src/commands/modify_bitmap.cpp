@@ -15,20 +15,13 @@ int ModifyBitmap(const char *mountPath, uint64_t startSector, uint64_t numSector
     if (VolumeBitmapOpen(mountPath, &volume, LogHere()) < 0) {
         return -1;
     }
-    switch (op) {
-    case opSet:
-        if (BitmapSetRange(volume.bitmap.get(), startSector, numSectors) != 0) {
-            LogError("Can't get bitmap to file");
-            return -1;
-        }
-        break;
-    case opUnset:
-        if (BitmapUnsetRange(volume.bitmap.get(), startSector, numSectors) != 0) {
-            LogError("Can't unset bitmap to file");
-            return -1;
-        }
-        break;
-    default: LogError("Unknown bitmap op = %d", op); return -1;
+    if (op != opSet && op != opUnset) {
+        LogError("Unknown bitmap op = %d", op);
+        return -1;
+    }
+    if (BitmapOperation(volume.bitmap.get(), startSector, numSectors, op) != 0) {
+        LogError(op == opSet ? "Can't get bitmap to file" : "Can't unset bitmap to file");
+        return -1;
     }
     return BitmapWriteAndSend(volume.bitmap.get(), volume.bitmapPath.get(), volume.cachePath.get(),
                               LogHere());

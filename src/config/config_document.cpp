@@ -56,8 +56,7 @@ int ConfigReadDocument(const char *configPath, Json::Value *root) {
     return ConfigHasShape(*root) ? 0 : -1;
 }
 
-int ConfigUpdate(const char *configPath, MissingConfig missing,
-                 const std::function<ConfigChange(Json::Value &root)> &change,
+int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChange &change,
                  const LogPlace &place) {
     const bool creates = missing == MissingConfig::Created;
     // A file that cannot be looked up is not taken for a missing one: writing a new document over
@@ -76,12 +75,15 @@ int ConfigUpdate(const char *configPath, MissingConfig missing,
         LogWrite(LogClass::Error, place, "Can't read data from config file (%s)", configPath);
         return -1;
     }
-    const ConfigChange result = change(root);
-    if (result.failure != nullptr) {
-        LogWrite(LogClass::Error, place, "%s", result.failure);
-        return -1;
+    const char *failure = change(root);
+    if (failure == nullptr) {
+        return ConfigWrite(root, configPath, missing, place);
     }
-    return result.made ? ConfigWrite(root, configPath, missing, place) : 0;
+    if (failure[0] == '\0') {
+        return 0;
+    }
+    LogWrite(LogClass::Error, place, "%s", failure);
+    return -1;
 }
 
 int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig missing,

@@ -23,16 +23,13 @@ int ConfigReadDocument(const char *configPath, Json::Value *root);
 // What a file that is not there means to a change.
 enum class MissingConfig { Created, IsAnError, Skipped };
 
-// What a change has made of the document in memory.
-struct ConfigChange {
-    const char *failure = nullptr; // error message; nothing is written then
-    bool made = true;              // false: there is nothing to write
-};
+// Changes the tree. Null: it is to be written; else the error message of a failure, or an empty
+// text where there is nothing to write.
+using ConfigChange = std::function<const char *(Json::Value &root)>;
 
 // Reads the document, changes it and writes it, logging at the caller's place. 0, or -1 after an
 // error message with the file as it was. Takes no lock.
-int ConfigUpdate(const char *configPath, MissingConfig missing,
-                 const std::function<ConfigChange(Json::Value &root)> &change,
+int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChange &change,
                  const LogPlace &place);
 
 // The cycle's last step: 0, or -1 after the error message of a change that may create the file or

@@ -32,27 +32,20 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
         LogError("Can't get file infos");
         return -1;
     }
+    const bool pins = record->type == requestPinFiles;
     for (const FileInfo &info : infos) {
         const std::string key = std::to_string(info.inodeNum);
-        const bool recorded = files.isMember(key);
-        switch (record->type) {
-        case requestPinFiles:
-            if (recorded) {
-                LogVerbose("No need to add file (%s) to pin file list", info.szRelativePath);
-                break;
-            }
-            LogVerbose("Add file (%s) to pin file list", info.szRelativePath);
-            files[key] = info.szRelativePath;
-            break;
-        case requestUnpinFiles:
-            if (!recorded) {
-                LogVerbose("No need to remove file (%s) from pin file list", info.szRelativePath);
-                break;
-            }
+        const char *path = info.szRelativePath;
+        if (files.isMember(key) == pins) {
+            LogVerbose(pins ? "No need to add file (%s) to pin file list"
+                            : "No need to remove file (%s) from pin file list",
+                       path);
+        } else if (pins) {
+            LogVerbose("Add file (%s) to pin file list", path);
+            files[key] = path;
+        } else {
             files.removeMember(key);
-            LogVerbose("Remove file (%s) from pin file list", info.szRelativePath);
-            break;
-        default: LogError("Get unsupport type = %s", RequestTypeForLog(record->type)); return -1;
+            LogVerbose("Remove file (%s) from pin file list", path);
         }
     }
     if (files.empty()) {
@@ -76,9 +69,9 @@ int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *
     const ServiceLockGuard lock;
     const auto finish = [record, &num](Json::Value &root) {
         if (JsonUpdatePinFileInfo(root, record) < 0) {
-            return ConfigChange{"Can't update pin file list"};
+            return "Can't update pin file list";
         }
-        return ConfigChange{JsonRemoveRequest(root, num) < 0 ? "Can't remove request" : nullptr};
+        return JsonRemoveRequest(root, num) < 0 ? "Can't remove request" : nullptr;
     };
     return ConfigUpdate(configPath, MissingConfig::IsAnError, finish, LogHere());
 }
@@ -92,7 +85,7 @@ int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
             LogWrite(LogClass::Verbose, place,
                      "Volume (%s) deson't has pin files, no need to remove", mountPath);
         }
-        return ConfigChange{nullptr, removed};
+        return removed ? nullptr : "";
     };
     const int result = ConfigUpdate(configPath, MissingConfig::Skipped, remove, place);
     if (result == 0 && removed) {

@@ -59,8 +59,7 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
 int ConfigAddRequest(const char *configPath, const RequestRecord *record) {
     const ServiceLockGuard lock;
     const auto add = [record](Json::Value &root) {
-        return ConfigChange{JsonAddRequest(root, record) < 0 ? "Can't add request to json"
-                                                             : nullptr};
+        return JsonAddRequest(root, record) < 0 ? "Can't add request to json" : nullptr;
     };
     return ConfigUpdate(configPath, MissingConfig::Created, add, LogHere());
 }
@@ -102,7 +101,7 @@ int ConfigDropErrorRequest(const char *configPath, const RequestRecord * /*recor
                            const std::string &num) {
     const ServiceLockGuard lock;
     const auto remove = [&num](Json::Value &root) {
-        return ConfigChange{JsonRemoveRequest(root, num) < 0 ? "Can't remove request" : nullptr};
+        return JsonRemoveRequest(root, num) < 0 ? "Can't remove request" : nullptr;
     };
     return ConfigUpdate(configPath, MissingConfig::IsAnError, remove, LogHere());
 }

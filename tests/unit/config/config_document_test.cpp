@@ -88,14 +88,14 @@ namespace {
 
 const LogPlace caller{"Caller", 1};
 
-ConfigChange AddMember(Json::Value &root) {
+const char *AddMember(Json::Value &root) {
     root["new"] = 1;
-    return {};
+    return nullptr;
 }
 
-ConfigChange NotReached(Json::Value & /*root*/) {
+const char *NotReached(Json::Value & /*root*/) {
     ADD_FAILURE() << "there was nothing to change";
-    return {};
+    return nullptr;
 }
 
 } // namespace
@@ -142,11 +142,11 @@ TEST_F(ConfigDocumentTest, AnUpdateThatFailsOrChangesNothingWritesNothing) {
     CapturedLog log(2);
     const auto fail = [](Json::Value &root) {
         root["half"] = 1;
-        return ConfigChange{"Can't be changed"};
+        return "Can't be changed";
     };
     const auto leave = [](Json::Value &root) {
         root["half"] = 1;
-        return ConfigChange{nullptr, false};
+        return "";
     };
     EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, fail, caller), -1);
     EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, leave, caller), 0);
