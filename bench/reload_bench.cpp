@@ -3,6 +3,7 @@
 #include "bench_names.h"
 
 #include "base/log.h"
+#include "bitmap/bit_runs.h"
 #include "bitmap/pin_bitmap.h"
 #include "state/service_state.h"
 #include "warming/read_range.h"
@@ -79,23 +80,13 @@ template <Bytes (*make)(size_t)> void Scan(benchmark::State &state) {
 template <Bytes (*make)(size_t)> void Reads(benchmark::State &state) {
     const Bytes bytes = make(static_cast<size_t>(state.range(0)));
     MakeDevice(bytes.size());
-    std::vector<BlockRange> runs;
-    for (uint64_t bit = 0; bit < bytes.size() * 8; ++bit) {
-        if ((bytes[bit / 8] >> bit % 8 & 1) == 0) {
-            continue;
-        }
-        if (!runs.empty() && runs.back().startBit + runs.back().numBits == bit) {
-            ++runs.back().numBits;
-        } else {
-            runs.push_back({bit, 1});
-        }
-    }
+    const std::vector<BitRun> runs = BitRunsOf(bytes.data(), bytes.size());
     const WarmBuffer buffer = WarmBufferAllocate();
     for (auto _ : state) {
         const int fd = open(device, O_RDONLY | O_DIRECT);
-        for (const BlockRange &run : runs) {
-            for (uint64_t block = 0; block < run.numBits; ++block) {
-                lseek(fd, static_cast<off_t>((run.startBit + block) << bitmapByteShift), SEEK_SET);
+        for (const BitRun &run : runs) {
+            for (uint64_t block = 0; block < run.count; ++block) {
+                lseek(fd, static_cast<off_t>((run.first + block) << bitmapByteShift), SEEK_SET);
                 benchmark::DoNotOptimize(read(fd, buffer.get(), warmBufferBytes));
             }
         }

@@ -8,6 +8,8 @@
 // evictable (holds a block, unpinned, not in use). A pinned slot may be in use as well.
 #pragma once
 
+#include "bitmap/bit_runs.h"
+
 #include <cstddef>
 #include <cstdint>
 #include <map>
@@ -18,11 +20,7 @@
 constexpr uint64_t kNoBlock = UINT64_MAX;
 constexpr uint32_t kNoSlot = UINT32_MAX;
 
-// A run of consecutive blocks (or bits).
-struct BlockRun {
-    uint64_t first; // number of the first block
-    uint64_t count; // blocks
-};
+using BlockRun = BitRun; // a block's number is that of its bit in the pin bitmap
 
 using UseOrder = std::map<uint64_t, uint32_t>;             // last use -> slot number
 using BlockIndex = std::unordered_map<uint64_t, uint32_t>; // block number -> slot number

@@ -1,7 +1,5 @@
 #include "cachedev/cache_device.h"
 
-#include "cachedev/pin_bitmap_runs.h"
-
 #include <algorithm>
 #include <cerrno>
 

@@ -1,6 +1,6 @@
 #include "cachedev/cache_run.h"
 
-#include "cachedev/pin_bitmap_runs.h"
+#include "bitmap/bit_runs.h"
 
 #include <algorithm>
 #include <mutex>
@@ -128,7 +128,8 @@ void CacheRunPublish(CacheDevice &device, CacheRun &run, int error) {
         if (run.kind == RunKind::Load) {
             BlockCacheStore(device.cache, slot, block);
         }
-        if (run.kind != RunKind::Write && device.bitmap && PinBitmapTest(*device.bitmap, block)) {
+        if (run.kind != RunKind::Write && device.bitmap &&
+            BitIsSet(device.bitmap->data(), device.bitmap->size(), block)) {
             BlockCachePin(device.cache, slot);
         }
     }

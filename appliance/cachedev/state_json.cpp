@@ -1,6 +1,6 @@
 #include "cachedev/state_json.h"
 
-#include "cachedev/pin_bitmap_runs.h"
+#include "bitmap/bit_runs.h"
 
 #include <json/json.h>
 
@@ -17,9 +17,9 @@ Json::Value Pair(uint64_t first, uint64_t second) {
     return pair;
 }
 
-Json::Value RunArray(const std::vector<BlockRun> &runs) {
+Json::Value RunArray(const std::vector<BitRun> &runs) {
     Json::Value array(Json::arrayValue);
-    for (const BlockRun &run : runs) {
+    for (const BitRun &run : runs) {
         array.append(Pair(run.first, run.count));
     }
     return array;
@@ -47,7 +47,8 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     state["slots"] = Number(snapshot.slotBlocks.size());
     state["bitmapSet"] = snapshot.bitmap != nullptr;
     state["bitmapBits"] =
-        RunArray(snapshot.bitmap ? PinBitmapRuns(*snapshot.bitmap) : std::vector<BlockRun>());
+        RunArray(snapshot.bitmap ? BitRunsOf(snapshot.bitmap->data(), snapshot.bitmap->size())
+                                 : std::vector<BitRun>());
     state["pinned"] = RunArray(snapshot.pinned);
     state["pinnedBlocks"] = Number(snapshot.pinnedBlocks);
     state["cachedBlocks"] = Number(snapshot.cachedBlocks);

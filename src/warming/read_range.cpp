@@ -33,10 +33,10 @@ int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t b
     return 0;
 }
 
-int ReadFdToNullByRange(int fd, const BlockRange &range, char *buffer, size_t bufferSize) {
-    const uint64_t bytes = range.numBits << bitmapByteShift;
-    LogVerbose("Range's bitStart=%llu numBits=%llu (size = %llu bytes)", LogU64(range.startBit),
-               LogU64(range.numBits), LogU64(bytes));
-    return ReadFdToNull(fd, range.startBit << bitmapByteShift, static_cast<uint32_t>(bytes), buffer,
+int ReadFdToNullByRange(int fd, const BitRun &range, char *buffer, size_t bufferSize) {
+    const uint64_t bytes = range.count << bitmapByteShift;
+    LogVerbose("Range's bitStart=%llu numBits=%llu (size = %llu bytes)", LogU64(range.first),
+               LogU64(range.count), LogU64(bytes));
+    return ReadFdToNull(fd, range.first << bitmapByteShift, static_cast<uint32_t>(bytes), buffer,
                         bufferSize);
 }

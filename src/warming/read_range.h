@@ -8,6 +8,7 @@
 #define WARMING_READ_RANGE_H
 
 #include "base/malloc_text.h"
+#include "bitmap/bit_runs.h"
 
 #include <cstddef>
 #include <cstdint>
@@ -22,16 +23,11 @@ using WarmBuffer = std::unique_ptr<char, FreeDeleter>;
 // An aligned buffer of warmBufferBytes, or null when memory runs out.
 WarmBuffer WarmBufferAllocate();
 
-struct BlockRange {
-    uint64_t startBit; // 64 KiB blocks, from the start of the device
-    uint64_t numBits;  // 64 KiB blocks
-};
-
 // Reads the low 32 bits of `count` (bytes) from `offset` (bytes), `bufferSize` bytes at a time. 0,
 // or -1 after an error message; the end of the device is an error.
 int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t bufferSize);
 
-// The same for a range of blocks.
-int ReadFdToNullByRange(int fd, const BlockRange &range, char *buffer, size_t bufferSize);
+// The same for blocks of 64 KiB, counted from the start of the device.
+int ReadFdToNullByRange(int fd, const BitRun &range, char *buffer, size_t bufferSize);
 
 #endif

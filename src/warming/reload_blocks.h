@@ -1,9 +1,8 @@
 // Warming after a mount: every block whose bit is set in the volume's pin bitmap is read through
 // the cache device; neighbouring blocks in one go.
 //
-// Thread rule: called on the worker's thread, without the service lock. Gives way after each bit
-// when the volume is pending (a stretch of clear bytes, or of set ones, of up to 4 KiB counts as
-// one).
+// Thread rule: called on the worker's thread, without the service lock. Gives way to a pending
+// volume before and after each read, and after each 4096 bytes of equal bits at the latest.
 #ifndef WARMING_RELOAD_BLOCKS_H
 #define WARMING_RELOAD_BLOCKS_H
 
