@@ -5,6 +5,7 @@
 #include <cstring>
 #include <fcntl.h>
 #include <unistd.h>
+#include <utility>
 
 namespace {
 
@@ -20,37 +21,30 @@ bool AwaitReady(int fd) {
 
 } // namespace
 
-Background::~Background() {
-    if (readyFd >= 0) {
-        close(readyFd);
-    }
-}
-
 int BackgroundStart(Background &background) {
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0) {
         fprintf(stderr, "veskcachedev: cannot make a pipe: %s\n", strerror(errno));
         return -1;
     }
+    const ScopedFd readEnd(ends[0]);
+    ScopedFd writeEnd(ends[1]);
     fflush(nullptr); // or both processes would write what is still buffered
     const pid_t child = fork();
     if (child < 0) {
         fprintf(stderr, "veskcachedev: cannot go to the background: %s\n", strerror(errno));
-        close(ends[0]);
-        close(ends[1]);
         return -1;
     }
     if (child > 0) {
-        close(ends[1]);
-        _exit(AwaitReady(ends[0]) ? 0 : 1);
+        writeEnd = ScopedFd(); // or the daemon's end would not be the pipe's
+        _exit(AwaitReady(readEnd.Get()) ? 0 : 1);
     }
-    close(ends[0]);
-    background.readyFd = ends[1];
+    background.ready = std::move(writeEnd);
     return 0;
 }
 
 void BackgroundReady(Background &background) {
-    if (background.readyFd < 0) {
+    if (!background.ready.IsOpen()) {
         return;
     }
     setsid();
@@ -66,8 +60,7 @@ void BackgroundReady(Background &background) {
     }
     // Writes to a parent that was killed meanwhile may fail: the daemon serves all the same.
     const char byte = 1;
-    const ssize_t written = write(background.readyFd, &byte, 1);
+    const ssize_t written = write(background.ready.Get(), &byte, 1);
     static_cast<void>(written);
-    close(background.readyFd);
-    background.readyFd = -1;
+    background.ready = ScopedFd();
 }

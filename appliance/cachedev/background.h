@@ -5,13 +5,11 @@
 // To be used from one thread before others are started, except BackgroundReady.
 #pragma once
 
+#include "base/scoped_fd.h"
+
 // The daemon's end of the line to the waiting parent.
 struct Background {
-    int readyFd = -1; // -1: not in the background, or already reported
-    Background() = default;
-    ~Background();
-    Background(const Background &) = delete;
-    Background &operator=(const Background &) = delete;
+    ScopedFd ready; // not open: not in the background, or already reported
 };
 
 // Splits the process. Returns in the daemon only, with 0, or with -1 when it cannot be split

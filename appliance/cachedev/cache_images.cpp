@@ -50,25 +50,26 @@ int TransferAll(TransferCall call, int fd, uint64_t offset, ImagePieces pieces) 
     }
 }
 
-int OpenImage(const std::string &path, const char *what, ImageFile &image, struct stat &status,
+int OpenImage(const std::string &path, const char *what, ScopedFd &image, struct stat &status,
               uint64_t &bytes, std::string &error) {
     const std::string name = std::string(what) + " image " + path;
-    image.fd = open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOCTTY | O_NONBLOCK);
-    if (image.fd < 0) {
+    image = ScopedFd(open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
+    if (!image.IsOpen()) {
         error = "cannot open the " + name + ": " + strerror(errno);
         return -1;
     }
-    if (fstat(image.fd, &status) != 0 || (!S_ISREG(status.st_mode) && !S_ISBLK(status.st_mode))) {
+    if (fstat(image.Get(), &status) != 0 ||
+        (!S_ISREG(status.st_mode) && !S_ISBLK(status.st_mode))) {
         error = "the " + name + " is neither a regular file nor a block device";
         return -1;
     }
     // A second cache device on the same image would change it behind this one's back. Locks on
     // block devices are left alone: udev takes them now and then while it probes.
-    if (S_ISREG(status.st_mode) && flock(image.fd, LOCK_EX | LOCK_NB) != 0) {
+    if (S_ISREG(status.st_mode) && flock(image.Get(), LOCK_EX | LOCK_NB) != 0) {
         error = "the " + name + " is in use by another cache device";
         return -1;
     }
-    const off_t end = lseek(image.fd, 0, SEEK_END); // also right for a block device
+    const off_t end = lseek(image.Get(), 0, SEEK_END); // also right for a block device
     if (end < 0) {
         error = "cannot find the size of the " + name + ": " + strerror(errno);
         return -1;
@@ -90,7 +91,7 @@ int MapSlots(CacheImages &images, std::string &error) {
     errno = EFBIG;
     if (bytes <= PTRDIFF_MAX) {
         start = mmap(nullptr, static_cast<size_t>(bytes), PROT_READ | PROT_WRITE, MAP_SHARED,
-                     images.ssd.fd, 0);
+                     images.ssd.Get(), 0);
     }
     if (start == MAP_FAILED) {
         error = "cannot map the SSD image (" + std::to_string(bytes) +
@@ -103,12 +104,6 @@ int MapSlots(CacheImages &images, std::string &error) {
 }
 
 } // namespace
-
-ImageFile::~ImageFile() {
-    if (fd >= 0) {
-        close(fd);
-    }
-}
 
 SlotMap::~SlotMap() {
     if (start != nullptr) {
@@ -149,19 +144,19 @@ int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, 
 }
 
 int CacheImagesReadBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
-    return TransferAll(preadv, images.backing.fd, offset, pieces);
+    return TransferAll(preadv, images.backing.Get(), offset, pieces);
 }
 
 int CacheImagesWriteBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
-    return TransferAll(pwritev, images.backing.fd, offset, pieces);
+    return TransferAll(pwritev, images.backing.Get(), offset, pieces);
 }
 
 int CacheImagesReadSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
-    return TransferAll(preadv, images.ssd.fd, offset, pieces);
+    return TransferAll(preadv, images.ssd.Get(), offset, pieces);
 }
 
 int CacheImagesWriteSsd(const CacheImages &images, uint64_t offset, const ImagePieces &pieces) {
-    return TransferAll(pwritev, images.ssd.fd, offset, pieces);
+    return TransferAll(pwritev, images.ssd.Get(), offset, pieces);
 }
 
 void ImagePiecesAdd(ImagePieces &pieces, void *start, size_t bytes) {
@@ -174,11 +169,11 @@ void *CacheImagesSlotAddress(const CacheImages &images, uint32_t slot, size_t wi
 }
 
 int CacheImagesSyncBacking(const CacheImages &images) {
-    return fdatasync(images.backing.fd) == 0 ? 0 : -errno;
+    return fdatasync(images.backing.Get()) == 0 ? 0 : -errno;
 }
 
 int CacheImagesSyncAll(const CacheImages &images) {
     const int backing = CacheImagesSyncBacking(images);
-    const int ssd = fdatasync(images.ssd.fd) == 0 ? 0 : -errno;
+    const int ssd = fdatasync(images.ssd.Get()) == 0 ? 0 : -errno;
     return backing != 0 ? backing : ssd;
 }

@@ -11,19 +11,12 @@
 // disk be full, that is an error result (-EFAULT) instead of a SIGBUS.
 #pragma once
 
+#include "base/scoped_fd.h"
+
 #include <cstddef>
 #include <cstdint>
 #include <string>
 #include <sys/uio.h>
-
-// An open image; closed with the record.
-struct ImageFile {
-    int fd = -1;
-    ImageFile() = default;
-    ~ImageFile();
-    ImageFile(const ImageFile &) = delete;
-    ImageFile &operator=(const ImageFile &) = delete;
-};
 
 // The mapped slots; unmapped with the record.
 struct SlotMap {
@@ -36,8 +29,8 @@ struct SlotMap {
 };
 
 struct CacheImages {
-    ImageFile backing;
-    ImageFile ssd;
+    ScopedFd backing;
+    ScopedFd ssd;
     SlotMap slotMap;
     uint64_t deviceBytes = 0; // size of the backing image, a multiple of 512
     uint32_t slots = 0;       // whole cache blocks in the SSD image

@@ -1,5 +1,7 @@
 #include "cachedev/cachedev_mount.h"
 
+#include "base/deleter.h"
+
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
@@ -11,27 +13,15 @@
 
 namespace {
 
-struct SessionDestroyer {
-    void operator()(struct fuse_session *session) const { fuse_session_destroy(session); }
-};
-struct SessionUnmounter {
-    void operator()(struct fuse_session *session) const { fuse_session_unmount(session); }
-};
-struct SignalRemover {
-    void operator()(struct fuse_session *session) const { fuse_remove_signal_handlers(session); }
-};
-struct LoopConfigDestroyer {
-    void operator()(struct fuse_loop_config *config) const { fuse_loop_cfg_destroy(config); }
-};
-struct ArgumentFreer {
-    void operator()(struct fuse_args *arguments) const { fuse_opt_free_args(arguments); }
-};
-
-using SessionPtr = std::unique_ptr<struct fuse_session, SessionDestroyer>;
+using SessionPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_session_destroy>>;
+using MountPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_session_unmount>>;
+using HandlersPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_remove_signal_handlers>>;
+using LoopConfigPtr = std::unique_ptr<struct fuse_loop_config, Deleter<fuse_loop_cfg_destroy>>;
+using ArgumentsPtr = std::unique_ptr<struct fuse_args, Deleter<fuse_opt_free_args>>;
 
 SessionPtr MakeSession(ServedDevice &served) {
     struct fuse_args arguments = FUSE_ARGS_INIT(0, nullptr);
-    const std::unique_ptr<struct fuse_args, ArgumentFreer> freeArguments(&arguments);
+    const ArgumentsPtr freeArguments(&arguments);
     for (const char *argument :
          {"veskcachedev", "-o", "fsname=veskcachedev,subtype=veskcachedev,default_permissions"}) {
         if (fuse_opt_add_arg(&arguments, argument) != 0) {
@@ -87,15 +77,14 @@ int CachedevServe(ServedDevice &served, const std::string &folder) {
         fprintf(stderr, "veskcachedev: cannot set the signal handlers\n");
         return -1;
     }
-    const std::unique_ptr<struct fuse_session, SignalRemover> removeHandlers(session.get());
+    const HandlersPtr removeHandlers(session.get());
     // libfuse names the cause itself: no /dev/fuse, no right to mount.
     if (fuse_session_mount(session.get(), folder.c_str()) != 0) {
         fprintf(stderr, "veskcachedev: cannot mount a FUSE filesystem on %s\n", folder.c_str());
         return -1;
     }
-    const std::unique_ptr<struct fuse_session, SessionUnmounter> unmount(session.get());
-    const std::unique_ptr<struct fuse_loop_config, LoopConfigDestroyer> config(
-        fuse_loop_cfg_create());
+    const MountPtr unmount(session.get());
+    const LoopConfigPtr config(fuse_loop_cfg_create());
     if (!config) {
         fprintf(stderr, "veskcachedev: out of memory\n");
         return -1;

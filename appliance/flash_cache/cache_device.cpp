@@ -1,9 +1,10 @@
 #include "flash_cache/cache_device.h"
 
+#include "base/scoped_fd.h"
+
 #include <fcntl.h>
 #include <sys/ioctl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <cstdint>
 
@@ -13,31 +14,18 @@ namespace {
 // interface does not know the request.
 constexpr unsigned long kQueryAllUnpinned = 0x8004FED2;
 
-struct OpenDevice {
-    explicit OpenDevice(const std::string &path)
-        : fd(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC)) {}
-    OpenDevice(const OpenDevice &) = delete;
-    OpenDevice &operator=(const OpenDevice &) = delete;
-    ~OpenDevice() {
-        if (fd >= 0) {
-            close(fd);
-        }
-    }
-    const int fd; // negative: not open
-};
-
 } // namespace
 
 CacheDeviceState CacheDeviceAsk(const std::string &devicePath) {
     CacheDeviceState state;
-    const OpenDevice device(devicePath);
+    const ScopedFd device(open(devicePath.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
     struct stat status = {};
-    if (device.fd < 0 || fstat(device.fd, &status) != 0 ||
+    if (!device.IsOpen() || fstat(device.Get(), &status) != 0 ||
         !(S_ISBLK(status.st_mode) || S_ISREG(status.st_mode))) {
         return state;
     }
     state.isUp = true;
     int32_t allUnpinned = 0;
-    state.supportsPin = ioctl(device.fd, kQueryAllUnpinned, &allUnpinned) >= 0;
+    state.supportsPin = ioctl(device.Get(), kQueryAllUnpinned, &allUnpinned) >= 0;
     return state;
 }

@@ -1,5 +1,6 @@
 #include "vesk/flash_cache.h"
 
+#include "base/deleter.h"
 #include "flash_cache/cache_config.h"
 #include "flash_cache/cache_device.h"
 
@@ -13,9 +14,7 @@ namespace {
 constexpr int32_t kConfigBySpaceUuid = 2;
 constexpr int32_t kStatBySsdPath = 3;
 
-struct ConfigDeleter {
-    void operator()(VESKFlashCacheConfig *config) const { VESKFlashCacheConfigFree(config); }
-};
+using ConfigPtr = std::unique_ptr<VESKFlashCacheConfig, Deleter<VESKFlashCacheConfigFree>>;
 
 template <typename Record> Record *RecordAllocate() {
     return static_cast<Record *>(std::calloc(1, sizeof(Record)));
@@ -44,8 +43,7 @@ int ConfigGet(const char *spaceUuid, VESKFlashCacheConfig **config) {
     if (lookup != Lookup::Found) {
         return lookup == Lookup::NotFound ? 0 : -1;
     }
-    std::unique_ptr<VESKFlashCacheConfig, ConfigDeleter> found(
-        RecordAllocate<VESKFlashCacheConfig>());
+    ConfigPtr found(RecordAllocate<VESKFlashCacheConfig>());
     if (found == nullptr || (found->ssdPath = strdup(cache.ssdPath.c_str())) == nullptr) {
         return -1;
     }

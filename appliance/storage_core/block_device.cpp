@@ -1,22 +1,13 @@
 #include "storage_core/block_device.h"
 
+#include "base/deleter.h"
+#include "base/malloc_text.h"
+
 #include <blkid/blkid.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 
-#include <cstdlib>
 #include <memory>
-
-namespace {
-
-struct ProbeDeleter {
-    void operator()(blkid_struct_probe *probe) const { blkid_free_probe(probe); }
-};
-struct FreeDeleter {
-    void operator()(char *text) const { std::free(text); }
-};
-
-} // namespace
 
 std::string BlockDeviceOfMount(const MountEntry &mount) {
     // A source such as "tank/data" or "none" must not be looked up in the current directory.
@@ -31,7 +22,7 @@ std::string BlockDeviceOfMount(const MountEntry &mount) {
 }
 
 std::string BlockDeviceByNumber(dev_t device) {
-    const std::unique_ptr<char, FreeDeleter> name(blkid_devno_to_devname(device));
+    const MallocText name(blkid_devno_to_devname(device));
     if (name == nullptr || BlockDeviceNumber(name.get()) != device) {
         return {};
     }
@@ -47,7 +38,7 @@ dev_t BlockDeviceNumber(const std::string &devicePath) {
 }
 
 std::string BlockDeviceProbe(const std::string &devicePath, const char *name) {
-    const std::unique_ptr<blkid_struct_probe, ProbeDeleter> probe(
+    const std::unique_ptr<blkid_struct_probe, Deleter<blkid_free_probe>> probe(
         blkid_new_probe_from_filename(devicePath.c_str()));
     if (probe == nullptr || blkid_probe_enable_superblocks(probe.get(), 1) != 0 ||
         blkid_probe_set_superblocks_flags(probe.get(), BLKID_SUBLKS_UUID | BLKID_SUBLKS_TYPE) !=

@@ -1,5 +1,7 @@
 #include "storage_core/directory_entry.h"
 
+#include "base/deleter.h"
+
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -8,10 +10,6 @@
 #include <memory>
 
 namespace {
-
-struct DirectoryDeleter {
-    void operator()(DIR *directory) const { closedir(directory); }
-};
 
 // Symbolic links, devices and directories have no extents to give, and opening a device can do
 // things. Filesystems that do not tell the type here are checked after opening.
@@ -43,14 +41,14 @@ bool InodeSearchFound(const InodeSearch &search) {
     return !search.name.empty() && (search.isExact || !search.isAmbiguous);
 }
 
-UniqueFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
-    UniqueFd opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
+    ScopedFd opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (!opened.IsOpen()) {
-        return UniqueFd();
+        return ScopedFd();
     }
-    const std::unique_ptr<DIR, DirectoryDeleter> stream(fdopendir(opened.Get()));
+    const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(opened.Get()));
     if (stream == nullptr) {
-        return UniqueFd();
+        return ScopedFd();
     }
     opened.Release(); // the stream closes it from here on
 
@@ -65,17 +63,17 @@ UniqueFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
         }
     }
     if (!InodeSearchFound(search)) {
-        return UniqueFd();
+        return ScopedFd();
     }
 
     // Non-blocking: the entry may have become a FIFO meanwhile. What was opened is checked for the
     // same reason.
-    UniqueFd file(openat(dirfd(stream.get()), search.name.c_str(),
+    ScopedFd file(openat(dirfd(stream.get()), search.name.c_str(),
                          O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
     struct stat status = {};
     if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
         status.st_ino != search.candidate) {
-        return UniqueFd();
+        return ScopedFd();
     }
     return file;
 }

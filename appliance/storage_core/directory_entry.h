@@ -4,7 +4,7 @@
 #ifndef VESK_STORAGE_CORE_DIRECTORY_ENTRY_H
 #define VESK_STORAGE_CORE_DIRECTORY_ENTRY_H
 
-#include "storage_core/unique_fd.h"
+#include "base/scoped_fd.h"
 
 #include <cstdint>
 #include <string>
@@ -28,6 +28,6 @@ bool InodeSearchFound(const InodeSearch &search);
 
 // Opens the regular file with this inode number (or these low 32 bits of it) in a directory, for
 // reading, without following a symbolic link. Not open: no such file, or a failure.
-UniqueFd DirectoryOpenFile(const std::string &directory, uint64_t inode);
+ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode);
 
 #endif

@@ -1,5 +1,7 @@
 #include "storage_core/file_extents.h"
 
+#include "base/malloc_text.h"
+
 #include <linux/fs.h>
 #include <sys/ioctl.h>
 
@@ -15,10 +17,6 @@ constexpr uint32_t kBatchExtents = 128; // extents per question; about 7 KiB
 constexpr uint32_t kFlagsWithoutPlace = FIEMAP_EXTENT_UNKNOWN | FIEMAP_EXTENT_DELALLOC |
                                         FIEMAP_EXTENT_ENCODED | FIEMAP_EXTENT_NOT_ALIGNED |
                                         FIEMAP_EXTENT_DATA_INLINE | FIEMAP_EXTENT_DATA_TAIL;
-
-struct FreeDeleter {
-    void operator()(fiemap *batch) const { std::free(batch); }
-};
 
 } // namespace
 

@@ -1,5 +1,6 @@
 #include "storage_core/file_system_device.h"
 
+#include "base/malloc_text.h"
 #include "storage_core/block_device.h"
 #include "storage_core/directory_entry.h"
 #include "storage_core/file_extents.h"
@@ -10,13 +11,8 @@
 
 #include <cstdlib>
 #include <exception>
-#include <memory>
 
 namespace {
-
-struct FreeDeleter {
-    void operator()(char *text) const { std::free(text); }
-};
 
 class FiemapDevice final : public FileSystemDevice {
 public:
@@ -32,7 +28,7 @@ int FiemapDevice::GetMappingByInode(const std::string &directory, uint64_t inode
                                     FileMappingTable &table) {
     table.entries.clear();
     try {
-        const UniqueFd file = DirectoryOpenFile(directory, inode);
+        const ScopedFd file = DirectoryOpenFile(directory, inode);
         struct stat status = {};
         if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || status.st_dev != number_) {
             return -1;
@@ -59,7 +55,7 @@ std::string DeviceOfFile(const std::vector<MountEntry> &mounts, const std::strin
         return BlockDeviceByNumber(device); // a mount that this namespace does not show
     }
     // btrfs gives every subvolume a number that no mount carries, so that only the path tells.
-    const std::unique_ptr<char, FreeDeleter> path(realpath(filePath.c_str(), nullptr));
+    const MallocText path(realpath(filePath.c_str(), nullptr));
     const MountEntry *mount = path == nullptr ? nullptr : MountFindByPath(mounts, path.get());
     return mount == nullptr ? std::string() : BlockDeviceOfMount(*mount);
 }

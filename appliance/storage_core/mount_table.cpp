@@ -1,17 +1,12 @@
 #include "storage_core/mount_table.h"
 
+#include "base/deleter.h"
+
 #include <libmount/libmount.h>
 
 #include <memory>
 
 namespace {
-
-struct TableDeleter {
-    void operator()(libmnt_table *table) const { mnt_unref_table(table); }
-};
-struct IteratorDeleter {
-    void operator()(libmnt_iter *iterator) const { mnt_free_iter(iterator); }
-};
 
 std::string TextOrEmpty(const char *text) {
     return text == nullptr ? "" : text;
@@ -42,8 +37,10 @@ bool IsAtOrBelow(const std::string &path, const std::string &directory) {
 
 bool MountTableRead(const char *path, std::vector<MountEntry> &entries) {
     entries.clear();
-    const std::unique_ptr<libmnt_table, TableDeleter> table(mnt_new_table_from_file(path));
-    const std::unique_ptr<libmnt_iter, IteratorDeleter> iterator(mnt_new_iter(MNT_ITER_FORWARD));
+    const std::unique_ptr<libmnt_table, Deleter<mnt_unref_table>> table(
+        mnt_new_table_from_file(path));
+    const std::unique_ptr<libmnt_iter, Deleter<mnt_free_iter>> iterator(
+        mnt_new_iter(MNT_ITER_FORWARD));
     if (table == nullptr || iterator == nullptr) {
         return false;
     }

@@ -1,5 +1,6 @@
 #include "storage_core/space_list.h"
 
+#include "base/deleter.h"
 #include "storage_core/block_device.h"
 #include "vesk/storage_core.h"
 
@@ -30,10 +31,7 @@ bool Fits(const Space &space) {
            space.referencePath.size() < sizeof(VESKSpaceInfo::referencePath);
 }
 
-struct SpaceInfoDeleter {
-    void operator()(VESKSpaceInfo *list) const { VESKSpaceInfoFree(list); }
-};
-using SpaceInfoList = std::unique_ptr<VESKSpaceInfo, SpaceInfoDeleter>;
+using SpaceInfoList = std::unique_ptr<VESKSpaceInfo, Deleter<VESKSpaceInfoFree>>;
 
 SpaceInfoList InfoListMake(const std::vector<Space> &spaces) {
     SpaceInfoList list;

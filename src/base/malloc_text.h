@@ -3,12 +3,12 @@
 #ifndef BASE_MALLOC_TEXT_H
 #define BASE_MALLOC_TEXT_H
 
+#include "base/deleter.h"
+
 #include <cstdlib>
 #include <memory>
 
-struct FreeDeleter {
-    void operator()(void *memory) const { std::free(memory); }
-};
+using FreeDeleter = Deleter<std::free>;
 
 using MallocText = std::unique_ptr<char, FreeDeleter>;
 

@@ -5,8 +5,9 @@
 #include <fstream>
 #include <sstream>
 
-TempDir::TempDir() {
-    path_ = (std::filesystem::temp_directory_path() / "vesk-test-XXXXXX").string();
+TempDir::TempDir() : TempDir(std::filesystem::temp_directory_path().string()) {}
+
+TempDir::TempDir(const std::string &parent) : path_(parent + "/vesk-test-XXXXXX") {
     if (mkdtemp(&path_[0]) == nullptr) {
         abort();
     }
@@ -15,6 +16,11 @@ TempDir::TempDir() {
 TempDir::~TempDir() {
     std::error_code ignored;
     std::filesystem::remove_all(path_, ignored);
+}
+
+std::string TempDir::FileMake(const std::string &name, const std::string &content) const {
+    WriteWhole(Path(name), content);
+    return Path(name);
 }
 
 void WriteWhole(const std::string &path, const std::string &content) {

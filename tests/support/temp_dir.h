@@ -6,13 +6,16 @@
 
 class TempDir {
 public:
-    TempDir();
+    TempDir(); // below the machine's folder for such
+    explicit TempDir(const std::string &parent);
     ~TempDir();
     TempDir(const TempDir &) = delete;
     TempDir &operator=(const TempDir &) = delete;
 
     const std::string &Path() const { return path_; }
     std::string Path(const std::string &name) const { return path_ + "/" + name; }
+    // Writes a file of this name and returns its path.
+    std::string FileMake(const std::string &name, const std::string &content) const;
 
 private:
     std::string path_;

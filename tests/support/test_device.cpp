@@ -5,29 +5,14 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <sstream>
 #include <stdexcept>
 #include <unistd.h>
 
-TestFolder::TestFolder() {
-    char name[] = "/tmp/cachedev_test.XXXXXX";
-    if (mkdtemp(name) == nullptr) {
-        throw std::runtime_error("no folder for the test");
-    }
-    path = name;
-}
-
-TestFolder::~TestFolder() {
-    std::error_code ignored;
-    std::filesystem::remove_all(path, ignored);
-}
-
 TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
-    : backingPath(folder.path + "/backing.img"), ssdPath(folder.path + "/ssd.img") {
-    TestWriteFile(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
+    : backingPath(folder.Path("backing.img")), ssdPath(folder.Path("ssd.img")) {
+    WriteWhole(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(ssdPath, slots * kBlockBytes);
     std::string error;
     if (CacheImagesOpen(backingPath, ssdPath, device.images, error) != 0) {
@@ -49,19 +34,9 @@ std::string TestBytes(uint64_t offset, size_t size) {
     return bytes;
 }
 
-void TestWriteFile(const std::string &path, const std::string &content) {
-    std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
-}
-
 void TestMakeFile(const std::string &path, uint64_t size) {
     std::ofstream(path, std::ios::binary | std::ios::trunc).close();
     std::filesystem::resize_file(path, size);
-}
-
-std::string TestReadFile(const std::string &path) {
-    std::ostringstream content;
-    content << std::ifstream(path, std::ios::binary).rdbuf();
-    return content.str();
 }
 
 std::string TestRead(CacheDevice &device, uint64_t offset, size_t size) {

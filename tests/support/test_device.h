@@ -2,24 +2,16 @@
 #pragma once
 
 #include "cachedev/cache_device.h"
+#include "tests/support/temp_dir.h"
 
 #include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
 
-// A folder below /tmp, removed with all it holds.
-struct TestFolder {
-    std::string path;
-    TestFolder();
-    ~TestFolder();
-    TestFolder(const TestFolder &) = delete;
-    TestFolder &operator=(const TestFolder &) = delete;
-};
-
 // An opened and started device. The backing image is filled with bytes that depend on their place.
 struct TestDevice {
-    TestFolder folder;
+    const TempDir folder;
     CacheDevice device;
     std::string backingPath;
     std::string ssdPath;
@@ -32,10 +24,8 @@ char TestByte(uint64_t offset);
 // `size` such bytes from `offset` on.
 std::string TestBytes(uint64_t offset, size_t size);
 
-// Creates a file with this content, or of this size.
-void TestWriteFile(const std::string &path, const std::string &content);
+// Creates a file of this size.
 void TestMakeFile(const std::string &path, uint64_t size);
-std::string TestReadFile(const std::string &path);
 
 // Reads through the cache; a negative result becomes an empty string and a test failure.
 std::string TestRead(CacheDevice &device, uint64_t offset, size_t size);

@@ -45,13 +45,11 @@ std::string WorldMake() {
 
 // Why loop devices cannot be used; empty: they can.
 std::string LoopProbe() {
-    const int control = open("/dev/loop-control", O_RDWR | O_CLOEXEC);
-    const int number = control < 0 ? -1 : ioctl(control, LOOP_CTL_GET_FREE);
-    close(control);
+    const ScopedFd control(open("/dev/loop-control", O_RDWR | O_CLOEXEC));
+    const int number = control.IsOpen() ? ioctl(control.Get(), LOOP_CTL_GET_FREE) : -1;
     const std::string path = "/dev/loop" + std::to_string(number);
-    const int loop = number < 0 ? -1 : open(path.c_str(), O_RDWR | O_CLOEXEC);
-    close(loop);
-    return loop < 0 ? "needs loop devices" : "";
+    const ScopedFd loop(number < 0 ? -1 : open(path.c_str(), O_RDWR | O_CLOEXEC));
+    return loop.IsOpen() ? "" : "needs loop devices";
 }
 
 // btrfs does not show its device's number, but every filesystem shows what was mounted.
@@ -87,16 +85,6 @@ pid_t CommandStart(std::vector<std::string> command, int output) {
     const int error = posix_spawnp(&child, words[0], &actions, nullptr, words.data(), environ);
     posix_spawn_file_actions_destroy(&actions);
     return error == 0 ? child : -error;
-}
-
-std::string FolderMake() {
-    const std::string place =
-        PrivateWorldEnter().empty() ? std::string(kWorldPath) + "/" : testing::TempDir();
-    std::string path = place + "vesk-appliance-XXXXXX";
-    if (mkdtemp(path.data()) == nullptr) {
-        ADD_FAILURE() << "mkdtemp: " << std::strerror(errno);
-    }
-    return path;
 }
 
 } // namespace
@@ -181,28 +169,22 @@ void TestVolume::Unmount() {
 
 TestFile::TestFile(const std::string &filePath)
     : path(filePath), fd(open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600)) {
-    EXPECT_GE(fd, 0) << path << ": " << std::strerror(errno);
-}
-
-TestFile::~TestFile() {
-    if (fd >= 0) {
-        close(fd);
-    }
+    EXPECT_TRUE(fd.IsOpen()) << path << ": " << std::strerror(errno);
 }
 
 void TestFile::Write(uint64_t offset, uint64_t length) {
     const std::vector<char> pattern = TestPattern(offset, length);
-    EXPECT_EQ(pwrite(fd, pattern.data(), pattern.size(), static_cast<off_t>(offset)),
+    EXPECT_EQ(pwrite(fd.Get(), pattern.data(), pattern.size(), static_cast<off_t>(offset)),
               static_cast<ssize_t>(length));
 }
 
 void TestFile::Fallocate(int mode, uint64_t offset, uint64_t length) {
-    EXPECT_EQ(fallocate(fd, mode, static_cast<off_t>(offset), static_cast<off_t>(length)), 0)
+    EXPECT_EQ(fallocate(fd.Get(), mode, static_cast<off_t>(offset), static_cast<off_t>(length)), 0)
         << std::strerror(errno);
 }
 
 void TestFile::Sync() {
-    EXPECT_EQ(fsync(fd), 0) << std::strerror(errno);
+    EXPECT_EQ(fsync(fd.Get()), 0) << std::strerror(errno);
 }
 
 bool TestFile::LookBeforePlaced(uint64_t offset, uint64_t length,
@@ -226,7 +208,7 @@ bool TestFile::IsUnplaced(uint64_t offset, uint64_t length) const {
     map->fm_start = offset;
     map->fm_length = length;
     map->fm_extent_count = kExtents;
-    EXPECT_EQ(ioctl(fd, FS_IOC_FIEMAP, map), 0) << std::strerror(errno);
+    EXPECT_EQ(ioctl(fd.Get(), FS_IOC_FIEMAP, map), 0) << std::strerror(errno);
     const fiemap_extent *const first = map->fm_extents;
     return map->fm_mapped_extents > 0 &&
            std::all_of(first, first + map->fm_mapped_extents, [](const fiemap_extent &extent) {
@@ -236,7 +218,7 @@ bool TestFile::IsUnplaced(uint64_t offset, uint64_t length) const {
 
 uint64_t TestFile::Inode() const {
     struct stat status = {};
-    EXPECT_EQ(fstat(fd, &status), 0);
+    EXPECT_EQ(fstat(fd.Get(), &status), 0);
     return status.st_ino;
 }
 
@@ -249,17 +231,4 @@ std::vector<char> TestPattern(uint64_t offset, uint64_t length) {
     return pattern;
 }
 
-TestFolder::TestFolder() : path(FolderMake()) {}
-
-TestFolder::~TestFolder() {
-    std::error_code ignored;
-    std::filesystem::remove_all(path, ignored);
-}
-
-std::string TestFolder::FileMake(const std::string &name, const std::string &text) const {
-    std::string filePath = path + "/" + name;
-    std::ofstream file(filePath, std::ios::binary);
-    file << text;
-    EXPECT_TRUE(file.flush().good()) << filePath;
-    return filePath;
-}
+TestFolder::TestFolder() : TempDir(PrivateWorldEnter().empty() ? kWorldPath : testing::TempDir()) {}

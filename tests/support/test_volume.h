@@ -7,6 +7,9 @@
 #ifndef TESTS_SUPPORT_TEST_VOLUME_H
 #define TESTS_SUPPORT_TEST_VOLUME_H
 
+#include "base/scoped_fd.h"
+#include "tests/support/temp_dir.h"
+
 #include <sys/types.h>
 
 #include <cstdint>
@@ -65,9 +68,6 @@ class TestFile {
 public:
     // Creates the file, empty.
     explicit TestFile(const std::string &path);
-    TestFile(const TestFile &) = delete;
-    TestFile &operator=(const TestFile &) = delete;
-    ~TestFile();
 
     // Writes bytes of a pattern that differs from place to place.
     void Write(uint64_t offset, uint64_t length);
@@ -81,7 +81,7 @@ public:
     bool LookBeforePlaced(uint64_t offset, uint64_t length, const std::function<void()> &look);
 
     const std::string path;
-    const int fd;
+    const ScopedFd fd;
 
 private:
     bool IsUnplaced(uint64_t offset, uint64_t length) const;
@@ -90,19 +90,10 @@ private:
 // The pattern that TestFile::Write puts at this place of a file.
 std::vector<char> TestPattern(uint64_t offset, uint64_t length);
 
-// An empty folder that is removed with all that is in it; in the private world where there can be
-// one.
-class TestFolder {
+// An empty folder in the private world where there can be one.
+class TestFolder : public TempDir {
 public:
     TestFolder();
-    TestFolder(const TestFolder &) = delete;
-    TestFolder &operator=(const TestFolder &) = delete;
-    ~TestFolder();
-
-    // Writes a file of this name and returns its path.
-    std::string FileMake(const std::string &name, const std::string &text) const;
-
-    const std::string path;
 };
 
 #endif

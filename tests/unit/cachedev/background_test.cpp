@@ -59,5 +59,5 @@ TEST(BackgroundTest, TheCommandFailsWhenTheDaemonEndsBefore) {
 TEST(BackgroundTest, WithoutAParentNothingHappens) {
     Background background;
     BackgroundReady(background);
-    EXPECT_EQ(background.readyFd, -1);
+    EXPECT_FALSE(background.ready.IsOpen());
 }

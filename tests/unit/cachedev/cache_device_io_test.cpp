@@ -51,8 +51,8 @@ int StatusOfProcess(const std::function<void()> &body) {
 
 // Every cached block's slot holds the block's bytes of the backing image.
 void ExpectSlotsAgree(TestDevice &test) {
-    const std::string backing = TestReadFile(test.backingPath);
-    const std::string ssd = TestReadFile(test.ssdPath);
+    const std::string backing = ReadWhole(test.backingPath);
+    const std::string ssd = ReadWhole(test.ssdPath);
     const Blocks slots = CacheDeviceSnapshot(test.device).slotBlocks;
     for (size_t slot = 0; slot < slots.size(); ++slot) {
         if (slots[slot] == kNoBlock) {
@@ -99,10 +99,10 @@ TEST(CacheDeviceReadTest, HitsComeFromTheSsdImage) {
     TestDevice test(4 * kBlockBytes, 2);
     TestTouch(test.device, {3});
     const std::string marked(100, 'S');
-    std::string ssd = TestReadFile(test.ssdPath);
+    std::string ssd = ReadWhole(test.ssdPath);
     EXPECT_EQ(ssd.substr(0, kBlockBytes), TestBytes(3 * kBlockBytes, kBlockBytes));
     ssd.replace(50, marked.size(), marked);
-    TestWriteFile(test.ssdPath, ssd);
+    WriteWhole(test.ssdPath, ssd);
     EXPECT_EQ(TestRead(test.device, 3 * kBlockBytes + 50, 100), marked);
     const CacheCounters counters = CacheDeviceSnapshot(test.device).counters;
     EXPECT_EQ(counters.hits, 1U);
@@ -162,7 +162,7 @@ TEST(CacheDeviceWriteTest, WritesThroughAndUpdatesWhatIsCached) {
         const std::string bytes(write.size, fill++);
         ASSERT_EQ(Write(test.device, write.offset, bytes), static_cast<int64_t>(write.size));
         expected.replace(write.offset, write.size, bytes);
-        EXPECT_EQ(TestReadFile(test.backingPath), expected);
+        EXPECT_EQ(ReadWhole(test.backingPath), expected);
         ExpectSlotsAgree(test);
     }
     EXPECT_EQ(TestCached(test.device), (Blocks{1, 4, 6})); // a write caches nothing
@@ -177,7 +177,7 @@ TEST(CacheDeviceWriteTest, TheDeviceEndsWhereItEnds) {
     EXPECT_EQ(Write(test.device, kBlockBytes + 509, "abcdef"), 3);
     EXPECT_EQ(Write(test.device, 5, ""), 0);
     EXPECT_EQ(TestRead(test.device, kBlockBytes + 509, 10), "abc");
-    EXPECT_EQ(TestReadFile(test.backingPath).size(), kBlockBytes + 512);
+    EXPECT_EQ(ReadWhole(test.backingPath).size(), kBlockBytes + 512);
 }
 
 TEST(CacheDeviceWriteTest, AWriteCountsAsUse) {
@@ -297,7 +297,7 @@ TEST(CacheDeviceRandomTest, AgreesWithAPlainFile) {
                 ASSERT_TRUE(TestRead(test.device, offset, size) == expected.substr(offset, size));
             }
         }
-        EXPECT_TRUE(TestReadFile(test.backingPath) == expected);
+        EXPECT_TRUE(ReadWhole(test.backingPath) == expected);
         ExpectSlotsAgree(test);
         const CacheSnapshot snapshot = CacheDeviceSnapshot(test.device);
         EXPECT_EQ(snapshot.cachedBlocks, slots);

@@ -11,11 +11,11 @@
 namespace {
 
 struct CacheImagesTest : testing::Test {
-    TestFolder folder;
+    const TempDir folder;
     CacheImages images;
     std::string error;
 
-    std::string Path(const char *name) const { return folder.path + "/" + name; }
+    std::string Path(const char *name) const { return folder.Path(name); }
     int Open() { return CacheImagesOpen(Path("backing"), Path("ssd"), images, error); }
     bool ErrorHas(const char *text) const { return error.find(text) != std::string::npos; }
 };
@@ -90,7 +90,7 @@ TEST_F(CacheImagesTest, TransfersGatherAndScatter) {
         ImagePiecesAdd(pieces, part->data(), part->size());
     }
     ASSERT_EQ(CacheImagesWriteBacking(images, 100, pieces), 0);
-    EXPECT_EQ(TestReadFile(Path("backing")).substr(99, 11), std::string("\0onesecond\0", 11));
+    EXPECT_EQ(ReadWhole(Path("backing")).substr(99, 11), std::string("\0onesecond\0", 11));
     std::string all(9, ' ');
     ASSERT_EQ(CacheImagesReadBacking(images, 100, Piece(all)), 0);
     EXPECT_EQ(all, "onesecond");
@@ -122,7 +122,7 @@ TEST_F(CacheImagesTest, SlotsAreMappedAndSystemCallsFailOnLostOnes) {
     ImagePieces slot;
     ImagePiecesAdd(slot, CacheImagesSlotAddress(images, 1, 5), text.size());
     ASSERT_EQ(CacheImagesReadBacking(images, 0, slot), 0);
-    EXPECT_EQ(TestReadFile(Path("ssd")).substr(kBlockBytes + 5, text.size()), text);
+    EXPECT_EQ(ReadWhole(Path("ssd")).substr(kBlockBytes + 5, text.size()), text);
     // Cut short: an error result, not a signal.
     std::filesystem::resize_file(Path("ssd"), 0);
     EXPECT_EQ(CacheImagesReadBacking(images, 0, slot), -EFAULT);

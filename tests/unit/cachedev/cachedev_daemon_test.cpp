@@ -1,4 +1,5 @@
 // The daemon itself, through the kernel.
+#include "base/deleter.h"
 #include "cachedev/driver_requests.h"
 #include "tests/support/test_device.h"
 #include "tests/unit/cachedev/private_world.h"
@@ -20,7 +21,7 @@
 namespace {
 
 bool IsFolderEmpty() {
-    const std::unique_ptr<DIR, int (*)(DIR *)> folder(opendir(kDaemonFolder), closedir);
+    const std::unique_ptr<DIR, Deleter<closedir>> folder(opendir(kDaemonFolder));
     int entries = 0;
     while (folder && readdir(folder.get()) != nullptr) {
         ++entries;
@@ -43,11 +44,11 @@ struct Rounds {
 };
 
 [[noreturn]] void UseDaemonWithoutEnd(uint8_t bitmapByte, Rounds::Count &rounds) {
-    const TestFd device(kDaemonDevice, O_RDWR | O_DIRECT);
+    const ScopedFd device = TestOpen(kDaemonDevice, O_RDWR | O_DIRECT);
     const std::vector<uint8_t> bitmap(128, bitmapByte);
     for (unsigned i = 0;; ++i) {
         DaemonSetBitmap(bitmap);
-        TestReadAt(device.fd, (i * 37 % 1000) * kBlockBytes, 8 * kBlockBytes);
+        TestReadAt(device.Get(), (i * 37 % 1000) * kBlockBytes, 8 * kBlockBytes);
         DaemonRequest(kRequestUnpinAll, nullptr);
         ++rounds;
     }
@@ -75,7 +76,7 @@ TEST(CachedevDaemonTest, ServesReadsAndWritesThroughTheCache) {
     RunInPrivateWorld([] {
         constexpr uint64_t kBytes = 40 * kBlockBytes + 4096;
         ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(kBytes, 4, {"--pid-file", "/run/pid"}));
-        EXPECT_EQ(TestReadFile("/run/pid"), std::to_string(DaemonPid()) + "\n");
+        EXPECT_EQ(ReadWhole("/run/pid"), std::to_string(DaemonPid()) + "\n");
         struct stat status = {};
         ASSERT_EQ(stat(kDaemonDevice, &status), 0);
         EXPECT_EQ(static_cast<uint64_t>(status.st_size), kBytes);
@@ -87,24 +88,24 @@ TEST(CachedevDaemonTest, ServesReadsAndWritesThroughTheCache) {
         EXPECT_EQ(size, kBytes);
 
         for (const int flags : {0, O_DIRECT}) {
-            const TestFd device(kDaemonDevice, O_RDWR | flags);
-            ASSERT_GE(device.fd, 0);
-            EXPECT_TRUE(TestReadAt(device.fd, 0, kBytes) == TestBytes(0, kBytes));
-            EXPECT_TRUE(TestReadAt(device.fd, 3 * kBlockBytes + 512, 1024) ==
+            const ScopedFd device = TestOpen(kDaemonDevice, O_RDWR | flags);
+            ASSERT_TRUE(device.IsOpen());
+            EXPECT_TRUE(TestReadAt(device.Get(), 0, kBytes) == TestBytes(0, kBytes));
+            EXPECT_TRUE(TestReadAt(device.Get(), 3 * kBlockBytes + 512, 1024) ==
                         TestBytes(3 * kBlockBytes + 512, 1024));
-            EXPECT_EQ(TestReadAt(device.fd, kBytes - 512, 4096), TestBytes(kBytes - 512, 512));
-            EXPECT_EQ(TestReadAt(device.fd, kBytes, 512), "");
-            EXPECT_EQ(fsync(device.fd), 0);
+            EXPECT_EQ(TestReadAt(device.Get(), kBytes - 512, 4096), TestBytes(kBytes - 512, 512));
+            EXPECT_EQ(TestReadAt(device.Get(), kBytes, 512), "");
+            EXPECT_EQ(fsync(device.Get()), 0);
         }
-        const TestFd device(kDaemonDevice);
+        const ScopedFd device = TestOpen(kDaemonDevice);
         const std::string text = "written through";
-        ASSERT_EQ(pwrite(device.fd, text.data(), text.size(), 40 * 65536 + 5),
+        ASSERT_EQ(pwrite(device.Get(), text.data(), text.size(), 40 * 65536 + 5),
                   static_cast<ssize_t>(text.size()));
-        EXPECT_EQ(TestReadAt(device.fd, 40 * kBlockBytes + 5, text.size()), text);
-        EXPECT_EQ(TestReadFile(kDaemonBacking).substr(40 * kBlockBytes + 5, text.size()), text);
-        EXPECT_EQ(pwrite(device.fd, "x", 1, kBytes), -1);
+        EXPECT_EQ(TestReadAt(device.Get(), 40 * kBlockBytes + 5, text.size()), text);
+        EXPECT_EQ(ReadWhole(kDaemonBacking).substr(40 * kBlockBytes + 5, text.size()), text);
+        EXPECT_EQ(pwrite(device.Get(), "x", 1, kBytes), -1);
         EXPECT_EQ(errno, ENOSPC);
-        EXPECT_EQ(pwrite(device.fd, "xyz", 3, kBytes - 1), 1);
+        EXPECT_EQ(pwrite(device.Get(), "xyz", 3, kBytes - 1), 1);
 
         const Json::Value state = DaemonState();
         EXPECT_EQ(state["cachedBlocks"].asInt(), 4);
@@ -132,8 +133,8 @@ TEST(CachedevDaemonTest, KeepsItsShape) {
         ASSERT_EQ(stat(kDaemonDevice, &status), 0);
         EXPECT_EQ(static_cast<uint64_t>(status.st_size), kBlockBytes);
         EXPECT_EQ(DaemonRequest(0x1234, nullptr), ENOTTY);
-        const TestFd state(kDaemonState, O_RDONLY);
-        EXPECT_EQ(ioctl(state.fd, kRequestUnpinAll), -1);
+        const ScopedFd state = TestOpen(kDaemonState, O_RDONLY);
+        EXPECT_EQ(ioctl(state.Get(), kRequestUnpinAll), -1);
         EXPECT_EQ(errno, ENOTTY);
         EXPECT_EQ(DaemonStop(), 0);
     });
@@ -151,14 +152,14 @@ TEST(CachedevDaemonTest, PinnedBlocksSurviveAScan) {
         EXPECT_EQ(DaemonSetBitmap(bitmap), 0);
         EXPECT_EQ(DaemonQuery(kRequestQueryBitmapSet), 1);
         EXPECT_EQ(DaemonQuery(kRequestQueryAllUnpinned), 1);
-        const TestFd device(kDaemonDevice, O_RDWR | O_DIRECT);
-        TestReadAt(device.fd, 8 * kBlockBytes, 4096);
-        TestReadAt(device.fd, 0, 64 * kBlockBytes);
+        const ScopedFd device = TestOpen(kDaemonDevice, O_RDWR | O_DIRECT);
+        TestReadAt(device.Get(), 8 * kBlockBytes, 4096);
+        TestReadAt(device.Get(), 0, 64 * kBlockBytes);
         EXPECT_EQ(DaemonStateText("bitmapBits"), "[[8,2]]");
         EXPECT_EQ(DaemonStateText("pinned"), "[[8,2]]");
         EXPECT_EQ(DaemonQuery(kRequestQueryAllUnpinned), 0);
         const uint64_t before = DaemonState()["ssdReads"].asUInt64();
-        EXPECT_EQ(TestReadAt(device.fd, 8 * kBlockBytes, 2 * kBlockBytes),
+        EXPECT_EQ(TestReadAt(device.Get(), 8 * kBlockBytes, 2 * kBlockBytes),
                   TestBytes(8 * kBlockBytes, 2 * kBlockBytes));
         EXPECT_EQ(DaemonState()["ssdReads"].asUInt64(), before + 2);
         std::vector<SectorRange> ranges(kRangeListRecords);
@@ -199,8 +200,9 @@ TEST(CachedevDaemonTest, OutlivesClientsThatDieInTheMiddle) {
             EXPECT_EQ(kill(client, SIGKILL), 0);
             EXPECT_EQ(DaemonAwaitEnd(client), -SIGKILL);
         }
-        const TestFd device(kDaemonDevice);
-        EXPECT_TRUE(TestReadAt(device.fd, 0, 64 * kBlockBytes) == TestBytes(0, 64 * kBlockBytes));
+        const ScopedFd device = TestOpen(kDaemonDevice);
+        EXPECT_TRUE(TestReadAt(device.Get(), 0, 64 * kBlockBytes) ==
+                    TestBytes(0, 64 * kBlockBytes));
         EXPECT_EQ(DaemonRequest(kRequestUnpinAll, nullptr), 0);
         EXPECT_EQ(DaemonStateText("cachedBlocks"), "16");
         EXPECT_EQ(DaemonStop(), 0);
@@ -226,14 +228,14 @@ TEST(CachedevDaemonTest, CarriesAFilesystem) {
             << DaemonErrors();
         MountAndDetach(loop, "rw");
         const std::string content = TestBytes(0, 3000000);
-        TestWriteFile("/run/m/file", content);
+        WriteWhole("/run/m/file", content);
         EXPECT_EQ(umount("/run/m"), 0);
         EXPECT_GT(DaemonState()["writes"].asInt(), 40);
         const std::string again = AttachLoop();
         ASSERT_NE(again, "") << DaemonErrors();
         MountAndDetach(again, "ro");
         const uint64_t misses = DaemonState()["misses"].asUInt64();
-        EXPECT_TRUE(TestReadFile("/run/m/file") == content);
+        EXPECT_TRUE(ReadWhole("/run/m/file") == content);
         EXPECT_GE(DaemonState()["misses"].asUInt64(), misses + 3000000 / kBlockBytes);
         EXPECT_EQ(umount("/run/m"), 0);
         EXPECT_EQ(DaemonStop(), 0);
@@ -277,7 +279,7 @@ TEST(CachedevDaemonTest, RefusesToStart) {
         EXPECT_NE(DaemonErrors().find("No such file"), std::string::npos) << DaemonErrors();
         TestMakeFile(kDaemonBacking, kBlockBytes);
         EXPECT_EQ(mkdir(kDaemonFolder, 0755), 0);
-        TestWriteFile("/run/vesk/precious", "x");
+        WriteWhole("/run/vesk/precious", "x");
         EXPECT_EQ(DaemonStart(), 1);
         EXPECT_NE(DaemonErrors().find("not empty"), std::string::npos) << DaemonErrors();
         EXPECT_EQ(unlink("/run/vesk/precious"), 0);
@@ -297,11 +299,11 @@ TEST(CachedevDaemonTest, OrderedFaults) {
             4 * kBlockBytes, 2,
             {"--fail-ioctl", "0xFED1:5", "--fail-read", "70000:61", "--short-at", "200000"}));
         EXPECT_EQ(DaemonRequest(kRequestUnpinAll, nullptr), EIO);
-        const TestFd device(kDaemonDevice);
-        EXPECT_EQ(TestReadAt(device.fd, 69000, 1000).size(), 1000U);
-        EXPECT_EQ(TestReadAt(device.fd, 69000, 1001), "error 61");
-        EXPECT_EQ(TestReadAt(device.fd, 199000, 2000).size(), 1000U);
-        EXPECT_EQ(TestReadAt(device.fd, 200000, 1).size(), 0U);
+        const ScopedFd device = TestOpen(kDaemonDevice);
+        EXPECT_EQ(TestReadAt(device.Get(), 69000, 1000).size(), 1000U);
+        EXPECT_EQ(TestReadAt(device.Get(), 69000, 1001), "error 61");
+        EXPECT_EQ(TestReadAt(device.Get(), 199000, 2000).size(), 1000U);
+        EXPECT_EQ(TestReadAt(device.Get(), 200000, 1).size(), 0U);
         EXPECT_EQ(DaemonStop(), 0);
     });
 }

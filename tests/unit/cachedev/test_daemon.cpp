@@ -1,5 +1,6 @@
 #include "tests/unit/cachedev/test_daemon.h"
 
+#include "base/malloc_text.h"
 #include "cachedev/driver_requests.h"
 #include "tests/support/test_device.h"
 
@@ -55,12 +56,8 @@ bool RunsTheDaemon(pid_t process) {
 
 } // namespace
 
-TestFd::TestFd(const char *path, int flags) : fd(open(path, flags | O_CLOEXEC)) {}
-
-TestFd::~TestFd() {
-    if (fd >= 0) {
-        close(fd);
-    }
+ScopedFd TestOpen(const char *path, int flags) {
+    return ScopedFd(open(path, flags | O_CLOEXEC));
 }
 
 int DaemonCommand(std::vector<std::string> command) {
@@ -78,11 +75,11 @@ int DaemonCommand(std::vector<std::string> command) {
 }
 
 std::string DaemonOutput() {
-    return TestReadFile(kOutput);
+    return ReadWhole(kOutput);
 }
 
 std::string DaemonErrors() {
-    return TestReadFile(kErrors);
+    return ReadWhole(kErrors);
 }
 
 int DaemonStart(const std::vector<std::string> &more) {
@@ -93,14 +90,14 @@ int DaemonStart(const std::vector<std::string> &more) {
 }
 
 void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots, const std::vector<std::string> &more) {
-    TestWriteFile(kDaemonBacking, TestBytes(0, static_cast<size_t>(deviceBytes)));
+    WriteWhole(kDaemonBacking, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(kDaemonSsd, slots * kBlockBytes);
     ASSERT_EQ(DaemonStart(more), 0) << DaemonErrors();
 }
 
 Json::Value DaemonState() {
     Json::Value state;
-    std::istringstream stream(TestReadFile(kDaemonState));
+    std::istringstream stream(ReadWhole(kDaemonState));
     std::string errors;
     EXPECT_TRUE(Json::parseFromStream(Json::CharReaderBuilder(), stream, &state, &errors))
         << errors;
@@ -145,8 +142,8 @@ int DaemonStop() {
 }
 
 int DaemonRequest(unsigned long number, const void *argument) {
-    const TestFd device(kDaemonDevice);
-    return ioctl(device.fd, number, argument) < 0 ? errno : 0;
+    const ScopedFd device = TestOpen(kDaemonDevice);
+    return ioctl(device.Get(), number, argument) < 0 ? errno : 0;
 }
 
 int DaemonSetBitmap(const std::vector<uint8_t> &bitmap) {
@@ -163,8 +160,8 @@ int DaemonQuery(unsigned long number) {
 std::string TestReadAt(int fd, uint64_t offset, uint64_t size) {
     const auto bytes = static_cast<size_t>(size);
     const size_t whole = (bytes / 4096 + 1) * 4096; // what aligned_alloc wants
-    const std::unique_ptr<void, void (*)(void *)> buffer(aligned_alloc(4096, whole), free);
+    const MallocText buffer(static_cast<char *>(aligned_alloc(4096, whole)));
     const ssize_t got = pread(fd, buffer.get(), bytes, static_cast<off_t>(offset));
     return got < 0 ? "error " + std::to_string(errno)
-                   : std::string(static_cast<const char *>(buffer.get()), static_cast<size_t>(got));
+                   : std::string(buffer.get(), static_cast<size_t>(got));
 }

@@ -1,6 +1,8 @@
 // The daemon in the private world of a test (see private_world.h), run and used as a script would.
 #pragma once
 
+#include "base/scoped_fd.h"
+
 #include <cstddef>
 #include <cstdint>
 #include <fcntl.h>
@@ -15,14 +17,7 @@ constexpr const char *kDaemonState = "/run/vesk/cachedev_0.json";
 constexpr const char *kDaemonBacking = "/run/backing.img";
 constexpr const char *kDaemonSsd = "/run/ssd.img";
 
-// An open file, closed with the record.
-struct TestFd {
-    int fd; // -1: could not be opened
-    explicit TestFd(const char *path, int flags = O_RDWR);
-    ~TestFd();
-    TestFd(const TestFd &) = delete;
-    TestFd &operator=(const TestFd &) = delete;
-};
+ScopedFd TestOpen(const char *path, int flags = O_RDWR);
 
 // Runs a command; its exit status, 127 where there is no such one. What it wrote is in DaemonOutput
 // and DaemonErrors.

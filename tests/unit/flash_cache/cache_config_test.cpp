@@ -95,12 +95,12 @@ TEST(CacheConfigRead, RefusesMoreThanAMebibyte) {
 TEST(CacheConfigRead, RefusesWhatIsNoFile) {
     const TestFolder folder;
     std::vector<CacheConfigEntry> entries;
-    EXPECT_FALSE(CacheConfigRead(folder.path, entries)) << "a directory";
-    const std::string fifo = folder.path + "/fifo";
+    EXPECT_FALSE(CacheConfigRead(folder.Path(), entries)) << "a directory";
+    const std::string fifo = folder.Path("fifo");
     ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
     EXPECT_FALSE(CacheConfigRead(fifo, entries));
     EXPECT_FALSE(CacheConfigRead("/dev/zero", entries));
-    const std::string loop = folder.path + "/loop";
+    const std::string loop = folder.Path("loop");
     std::filesystem::create_symlink(loop, loop);
     EXPECT_FALSE(CacheConfigRead(loop, entries));
 }

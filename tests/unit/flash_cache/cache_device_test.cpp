@@ -41,9 +41,9 @@ TEST(CacheDeviceAsk, PlainFile) {
 
 TEST(CacheDeviceAsk, NoCacheDevice) {
     const TestFolder folder;
-    const std::string fifo = folder.path + "/fifo";
+    const std::string fifo = folder.Path("fifo");
     ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
-    for (const std::string &path : {folder.path, fifo, std::string("/dev/null"),
+    for (const std::string &path : {folder.Path(), fifo, std::string("/dev/null"),
                                     std::string("/nonexistent"), std::string()}) {
         const CacheDeviceState state = CacheDeviceAsk(path);
         EXPECT_FALSE(state.isUp) << path;

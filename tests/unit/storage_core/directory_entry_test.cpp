@@ -64,7 +64,7 @@ TEST(DirectoryOpenFile, OpensJustThatFile) {
     const TestFolder folder;
     const std::string path = folder.FileMake("wanted", "text");
     folder.FileMake("other", "text");
-    const UniqueFd file = DirectoryOpenFile(folder.path, InodeOfPath(path));
+    const ScopedFd file = DirectoryOpenFile(folder.Path(), InodeOfPath(path));
     ASSERT_TRUE(file.IsOpen());
     struct stat status = {};
     ASSERT_EQ(fstat(file.Get(), &status), 0);
@@ -75,15 +75,15 @@ TEST(DirectoryOpenFile, OpensJustThatFile) {
 
 TEST(DirectoryOpenFile, OpensNothingButRegularFilesOfThisDirectory) {
     const TestFolder folder;
-    const std::string link = folder.path + "/link";
-    const std::string fifo = folder.path + "/fifo";
-    const std::string below = folder.path + "/below";
+    const std::string link = folder.Path("link");
+    const std::string fifo = folder.Path("fifo");
+    const std::string below = folder.Path("below");
     std::filesystem::create_directory(below);
     const std::string inner = folder.FileMake("below/inner", "text");
     std::filesystem::create_symlink(inner, link);
     ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
     for (const std::string &path : {link, fifo, below, inner}) {
-        EXPECT_FALSE(DirectoryOpenFile(folder.path, InodeOfPath(path)).IsOpen()) << path;
+        EXPECT_FALSE(DirectoryOpenFile(folder.Path(), InodeOfPath(path)).IsOpen()) << path;
     }
     EXPECT_TRUE(DirectoryOpenFile(below, InodeOfPath(inner)).IsOpen());
 }
@@ -93,7 +93,7 @@ TEST(DirectoryOpenFile, FailsOnWhatIsNoDirectory) {
     const std::string path = folder.FileMake("file", "text");
     const uint64_t inode = InodeOfPath(path);
     EXPECT_FALSE(DirectoryOpenFile(path, inode).IsOpen());
-    EXPECT_FALSE(DirectoryOpenFile(folder.path + "/missing", inode).IsOpen());
+    EXPECT_FALSE(DirectoryOpenFile(folder.Path("missing"), inode).IsOpen());
     EXPECT_FALSE(DirectoryOpenFile("", inode).IsOpen());
 }
 
@@ -101,12 +101,12 @@ TEST(DirectoryOpenFile, LeavesNoDescriptorOpen) {
     const TestFolder folder;
     const uint64_t inode = InodeOfPath(folder.FileMake("file", "text"));
     const auto lowestFree = [] {
-        const UniqueFd probe(open("/dev/null", O_RDONLY | O_CLOEXEC));
+        const ScopedFd probe(open("/dev/null", O_RDONLY | O_CLOEXEC));
         return probe.Get();
     };
     const int before = lowestFree();
-    EXPECT_TRUE(DirectoryOpenFile(folder.path, inode).IsOpen());
-    EXPECT_FALSE(DirectoryOpenFile(folder.path, inode + 1000000).IsOpen());
+    EXPECT_TRUE(DirectoryOpenFile(folder.Path(), inode).IsOpen());
+    EXPECT_FALSE(DirectoryOpenFile(folder.Path(), inode + 1000000).IsOpen());
     EXPECT_EQ(lowestFree(), before);
 }
 

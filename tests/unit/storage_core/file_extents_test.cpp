@@ -80,9 +80,8 @@ TEST(FileExtentConvert, LeavesOutWhatHasNoPlace) {
 TEST(FileExtentsRead, FailsWithoutTheKernelsAnswer) {
     Entries entries;
     EXPECT_FALSE(FileExtentsRead(-1, entries));
-    const int pipe = open("/dev/null", O_RDONLY | O_CLOEXEC);
-    EXPECT_FALSE(FileExtentsRead(pipe, entries));
-    close(pipe);
+    const ScopedFd device(open("/dev/null", O_RDONLY | O_CLOEXEC));
+    EXPECT_FALSE(FileExtentsRead(device.Get(), entries));
     EXPECT_TRUE(entries.empty());
 }
 
@@ -111,7 +110,7 @@ protected:
 
     Entries Read() const {
         Entries entries;
-        EXPECT_TRUE(FileExtentsRead(file->fd, entries));
+        EXPECT_TRUE(FileExtentsRead(file->fd.Get(), entries));
         return entries;
     }
 
@@ -143,20 +142,19 @@ protected:
     // The device holds the file's bytes where the extents say. The image is what the loop device
     // stores to.
     void ExpectDataInPlace(const Entries &entries) const {
-        const int image = open(volume->imagePath.c_str(), O_RDONLY | O_CLOEXEC);
-        ASSERT_GE(image, 0);
+        const ScopedFd image(open(volume->imagePath.c_str(), O_RDONLY | O_CLOEXEC));
+        ASSERT_TRUE(image.IsOpen());
         for (const FileMappingEntry &entry : entries) {
             if (entry.flag == 1) {
                 continue;
             }
             std::vector<char> found(static_cast<size_t>(entry.numSectors * 512));
-            EXPECT_EQ(pread(image, found.data(), found.size(),
+            EXPECT_EQ(pread(image.Get(), found.data(), found.size(),
                             static_cast<off_t>(entry.deviceStartSector * 512)),
                       static_cast<ssize_t>(found.size()));
             EXPECT_TRUE(found == TestPattern(entry.fileStartSector * 512, found.size()))
                 << "other bytes at " << entry;
         }
-        close(image);
     }
 
     // Without what xfs sets aside behind the end of a file that was appended to.
@@ -292,7 +290,7 @@ TEST_P(FileExtents, FreshlyWrittenBesideAllocated) {
 
 TEST_P(FileExtents, Empty) {
     EXPECT_EQ(Read(), Entries{});
-    ASSERT_EQ(ftruncate(file->fd, 1 << 20), 0);
+    ASSERT_EQ(ftruncate(file->fd.Get(), 1 << 20), 0);
     EXPECT_EQ(Read(), Entries{}) << "one hole";
 }
 
@@ -300,7 +298,7 @@ TEST_P(FileExtents, AppendsToTheEntries) {
     file->Write(0, kBlock);
     file->Sync();
     Entries entries = {{1, 2, 3, 4}};
-    EXPECT_TRUE(FileExtentsRead(file->fd, entries));
+    EXPECT_TRUE(FileExtentsRead(file->fd.Get(), entries));
     ASSERT_EQ(entries.size(), 2U);
     EXPECT_EQ(entries[0], (FileMappingEntry{1, 2, 3, 4}));
 }

@@ -1,5 +1,6 @@
 #include "storage_core/space_list.h"
 
+#include "base/deleter.h"
 #include "tests/support/test_volume.h"
 #include "vesk/storage_core.h"
 
@@ -117,15 +118,11 @@ TEST(SpaceListSelect, PathsThatDoNotFitAreLeftOut) {
         << "a second mount that fits stands for the filesystem";
 }
 
-struct ListDeleter {
-    void operator()(VESKSpaceInfo *list) const { VESKSpaceInfoFree(list); }
-};
-
 // The enumeration's "device path" pairs of mounts below the private world.
 Texts WorldSpaces() {
     VESKSpaceInfo *list = nullptr;
     EXPECT_EQ(VESKSpaceInfoEnum(1, &list), 0);
-    const std::unique_ptr<VESKSpaceInfo, ListDeleter> owner(list);
+    const std::unique_ptr<VESKSpaceInfo, Deleter<VESKSpaceInfoFree>> owner(list);
     Texts spaces;
     for (; list != nullptr; list = list->next) {
         const std::string path = list->referencePath;

@@ -1,23 +1,18 @@
+#include "base/malloc_text.h"
 #include "tests/support/test_volume.h"
 #include "vesk/storage_core.h"
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <cstring>
-#include <memory>
 
 namespace {
-
-struct FreeDeleter {
-    void operator()(char *text) const { std::free(text); }
-};
 
 // The UUID of the space on this device, "(null)" where there is none.
 std::string UuidOf(const std::string &devicePath) {
     VESKSpaceInfo space = {};
     devicePath.copy(space.devicePath, sizeof(space.devicePath) - 1);
-    const std::unique_ptr<char, FreeDeleter> uuid(VESKSpaceUUIDGet(&space));
+    const MallocText uuid(VESKSpaceUUIDGet(&space));
     return uuid == nullptr ? "(null)" : uuid.get();
 }
 
