@@ -21,11 +21,11 @@ bool AwaitReady(int fd) {
 
 } // namespace
 
-int BackgroundStart(Background &background) {
+bool BackgroundStart(Background &background) {
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0) {
         fprintf(stderr, "veskcachedev: cannot make a pipe: %s\n", strerror(errno));
-        return -1;
+        return false;
     }
     const ScopedFd readEnd(ends[0]);
     ScopedFd writeEnd(ends[1]);
@@ -33,14 +33,14 @@ int BackgroundStart(Background &background) {
     const pid_t child = fork();
     if (child < 0) {
         fprintf(stderr, "veskcachedev: cannot go to the background: %s\n", strerror(errno));
-        return -1;
+        return false;
     }
     if (child > 0) {
-        writeEnd = ScopedFd(); // or the daemon's end would not be the pipe's
+        writeEnd = ScopedFd(); // or the end of the daemon would go unseen
         _exit(AwaitReady(readEnd.Get()) ? 0 : 1);
     }
     background.ready = std::move(writeEnd);
-    return 0;
+    return true;
 }
 
 void BackgroundReady(Background &background) {

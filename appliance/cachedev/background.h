@@ -12,10 +12,10 @@ struct Background {
     ScopedFd ready; // not open: not in the background, or already reported
 };
 
-// Splits the process. Returns in the daemon only, with 0, or with -1 when it cannot be split
-// (message on standard error). The parent ends: with 0 after BackgroundReady, with 1 when the
+// Splits the process. Returns in the daemon only, or with false when it cannot be split (message on
+// standard error). The parent ends: with 0 after BackgroundReady, with 1 when the
 // daemon ended before that.
-int BackgroundStart(Background &background);
+bool BackgroundStart(Background &background);
 
 // Lets the parent end with 0 and leaves terminal and folder: a session of its own, standard streams
 // on /dev/null, working folder "/". Does nothing without a waiting parent. Call it once.

@@ -50,32 +50,32 @@ int TransferAll(TransferCall call, int fd, uint64_t offset, ImagePieces pieces) 
     }
 }
 
-int OpenImage(const std::string &path, const char *what, ScopedFd &image, struct stat &status,
-              uint64_t &bytes, std::string &error) {
+bool OpenImage(const std::string &path, const char *what, ScopedFd &image, struct stat &status,
+               uint64_t &bytes, std::string &error) {
     const std::string name = std::string(what) + " image " + path;
     image = ScopedFd(open(path.c_str(), O_RDWR | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
     if (!image.IsOpen()) {
         error = "cannot open the " + name + ": " + strerror(errno);
-        return -1;
+        return false;
     }
     if (fstat(image.Get(), &status) != 0 ||
         (!S_ISREG(status.st_mode) && !S_ISBLK(status.st_mode))) {
         error = "the " + name + " is neither a regular file nor a block device";
-        return -1;
+        return false;
     }
     // A second cache device on the same image would change it behind this one's back. Locks on
     // block devices are left alone: udev takes them now and then while it probes.
     if (S_ISREG(status.st_mode) && flock(image.Get(), LOCK_EX | LOCK_NB) != 0) {
         error = "the " + name + " is in use by another cache device";
-        return -1;
+        return false;
     }
     const off_t end = lseek(image.Get(), 0, SEEK_END); // also right for a block device
     if (end < 0) {
         error = "cannot find the size of the " + name + ": " + strerror(errno);
-        return -1;
+        return false;
     }
     bytes = static_cast<uint64_t>(end);
-    return 0;
+    return true;
 }
 
 bool IsSameImage(const struct stat &one, const struct stat &other) {
@@ -85,7 +85,7 @@ bool IsSameImage(const struct stat &one, const struct stat &other) {
     return one.st_dev == other.st_dev && one.st_ino == other.st_ino;
 }
 
-int MapSlots(CacheImages &images, std::string &error) {
+bool MapSlots(CacheImages &images, std::string &error) {
     const uint64_t bytes = images.slots * kBlockBytes;
     void *start = MAP_FAILED;
     errno = EFBIG;
@@ -96,11 +96,11 @@ int MapSlots(CacheImages &images, std::string &error) {
     if (start == MAP_FAILED) {
         error = "cannot map the SSD image (" + std::to_string(bytes) +
                 " bytes) into memory: " + strerror(errno);
-        return -1;
+        return false;
     }
     images.slotMap.start = start;
     images.slotMap.bytes = static_cast<size_t>(bytes);
-    return 0;
+    return true;
 }
 
 } // namespace
@@ -111,32 +111,29 @@ SlotMap::~SlotMap() {
     }
 }
 
-int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, CacheImages &images,
-                    std::string &error) {
+bool CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath,
+                     CacheImages &images, std::string &error) {
     struct stat backing = {};
     struct stat ssd = {};
     if (stat(backingPath.c_str(), &backing) == 0 && stat(ssdPath.c_str(), &ssd) == 0 &&
         IsSameImage(backing, ssd)) {
         error = "the backing image and the SSD image are the same file";
-        return -1;
+        return false;
     }
     uint64_t ssdBytes = 0;
-    if (OpenImage(backingPath, "backing", images.backing, backing, images.deviceBytes, error) !=
-        0) {
-        return -1;
-    }
-    if (OpenImage(ssdPath, "SSD", images.ssd, ssd, ssdBytes, error) != 0) {
-        return -1;
+    if (!OpenImage(backingPath, "backing", images.backing, backing, images.deviceBytes, error) ||
+        !OpenImage(ssdPath, "SSD", images.ssd, ssd, ssdBytes, error)) {
+        return false;
     }
     if (images.deviceBytes == 0 || images.deviceBytes % kSectorBytes != 0) {
         error = "the size of the backing image (" + std::to_string(images.deviceBytes) +
                 " bytes) is not a multiple of 512 bytes above 0";
-        return -1;
+        return false;
     }
     if (ssdBytes < kBlockBytes) {
         error = "the SSD image (" + std::to_string(ssdBytes) +
                 " bytes) is smaller than one cache block (65536 bytes)";
-        return -1;
+        return false;
     }
     images.slots =
         static_cast<uint32_t>(std::min<uint64_t>(ssdBytes / kBlockBytes, UINT32_MAX - 1));

@@ -44,9 +44,9 @@ struct ImagePieces {
 };
 
 // Opens both images for reading and writing. Regular files, which are locked against a second cache
-// device, and block devices are taken. 0, or -1 with a message for the user in `error`.
-int CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath, CacheImages &images,
-                    std::string &error);
+// device, and block devices are taken. False: `error` is a message for the user.
+bool CacheImagesOpen(const std::string &backingPath, const std::string &ssdPath,
+                     CacheImages &images, std::string &error);
 
 // Transfers, all bytes or an error: 0, or a negative errno (-EIO when the image ends too early).
 int CacheImagesReadBacking(const CacheImages &images, uint64_t offset, const ImagePieces &pieces);

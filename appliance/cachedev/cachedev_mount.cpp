@@ -40,61 +40,61 @@ bool IsMountPoint(const std::string &folder) {
 
 } // namespace
 
-int CachedevPrepareFolder(const std::string &folder, std::string &error) {
+bool CachedevPrepareFolder(const std::string &folder, std::string &error) {
     std::error_code code;
     std::filesystem::create_directories(folder, code);
     // What a killed daemon leaves mounted answers everything with this error.
     if (code == std::errc::not_connected) {
         error = folder +
                 " is still the mount point of a cache device that has ended; run: umount " + folder;
-        return -1;
+        return false;
     }
     if (code) {
         error = "cannot make the folder " + folder + ": " + code.message();
-        return -1;
+        return false;
     }
     if (IsMountPoint(folder)) {
         error = folder + " is a mount point already";
-        return -1;
+        return false;
     }
     const bool isEmpty = std::filesystem::is_empty(folder, code);
     if (code || !isEmpty) {
         error = "the folder " + folder +
                 (code ? " cannot be read: " + code.message()
                       : " is not empty: what it holds would be hidden behind the device");
-        return -1;
+        return false;
     }
-    return 0;
+    return true;
 }
 
-int CachedevServe(ServedDevice &served, const std::string &folder) {
+bool CachedevServe(ServedDevice &served, const std::string &folder) {
     const SessionPtr session = MakeSession(served);
     if (!session) {
         fprintf(stderr, "veskcachedev: libfuse cannot be started\n");
-        return -1;
+        return false;
     }
     if (fuse_set_signal_handlers(session.get()) != 0) {
         fprintf(stderr, "veskcachedev: cannot set the signal handlers\n");
-        return -1;
+        return false;
     }
     const HandlersPtr removeHandlers(session.get());
     // libfuse names the cause itself: no /dev/fuse, no right to mount.
     if (fuse_session_mount(session.get(), folder.c_str()) != 0) {
         fprintf(stderr, "veskcachedev: cannot mount a FUSE filesystem on %s\n", folder.c_str());
-        return -1;
+        return false;
     }
     const MountPtr unmount(session.get());
     const LoopConfigPtr config(fuse_loop_cfg_create());
     if (!config) {
         fprintf(stderr, "veskcachedev: out of memory\n");
-        return -1;
+        return false;
     }
     // One descriptor per thread keeps the threads out of each other's queues.
     fuse_loop_cfg_set_clone_fd(config.get(), 1);
     const int result = fuse_session_loop_mt(session.get(), config.get());
     if (result < 0) { // above 0: the signal that ended it
         fprintf(stderr, "veskcachedev: serving ended with an error: %s\n", strerror(-result));
-        return -1;
+        return false;
     }
-    return 0;
+    return true;
 }

@@ -80,23 +80,13 @@ bool ParsePidFile(const std::string &text, std::string &pidFile) {
     return true;
 }
 
-bool ApplyFailIoctl(const std::string &text, CacheFaults &faults) {
+template <typename Number> bool ApplyFault(const std::string &text, std::map<Number, int> &faults) {
     uint64_t number = 0;
     int error = 0;
-    if (!ParseFault(text, UINT32_MAX, number, error)) {
+    if (!ParseFault(text, std::numeric_limits<Number>::max(), number, error)) {
         return false;
     }
-    faults.failRequest[static_cast<uint32_t>(number)] = error;
-    return true;
-}
-
-bool ApplyFailRead(const std::string &text, CacheFaults &faults) {
-    uint64_t offset = 0;
-    int error = 0;
-    if (!ParseFault(text, UINT64_MAX, offset, error)) {
-        return false;
-    }
-    faults.failRead[offset] = error;
+    faults[static_cast<Number>(number)] = error;
     return true;
 }
 
@@ -119,8 +109,8 @@ bool Apply(int code, const std::string &value, CachedevOptions &options) {
     case kMissDelay: return ApplyMissDelay(value, options.settings.missDelayMs);
     case kForeground: options.foreground = true; return true;
     case kPidFile: return ParsePidFile(value, options.pidFile);
-    case kFailIoctl: return ApplyFailIoctl(value, faults);
-    case kFailRead: return ApplyFailRead(value, faults);
+    case kFailIoctl: return ApplyFault(value, faults.failRequest);
+    case kFailRead: return ApplyFault(value, faults.failRead);
     case kShortAt: return ParseNumber(value, UINT64_MAX, faults.shortAt);
     case kHelp: options.help = true; return true;
     default: return false;
@@ -129,8 +119,8 @@ bool Apply(int code, const std::string &value, CachedevOptions &options) {
 
 } // namespace
 
-int CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
-                         std::string &error) {
+bool CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
+                          std::string &error) {
     options = CachedevOptions();
     optind = 0; // starts getopt afresh, also after an earlier parse
     opterr = 0; // the messages are written here
@@ -143,26 +133,26 @@ int CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
             const bool isLetter = optopt > 0 && optopt < kDevice;
             error = std::string(code == ':' ? "no value after " : "unknown option ") +
                     (isLetter ? std::string("-") + static_cast<char>(optopt) : argv[optind - 1]);
-            return -1;
+            return false;
         }
         const std::string value = optarg != nullptr ? optarg : "";
         if (!Apply(code, value, options)) {
             error = "bad value for --" + std::string(kOptions[index].name) + ": " + value;
-            return -1;
+            return false;
         }
     }
     if (options.help) {
-        return 0;
+        return true;
     }
     if (optind < argc) {
         error = std::string("unexpected argument ") + argv[optind];
-        return -1;
+        return false;
     }
     if (options.deviceName.empty() || options.backingPath.empty() || options.ssdPath.empty()) {
         error = "--device, --backing and --ssd are needed";
-        return -1;
+        return false;
     }
-    return 0;
+    return true;
 }
 
 const char *CachedevUsage() {

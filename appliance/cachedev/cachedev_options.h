@@ -16,9 +16,10 @@ struct CachedevOptions {
     bool help = false; // print the usage and do nothing else
 };
 
-// Fills `options` from the arguments of main. 0, or -1 with a message for the user in `error`. With
-// --help nothing else is checked.
-int CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options, std::string &error);
+// Fills `options` from the arguments of main. False: `error` is a message for the user. With --help
+// nothing else is checked.
+bool CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
+                          std::string &error);
 
 // The usage text.
 const char *CachedevUsage();

@@ -32,20 +32,20 @@ struct PidFile {
     PidFile &operator=(const PidFile &) = delete;
 };
 
-int WritePidFile(const std::string &path, PidFile &file) {
+bool WritePidFile(const std::string &path, PidFile &file) {
     std::ofstream stream(path, std::ios::trunc);
     stream << getpid() << '\n';
     if (!stream.flush()) {
-        return -1;
+        return false;
     }
     file.path = path;
-    return 0;
+    return true;
 }
 
 int Run(int argc, char **argv) {
     CachedevOptions options;
     std::string error;
-    if (CachedevOptionsParse(argc, argv, options, error) != 0) {
+    if (!CachedevOptionsParse(argc, argv, options, error)) {
         return Fail(error + "\nTry 'veskcachedev --help'.");
     }
     if (options.help) {
@@ -53,21 +53,21 @@ int Run(int argc, char **argv) {
         return fflush(stdout) == 0 ? 0 : 1;
     }
     Background background;
-    if (!options.foreground && BackgroundStart(background) != 0) {
+    if (!options.foreground && !BackgroundStart(background)) {
         return 1;
     }
 
     CacheDevice device;
     device.settings = options.settings;
-    if (CacheImagesOpen(options.backingPath, options.ssdPath, device.images, error) != 0) {
+    if (!CacheImagesOpen(options.backingPath, options.ssdPath, device.images, error)) {
         return Fail(error);
     }
     CacheDeviceStart(device);
-    if (CachedevPrepareFolder(options.folder, error) != 0) {
+    if (!CachedevPrepareFolder(options.folder, error)) {
         return Fail(error);
     }
     PidFile pidFile;
-    if (!options.pidFile.empty() && WritePidFile(options.pidFile, pidFile) != 0) {
+    if (!options.pidFile.empty() && !WritePidFile(options.pidFile, pidFile)) {
         return Fail("cannot write " + options.pidFile + ": " + strerror(errno));
     }
 
@@ -77,12 +77,12 @@ int Run(int argc, char **argv) {
                            time(nullptr),
                            [&background] { BackgroundReady(background); },
                            {}};
-    const int result = CachedevServe(served, options.folder);
+    const bool isServed = CachedevServe(served, options.folder);
     const int synced = CacheImagesSyncAll(device.images);
     if (synced != 0) {
         return Fail(std::string("cannot sync the images: ") + strerror(-synced));
     }
-    return result == 0 ? 0 : 1;
+    return isServed ? 0 : 1;
 }
 
 } // namespace

@@ -37,7 +37,7 @@ Lookup CacheFind(std::string CacheConfigEntry::*field, const char *text, CacheCo
     return Lookup::NotFound;
 }
 
-int ConfigGet(const char *spaceUuid, VESKFlashCacheConfig **config) {
+int ConfigGet(const char *spaceUuid, VESKFlashCacheConfig *&config) {
     CacheConfigEntry cache;
     const Lookup lookup = CacheFind(&CacheConfigEntry::spaceUuid, spaceUuid, cache);
     if (lookup != Lookup::Found) {
@@ -47,11 +47,11 @@ int ConfigGet(const char *spaceUuid, VESKFlashCacheConfig **config) {
     if (found == nullptr || (found->ssdPath = strdup(cache.ssdPath.c_str())) == nullptr) {
         return -1;
     }
-    *config = found.release();
+    config = found.release();
     return 1;
 }
 
-int StatGet(const char *ssdPath, VESKFlashCacheStat **stat) {
+int StatGet(const char *ssdPath, VESKFlashCacheStat *&stat) {
     CacheConfigEntry cache;
     const Lookup lookup = CacheFind(&CacheConfigEntry::ssdPath, ssdPath, cache);
     if (lookup != Lookup::Found) {
@@ -64,7 +64,7 @@ int StatGet(const char *ssdPath, VESKFlashCacheStat **stat) {
     }
     found->state = state.isUp ? 1 : 0;
     found->supportPin = state.supportsPin ? 1 : 0;
-    *stat = found;
+    stat = found;
     return 1;
 }
 
@@ -90,7 +90,7 @@ extern "C" int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query
         return -1;
     }
     try {
-        return ConfigGet(query->spaceUuid, config);
+        return ConfigGet(query->spaceUuid, *config);
     } catch (const std::exception &) {
         return -1;
     }
@@ -113,7 +113,7 @@ extern "C" int VESKFlashCacheStatGet(const VESKFlashCacheStatQuery *query,
         return -1;
     }
     try {
-        return StatGet(query->ssdPath, stat);
+        return StatGet(query->ssdPath, *stat);
     } catch (const std::exception &) {
         return -1;
     }

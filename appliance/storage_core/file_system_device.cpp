@@ -1,10 +1,10 @@
-#include "storage_core/file_system_device.h"
+#include "vesk/storage_core.h"
 
 #include "base/malloc_text.h"
 #include "storage_core/block_device.h"
 #include "storage_core/directory_entry.h"
 #include "storage_core/file_extents.h"
-#include "vesk/storage_core.h"
+#include "storage_core/mount_table.h"
 
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
@@ -76,14 +76,6 @@ MountEntry MountOfDevice(const std::string &devicePath, dev_t number) {
 }
 
 } // namespace
-
-bool FileSystemIsMappable(const MountEntry &mount) {
-    if (mount.type == "xfs") {
-        // Extents on a separate realtime device are addressed from that device's start.
-        return MountOptionValue(mount, "rtdev").empty();
-    }
-    return mount.type == "ext2" || mount.type == "ext3" || mount.type == "ext4";
-}
 
 FileMappingTable::~FileMappingTable() = default;
 

@@ -80,3 +80,11 @@ std::string MountOptionValue(const MountEntry &entry, const char *name) {
     }
     return std::string(value, length);
 }
+
+bool FileSystemIsMappable(const MountEntry &mount) {
+    if (mount.type == "xfs") {
+        // Extents on a separate realtime device are addressed from that device's start.
+        return MountOptionValue(mount, "rtdev").empty();
+    }
+    return mount.type == "ext2" || mount.type == "ext3" || mount.type == "ext4";
+}

@@ -42,4 +42,8 @@ const MountEntry *MountFindByPath(const std::vector<MountEntry> &entries, const 
 // The value of one of the mount's filesystem options; empty where it is absent or has no value.
 std::string MountOptionValue(const MountEntry &entry, const char *name);
 
+// Whether the addresses that the kernel gives for a file of this mounted filesystem are offsets on
+// its block device.
+bool FileSystemIsMappable(const MountEntry &mount);
+
 #endif

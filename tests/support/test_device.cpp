@@ -15,7 +15,7 @@ TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
     WriteWhole(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(ssdPath, slots * kBlockBytes);
     std::string error;
-    if (CacheImagesOpen(backingPath, ssdPath, device.images, error) != 0) {
+    if (!CacheImagesOpen(backingPath, ssdPath, device.images, error)) {
         throw std::runtime_error(error);
     }
     CacheDeviceStart(device);

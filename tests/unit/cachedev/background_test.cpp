@@ -14,7 +14,7 @@ int StatusOf(const std::function<void(Background &)> &daemon) {
     const pid_t child = fork();
     if (child == 0) {
         Background background;
-        if (BackgroundStart(background) != 0) {
+        if (!BackgroundStart(background)) {
             _exit(99);
         }
         daemon(background);

@@ -16,7 +16,7 @@ struct CacheImagesTest : testing::Test {
     std::string error;
 
     std::string Path(const char *name) const { return folder.Path(name); }
-    int Open() { return CacheImagesOpen(Path("backing"), Path("ssd"), images, error); }
+    bool Open() { return CacheImagesOpen(Path("backing"), Path("ssd"), images, error); }
     bool ErrorHas(const char *text) const { return error.find(text) != std::string::npos; }
 };
 
@@ -31,20 +31,20 @@ ImagePieces Piece(std::string &bytes) {
 TEST_F(CacheImagesTest, SizesAreTaken) {
     TestMakeFile(Path("backing"), kSectorBytes * 131);
     TestMakeFile(Path("ssd"), 3 * kBlockBytes - 1);
-    ASSERT_EQ(Open(), 0) << error;
+    ASSERT_TRUE(Open()) << error;
     EXPECT_EQ(images.deviceBytes, kSectorBytes * 131);
     EXPECT_EQ(images.slots, 2U);
 }
 
 TEST_F(CacheImagesTest, RefusesWhatCannotBeServed) {
     TestMakeFile(Path("ssd"), kBlockBytes);
-    EXPECT_EQ(Open(), -1);
+    EXPECT_FALSE(Open());
     EXPECT_TRUE(ErrorHas("backing")) << error;
     EXPECT_TRUE(ErrorHas("No such file")) << error;
     for (const uint64_t bytes : {0U, 511U, 513U}) {
         TestMakeFile(Path("backing"), bytes);
         CacheImages fresh;
-        EXPECT_EQ(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error), -1) << bytes;
+        EXPECT_FALSE(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error)) << bytes;
         EXPECT_TRUE(ErrorHas("512")) << error;
     }
 }
@@ -52,19 +52,19 @@ TEST_F(CacheImagesTest, RefusesWhatCannotBeServed) {
 TEST_F(CacheImagesTest, RefusesAnSsdSmallerThanOneBlock) {
     TestMakeFile(Path("backing"), 512);
     TestMakeFile(Path("ssd"), kBlockBytes - 1);
-    EXPECT_EQ(Open(), -1);
+    EXPECT_FALSE(Open());
     EXPECT_TRUE(ErrorHas("smaller than one cache block")) << error;
 }
 
 TEST_F(CacheImagesTest, RefusesFoldersAndTheSameFileTwice) {
     TestMakeFile(Path("backing"), 512);
     std::filesystem::create_directory(Path("ssd"));
-    EXPECT_EQ(Open(), -1);
+    EXPECT_FALSE(Open());
     std::filesystem::remove(Path("ssd"));
     TestMakeFile(Path("backing"), kBlockBytes);
     std::filesystem::create_hard_link(Path("backing"), Path("ssd"));
     CacheImages fresh;
-    EXPECT_EQ(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error), -1);
+    EXPECT_FALSE(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error));
     EXPECT_TRUE(ErrorHas("same file")) << error;
 }
 
@@ -72,16 +72,16 @@ TEST_F(CacheImagesTest, ImagesBelongToOneDeviceAtATime) {
     TestMakeFile(Path("backing"), 512);
     TestMakeFile(Path("ssd"), kBlockBytes);
     TestMakeFile(Path("other"), kBlockBytes);
-    ASSERT_EQ(Open(), 0) << error;
+    ASSERT_TRUE(Open()) << error;
     CacheImages second;
-    EXPECT_EQ(CacheImagesOpen(Path("other"), Path("ssd"), second, error), -1);
+    EXPECT_FALSE(CacheImagesOpen(Path("other"), Path("ssd"), second, error));
     EXPECT_TRUE(ErrorHas("in use")) << error;
 }
 
 TEST_F(CacheImagesTest, TransfersGatherAndScatter) {
     TestMakeFile(Path("backing"), 4096);
     TestMakeFile(Path("ssd"), kBlockBytes);
-    ASSERT_EQ(Open(), 0) << error;
+    ASSERT_TRUE(Open()) << error;
     std::string one = "one";
     std::string none;
     std::string two = "second";
@@ -106,7 +106,7 @@ TEST_F(CacheImagesTest, TransfersGatherAndScatter) {
 TEST_F(CacheImagesTest, AnImageThatEndsTooEarlyIsAnError) {
     TestMakeFile(Path("backing"), 4096);
     TestMakeFile(Path("ssd"), kBlockBytes);
-    ASSERT_EQ(Open(), 0) << error;
+    ASSERT_TRUE(Open()) << error;
     std::string bytes(1024, ' ');
     EXPECT_EQ(CacheImagesReadBacking(images, 4096 - 512, Piece(bytes)), -EIO);
     EXPECT_EQ(CacheImagesReadSsd(images, kBlockBytes - 1023, Piece(bytes)), -EIO);
@@ -116,7 +116,7 @@ TEST_F(CacheImagesTest, AnImageThatEndsTooEarlyIsAnError) {
 TEST_F(CacheImagesTest, SlotsAreMappedAndSystemCallsFailOnLostOnes) {
     TestMakeFile(Path("backing"), kBlockBytes);
     TestMakeFile(Path("ssd"), 2 * kBlockBytes);
-    ASSERT_EQ(Open(), 0) << error;
+    ASSERT_TRUE(Open()) << error;
     std::string text = "in slot 1";
     ASSERT_EQ(CacheImagesWriteBacking(images, 0, Piece(text)), 0);
     ImagePieces slot;
@@ -131,7 +131,7 @@ TEST_F(CacheImagesTest, SlotsAreMappedAndSystemCallsFailOnLostOnes) {
 TEST_F(CacheImagesTest, SyncsSucceed) {
     TestMakeFile(Path("backing"), 512);
     TestMakeFile(Path("ssd"), kBlockBytes);
-    ASSERT_EQ(Open(), 0) << error;
+    ASSERT_TRUE(Open()) << error;
     EXPECT_EQ(CacheImagesSyncBacking(images), 0);
     EXPECT_EQ(CacheImagesSyncAll(images), 0);
 }

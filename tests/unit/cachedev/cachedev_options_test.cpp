@@ -12,7 +12,7 @@ struct OptionsTest : testing::Test {
     CachedevOptions options;
     std::string error;
 
-    int Parse(std::vector<std::string> arguments) {
+    bool Parse(std::vector<std::string> arguments) {
         arguments.insert(arguments.begin(), "veskcachedev");
         std::vector<char *> argv;
         argv.reserve(arguments.size() + 1);
@@ -25,7 +25,7 @@ struct OptionsTest : testing::Test {
     }
 
     // With the three that are always needed.
-    int ParseMore(std::vector<std::string> arguments) {
+    bool ParseMore(std::vector<std::string> arguments) {
         for (const char *needed : {"--device=/run/vesk/cachedev_0", "--backing=b", "--ssd=s"}) {
             arguments.emplace_back(needed);
         }
@@ -36,8 +36,7 @@ struct OptionsTest : testing::Test {
 } // namespace
 
 TEST_F(OptionsTest, TheUsualOnes) {
-    ASSERT_EQ(Parse({"--device", "/run/vesk/cachedev_0", "--backing", "b.img", "--ssd", "s.img"}),
-              0)
+    ASSERT_TRUE(Parse({"--device", "/run/vesk/cachedev_0", "--backing", "b.img", "--ssd", "s.img"}))
         << error;
     EXPECT_EQ(options.folder, "/run/vesk");
     EXPECT_EQ(options.deviceName, "cachedev_0");
@@ -53,10 +52,9 @@ TEST_F(OptionsTest, TheUsualOnes) {
 }
 
 TEST_F(OptionsTest, AllOthers) {
-    ASSERT_EQ(ParseMore({"--miss-delay-ms=25", "--foreground", "--pid-file=/p", "--fail-ioctl",
-                         "0xFECF:5", "--fail-ioctl=65233:16", "--fail-read=4096:5",
-                         "--fail-read=0x100000000:61", "--short-at=123456789012"}),
-              0)
+    ASSERT_TRUE(ParseMore({"--miss-delay-ms=25", "--foreground", "--pid-file=/p", "--fail-ioctl",
+                           "0xFECF:5", "--fail-ioctl=65233:16", "--fail-read=4096:5",
+                           "--fail-read=0x100000000:61", "--short-at=123456789012"}))
         << error;
     const CacheFaults &faults = options.settings.faults;
     EXPECT_EQ(options.settings.missDelayMs, 25U);
@@ -70,23 +68,22 @@ TEST_F(OptionsTest, AllOthers) {
 TEST_F(OptionsTest, RelativePathsAreMadeAbsolute) {
     char folder[PATH_MAX];
     ASSERT_NE(getcwd(folder, sizeof folder), nullptr);
-    ASSERT_EQ(Parse({"--device", "x/../dev", "--backing=b", "--ssd=s", "--pid-file=p"}), 0)
-        << error;
+    ASSERT_TRUE(Parse({"--device", "x/../dev", "--backing=b", "--ssd=s", "--pid-file=p"})) << error;
     EXPECT_EQ(options.folder, folder);
     EXPECT_EQ(options.deviceName, "dev");
     EXPECT_EQ(options.pidFile, std::string(folder) + "/p");
 }
 
 TEST_F(OptionsTest, WhatIsNeededIsMissing) {
-    EXPECT_EQ(Parse({}), -1);
-    EXPECT_EQ(Parse({"--device=/a/b", "--backing=b"}), -1);
-    EXPECT_EQ(Parse({"--device=/a/b", "--ssd=b"}), -1);
-    EXPECT_EQ(Parse({"--backing=b", "--ssd=s"}), -1);
+    EXPECT_FALSE(Parse({}));
+    EXPECT_FALSE(Parse({"--device=/a/b", "--backing=b"}));
+    EXPECT_FALSE(Parse({"--device=/a/b", "--ssd=b"}));
+    EXPECT_FALSE(Parse({"--backing=b", "--ssd=s"}));
     EXPECT_NE(error.find("--device, --backing and --ssd"), std::string::npos) << error;
 }
 
 TEST_F(OptionsTest, HelpNeedsNothing) {
-    EXPECT_EQ(Parse({"--help"}), 0);
+    EXPECT_TRUE(Parse({"--help"}));
     EXPECT_TRUE(options.help);
     for (const char *name : {"--device", "--backing", "--ssd", "--miss-delay-ms", "--foreground",
                              "--pid-file", "--fail-ioctl", "--fail-read", "--short-at", "--help"}) {
@@ -117,18 +114,18 @@ TEST_F(OptionsTest, BadValuesAreNamed) {
                             "--short-at=",
                             "--short-at=0x",
                             "--short-at=ten"}) {
-        EXPECT_EQ(ParseMore({bad}), -1) << bad;
+        EXPECT_FALSE(ParseMore({bad})) << bad;
         EXPECT_EQ(error.rfind("bad value for --", 0), 0U) << error;
     }
 }
 
 TEST_F(OptionsTest, WhatIsUnknownIsNamed) {
-    EXPECT_EQ(ParseMore({"--frobnicate"}), -1);
+    EXPECT_FALSE(ParseMore({"--frobnicate"}));
     EXPECT_EQ(error, "unknown option --frobnicate");
-    EXPECT_EQ(ParseMore({"-xy"}), -1);
+    EXPECT_FALSE(ParseMore({"-xy"}));
     EXPECT_EQ(error, "unknown option -x");
-    EXPECT_EQ(Parse({"--device"}), -1);
+    EXPECT_FALSE(Parse({"--device"}));
     EXPECT_EQ(error, "no value after --device");
-    EXPECT_EQ(ParseMore({"stray"}), -1);
+    EXPECT_FALSE(ParseMore({"stray"}));
     EXPECT_EQ(error, "unexpected argument stray");
 }

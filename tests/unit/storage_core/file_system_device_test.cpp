@@ -1,4 +1,4 @@
-#include "storage_core/file_system_device.h"
+#include "storage_core/mount_table.h"
 
 #include "tests/support/test_volume.h"
 #include "vesk/storage_core.h"
@@ -152,12 +152,11 @@ TEST_F(FileSystem, CreateOnUnmountedDevices) {
             GTEST_SKIP() << volume.skipReason;
         }
         const std::string path = volume.device;
-        const int held = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-        ASSERT_GE(held, 0);
+        const ScopedFd held(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+        ASSERT_TRUE(held.IsOpen());
         volume.Unmount();
         const DevicePointer created(FileSystemDeviceCreater::Create(path));
         EXPECT_EQ(created != nullptr, kind.isUsable) << kind.name;
-        close(held);
     }
 }
 
