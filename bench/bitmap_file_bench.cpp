@@ -2,9 +2,9 @@
 #include "bench_names.h"
 
 #include "base/log.h"
+#include "base/scoped_fd.h"
 #include "bitmap/bitmap_file.h"
 
-#include <cstdio>
 #include <fcntl.h>
 #include <unistd.h>
 #include <vector>
@@ -16,9 +16,8 @@ const int64_t fullBytes = 32 << 20;
 const size_t chunk = 4096;
 
 void MakeFile(const std::vector<unsigned char> &bytes) {
-    FILE *file = fopen(path, "w");
-    fwrite(bytes.data(), 1, bytes.size(), file);
-    fclose(file);
+    const ScopedFd file(open(path, O_WRONLY | O_CREAT | O_TRUNC, 0644));
+    benchmark::DoNotOptimize(write(file.Get(), bytes.data(), bytes.size()));
 }
 
 template <typename Operation> void WithFile(benchmark::State &state, Operation operation) {
@@ -38,11 +37,10 @@ void Load(benchmark::State &state) {
 
 void LoadPlainly(benchmark::State &state) {
     WithFile(state, [](PinBitmap *bitmap) {
-        const int fd = open(path, O_RDONLY);
+        const ScopedFd file(open(path, O_RDONLY));
         for (size_t at = 0; at < bitmap->size; at += chunk) {
-            benchmark::DoNotOptimize(read(fd, bitmap->data + at, chunk));
+            benchmark::DoNotOptimize(read(file.Get(), bitmap->data + at, chunk));
         }
-        close(fd);
     });
 }
 
@@ -52,11 +50,10 @@ void Save(benchmark::State &state) {
 
 void SavePlainly(benchmark::State &state) {
     WithFile(state, [](PinBitmap *bitmap) {
-        const int fd = open(path, O_RDWR | O_CREAT, 0644);
+        const ScopedFd file(open(path, O_RDWR | O_CREAT, 0644));
         for (size_t at = 0; at < bitmap->size; at += chunk) {
-            benchmark::DoNotOptimize(write(fd, bitmap->data + at, chunk));
+            benchmark::DoNotOptimize(write(file.Get(), bitmap->data + at, chunk));
         }
-        close(fd);
     });
 }
 

@@ -3,6 +3,7 @@
 #include "bench_names.h"
 
 #include "base/log.h"
+#include "base/scoped_fd.h"
 #include "bitmap/bit_runs.h"
 #include "bitmap/pin_bitmap.h"
 #include "state/service_state.h"
@@ -47,11 +48,11 @@ Bytes OnePercent(size_t size) {
 }
 
 void MakeDevice(size_t bitmapBytes) {
-    const int fd = open(device, O_RDWR | O_CREAT, 0600);
-    if (fd < 0 || ftruncate(fd, static_cast<off_t>(bitmapBytes) << bitmapSizeShift) != 0) {
+    const ScopedFd file(open(device, O_RDWR | O_CREAT, 0600));
+    if (!file.IsOpen() ||
+        ftruncate(file.Get(), static_cast<off_t>(bitmapBytes) << bitmapSizeShift) != 0) {
         abort();
     }
-    close(fd);
 }
 
 template <Bytes (*make)(size_t)> void Walk(benchmark::State &state) {
@@ -83,14 +84,14 @@ template <Bytes (*make)(size_t)> void Reads(benchmark::State &state) {
     const std::vector<BitRun> runs = BitRunsOf(bytes.data(), bytes.size());
     const WarmBuffer buffer = WarmBufferAllocate();
     for (auto _ : state) {
-        const int fd = open(device, O_RDONLY | O_DIRECT);
+        const ScopedFd file(open(device, O_RDONLY | O_DIRECT));
         for (const BitRun &run : runs) {
             for (uint64_t block = 0; block < run.count; ++block) {
-                lseek(fd, static_cast<off_t>((run.first + block) << bitmapByteShift), SEEK_SET);
-                benchmark::DoNotOptimize(read(fd, buffer.get(), warmBufferBytes));
+                lseek(file.Get(), static_cast<off_t>((run.first + block) << bitmapByteShift),
+                      SEEK_SET);
+                benchmark::DoNotOptimize(read(file.Get(), buffer.get(), warmBufferBytes));
             }
         }
-        close(fd);
     }
     unlink(device);
 }

@@ -1,6 +1,6 @@
 #include "files/file_leftovers.h"
 
-#include "files/temporary_name.h"
+#include "base/deleter.h"
 
 #include <cerrno>
 #include <csignal>
@@ -19,10 +19,6 @@ namespace {
 // A process of another PID namespace looks gone while it is still at work, though not for this
 // long.
 const time_t quietSeconds = 60;
-
-struct FolderCloser {
-    void operator()(DIR *folder) const { closedir(folder); }
-};
 
 // The process id in the name of a temporary file, or 0.
 pid_t ProcessOf(const char *name) {
@@ -56,7 +52,7 @@ void FileRemoveLeftovers(const char *path) {
     const char *slash = strrchr(path, '/');
     const std::string folderPath =
         slash == nullptr ? "." : std::string(path, static_cast<size_t>(slash - path) + 1);
-    const std::unique_ptr<DIR, FolderCloser> folder(opendir(folderPath.c_str()));
+    const std::unique_ptr<DIR, Deleter<closedir>> folder(opendir(folderPath.c_str()));
     if (!folder) {
         return;
     }

@@ -5,6 +5,11 @@
 #ifndef FILES_FILE_LEFTOVERS_H
 #define FILES_FILE_LEFTOVERS_H
 
+// The names of the temporary files through which a file is replaced:
+// ".veskcachepinfile." + process id + "." + a number + ".tmp".
+const char temporaryPrefix[] = ".veskcachepinfile.";
+const char temporarySuffix[] = ".tmp";
+
 // Removes the temporary files beside `path` whose process is gone and that nobody has written to
 // for a minute; what cannot be removed stays. Never logs.
 void FileRemoveLeftovers(const char *path);

@@ -2,7 +2,7 @@
 
 #include "base/malloc_text.h"
 #include "base/scoped_fd.h"
-#include "files/temporary_name.h"
+#include "files/file_leftovers.h"
 
 #include <atomic>
 #include <cerrno>

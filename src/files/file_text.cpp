@@ -1,5 +1,6 @@
 #include "files/file_text.h"
 
+#include "base/deleter.h"
 #include "base/log.h"
 #include "base/malloc_text.h"
 
@@ -9,10 +10,7 @@
 
 namespace {
 
-struct StreamCloser {
-    void operator()(FILE *stream) const { fclose(stream); }
-};
-using Stream = std::unique_ptr<FILE, StreamCloser>;
+using Stream = std::unique_ptr<FILE, Deleter<fclose>>;
 
 } // namespace
 

@@ -1,5 +1,6 @@
 #include "tests/faults/child.h"
 
+#include "base/deleter.h"
 #include "tests/faults/world.h"
 
 #include <algorithm>
@@ -74,12 +75,11 @@ bool IsInCall(pid_t pid, const std::string &thread,
 }
 
 int CountDescriptors(pid_t pid) {
+    const std::unique_ptr<DIR, Deleter<closedir>> folder(
+        opendir(("/proc/" + std::to_string(pid) + "/fd").c_str()));
     int count = 0;
-    if (DIR *folder = opendir(("/proc/" + std::to_string(pid) + "/fd").c_str())) {
-        while (readdir(folder) != nullptr) {
-            ++count;
-        }
-        closedir(folder);
+    while (folder && readdir(folder.get()) != nullptr) {
+        ++count;
     }
     return count;
 }

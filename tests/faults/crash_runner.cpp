@@ -14,7 +14,6 @@
 #include <csignal>
 #include <cstdio>
 #include <filesystem>
-#include <fstream>
 #include <unistd.h>
 
 namespace {
@@ -41,13 +40,9 @@ std::string DriverBits() {
     return at == std::string::npos ? "" : state.substr(at, state.find("]]", at) - at);
 }
 
-void Write(const std::string &path, const std::string &content) {
-    std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
-}
-
 // A change of a block that holds nothing hands the bitmap file over, whatever the driver has.
 void TellDriver(const Program &program, const std::string &bitmap) {
-    Write(bitmapFile, bitmap);
+    WorldWrite(bitmapFile, bitmap);
     Child(program,
           {"--unset-bitmap", "--mount-path", "/volume1", "--start-sector", "130944",
            "--num-sectors", "128"},
@@ -102,13 +97,13 @@ void Restore(const Program &program, const CrashPoint &point) {
     std::filesystem::remove(config);
     TellDriver(program, point.driverBitmap);
     for (const auto &[path, content] : point.files) {
-        Write(path, content);
+        WorldWrite(path, content);
     }
 }
 
 // The requests that the document has, carried out or not.
 size_t RequestsIn(const Files &files, long first) {
-    Write("/run/faults/document", files.count(config) == 0 ? "" : files.at(config));
+    WorldWrite("/run/faults/document", files.count(config) == 0 ? "" : files.at(config));
     const long next = WorldNextNumber("/run/faults/document");
     std::filesystem::remove("/run/faults/document");
     return next == 0 ? 0 : static_cast<size_t>(next - first);
@@ -183,8 +178,8 @@ int main(int argc, char *argv[]) {
         fprintf(stderr, "usage: crash_runner TOOL PRELOAD RECORD\n");
         return 2;
     }
-    Write("/volume1/c", std::string(200000, 'c'));
-    Write("/tmp/veskcachepinfiletool.debug", "/volume1/c\n");
+    WorldWrite("/volume1/c", std::string(200000, 'c'));
+    WorldWrite("/tmp/veskcachepinfiletool.debug", "/volume1/c\n");
     sync();
     size_t points = 0;
     size_t broken = 0;

@@ -5,7 +5,6 @@
 // options, and covers the program and its libraries, but not what the C library calls inside
 // itself. When the call is reached, a byte goes to descriptor 9. At the program's orderly end the
 // number of allocations that are not freed follows there as " N".
-#include "tests/faults/fail_call.h"
 #include "tests/faults/real_call.h"
 
 #include <atomic>
@@ -65,10 +64,6 @@ __attribute__((destructor)) void ReportLive() {
     char text[32];
     const int length = snprintf(text, sizeof(text), " %ld", live.load());
     syscall(SYS_write, reportFd, text, static_cast<size_t>(length));
-}
-
-mode_t ModeOf(int flags, va_list arguments) {
-    return (flags & O_CREAT) != 0 ? static_cast<mode_t>(va_arg(arguments, int)) : 0;
 }
 
 // A transfer of half the length, or the failure.

@@ -1,6 +1,5 @@
 // The functions of the appliance's libraries, which fail as one kind, "library": each in the way
 // that its declaration says.
-#include "tests/faults/fail_call.h"
 #include "tests/faults/real_call.h"
 
 #include "vesk/flash_cache.h"

@@ -72,7 +72,7 @@ int open64(const char *path, int flags, ...) {
     static const auto real = REAL(open64);
     va_list arguments;
     va_start(arguments, flags);
-    const auto mode = (flags & O_CREAT) != 0 ? static_cast<mode_t>(va_arg(arguments, int)) : 0;
+    const mode_t mode = ModeOf(flags, arguments);
     va_end(arguments);
     const std::lock_guard<std::mutex> lock(Order());
     const bool existed = access(path, F_OK) == 0;
@@ -84,7 +84,7 @@ int openat64(int folder, const char *path, int flags, ...) {
     static const auto real = REAL(openat64);
     va_list arguments;
     va_start(arguments, flags);
-    const auto mode = (flags & O_CREAT) != 0 ? static_cast<mode_t>(va_arg(arguments, int)) : 0;
+    const mode_t mode = ModeOf(flags, arguments);
     va_end(arguments);
     const std::lock_guard<std::mutex> lock(Order());
     const bool existed = faccessat(folder, path, F_OK, 0) == 0;

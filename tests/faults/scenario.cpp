@@ -3,9 +3,6 @@
 #include "tests/faults/child.h"
 #include "tests/faults/world.h"
 
-#include <json/reader.h>
-#include <json/value.h>
-#include <memory>
 #include <signal.h>
 
 namespace {
@@ -75,10 +72,7 @@ std::string LossComplaint(const Outcome &outcome) {
         }
     }
     Json::Value root;
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    const std::string &text = outcome.document;
-    if (!text.empty()) {
-        reader->parse(text.data(), text.data() + text.size(), &root, nullptr);
+    if (WorldParse(outcome.document, root)) {
         accounted += static_cast<int>(root["requestQueue"].size());
     }
     return accounted < given ? "a request is lost" : "";

@@ -6,7 +6,6 @@
 #include <fstream>
 #include <iterator>
 #include <json/reader.h>
-#include <json/value.h>
 #include <memory>
 #include <sys/ipc.h>
 #include <sys/msg.h>
@@ -36,10 +35,6 @@ std::string Inode(const char *path) {
     return std::to_string(status.st_ino);
 }
 
-void Write(const std::string &path, const std::string &content) {
-    std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
-}
-
 int Queue() {
     const key_t key = ftok(keyFile, 'x');
     return key == -1 ? -1 : msgget(key, 0);
@@ -54,10 +49,10 @@ void RemoveQueue() {
 }
 
 void Send(const std::vector<char> &messages) {
-    Write(keyFile, "");
+    WorldWrite(keyFile, "");
     const key_t key = ftok(keyFile, 'x');
     const int queue = msgget(key, IPC_CREAT | 0644);
-    Write(keyFile, std::to_string(key));
+    WorldWrite(keyFile, std::to_string(key));
     for (const char kind : messages) {
         Message message;
         message.record.type = kind == 'u' ? 2 : kind == 'r' || kind == 'g' ? 6 : 1;
@@ -96,8 +91,8 @@ void WorldReset(const char *config, const std::vector<char> &messages) {
     const std::filesystem::path folder = std::filesystem::path(config).parent_path();
     std::filesystem::remove_all(folder);
     std::filesystem::create_directories(folder);
-    Write(config, WorldDocument());
-    Write(bitmapFile, WorldBitmap());
+    WorldWrite(config, WorldDocument());
+    WorldWrite(bitmapFile, WorldBitmap());
     RemoveQueue();
     messagesSent = messages.size();
     if (!messages.empty()) {
@@ -132,8 +127,7 @@ void WorldAwaitQueue() {
 
 long WorldRecords(const char *config) {
     Json::Value root;
-    std::ifstream file(config);
-    Json::parseFromStream(Json::CharReaderBuilder(), file, &root, nullptr);
+    WorldParse(WorldRead(config), root);
     return static_cast<long>(root["volumes"]["/volume1"]["files"].size());
 }
 
@@ -142,8 +136,7 @@ std::string WorldComplaint(const std::string &text) {
         return "";
     }
     Json::Value root;
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
-    if (!reader->parse(text.data(), text.data() + text.size(), &root, nullptr)) {
+    if (!WorldParse(text, root)) {
         return "the configuration file is damaged";
     }
     if (root["requestQueue"].size() != root["requests"].size()) {
@@ -171,9 +164,18 @@ bool WorldIsIdle(const char *config, long next) {
             text.find("\"requestQueue\"") == std::string::npos);
 }
 
+bool WorldParse(const std::string &text, Json::Value &root) {
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    return reader->parse(text.data(), text.data() + text.size(), &root, nullptr);
+}
+
 std::string WorldRead(const std::string &path) {
     std::ifstream file(path, std::ios::binary);
     return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+}
+
+void WorldWrite(const std::string &path, const std::string &content) {
+    std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
 }
 
 bool WorldLeftovers(const std::string &path) {

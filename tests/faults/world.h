@@ -2,6 +2,7 @@
 #ifndef TESTS_FAULTS_WORLD_H
 #define TESTS_FAULTS_WORLD_H
 
+#include <json/value.h>
 #include <string>
 #include <vector>
 
@@ -31,8 +32,12 @@ long WorldNextNumber(const char *config); // the number that the next request wi
 // the reverse. Empty: nothing, also where there is no document.
 std::string WorldComplaint(const std::string &document);
 
-// The file's content; empty where there is none.
+// The document of a text; false where it is none.
+bool WorldParse(const std::string &text, Json::Value &root);
+
+// The file's content; empty where there is none. And writing it whole.
 std::string WorldRead(const std::string &path);
+void WorldWrite(const std::string &path, const std::string &content);
 
 // Whether anything but the file is in its folder, beside the runs' own output.
 bool WorldLeftovers(const std::string &path);

@@ -17,11 +17,10 @@ std::string LastOf(const std::vector<std::string> &texts) {
     return texts.empty() ? "(none)" : texts.back();
 }
 
-CapturedLog::CapturedLog(int level) {
+CapturedLog::CapturedLog(int level)
+    : savedStdout_(dup(STDOUT_FILENO)), file_(memfd_create("captured-log", 0)) {
     fflush(stdout);
-    savedStdout_ = dup(STDOUT_FILENO);
-    file_ = memfd_create("captured-log", 0);
-    dup2(file_, STDOUT_FILENO);
+    dup2(file_.Get(), STDOUT_FILENO);
     LogToSyslog = 0;
     LogLevel = level;
     ProgramName = "tool";
@@ -31,17 +30,15 @@ CapturedLog::~CapturedLog() {
     // What a failed expectation had to say was caught, too.
     const std::string unseen = ::testing::Test::HasFailure() ? Text() : "";
     fflush(stdout);
-    dup2(savedStdout_, STDOUT_FILENO);
-    close(savedStdout_);
-    close(file_);
+    dup2(savedStdout_.Get(), STDOUT_FILENO);
     LogLevel = 1;
     fputs(unseen.c_str(), stdout);
 }
 
 std::string CapturedLog::Text() {
     fflush(stdout);
-    std::string text(static_cast<size_t>(lseek(file_, 0, SEEK_END)), '\0');
-    const ssize_t got = pread(file_, &text[0], text.size(), 0);
+    std::string text(static_cast<size_t>(lseek(file_.Get(), 0, SEEK_END)), '\0');
+    const ssize_t got = pread(file_.Get(), &text[0], text.size(), 0);
     text.resize(got < 0 ? 0 : static_cast<size_t>(got));
     return text;
 }

@@ -5,6 +5,8 @@
 #ifndef TESTS_SUPPORT_CAPTURED_LOG_H
 #define TESTS_SUPPORT_CAPTURED_LOG_H
 
+#include "base/scoped_fd.h"
+
 #include <string>
 #include <vector>
 
@@ -32,8 +34,8 @@ public:
     int Count(const std::string &message);
 
 private:
-    int savedStdout_;
-    int file_;
+    ScopedFd savedStdout_;
+    ScopedFd file_;
 };
 
 #endif

@@ -2,6 +2,7 @@
 
 #define FUSE_USE_VERSION 35
 
+#include "base/scoped_fd.h"
 #include "tests/support/test_volume.h"
 
 #include <fuse.h>
@@ -19,6 +20,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
+#include <utility>
 
 namespace {
 
@@ -53,7 +55,7 @@ int FakeIoctl(const char *, unsigned request, void *, fuse_file_info *, unsigned
 }
 
 // Serves until the filesystem is unmounted; one byte into `ready` tells that it is mounted.
-[[noreturn]] void Serve(const std::string &mountPath, bool hasPinInterface, int ready) {
+[[noreturn]] void Serve(const std::string &mountPath, bool hasPinInterface, ScopedFd ready) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
     fuse_operations operations = {};
     operations.getattr = FakeGetattr;
@@ -64,10 +66,10 @@ int FakeIoctl(const char *, unsigned request, void *, fuse_file_info *, unsigned
     fuse_args args = FUSE_ARGS_INIT(1, arguments.data());
     fuse *server = fuse_new(&args, &operations, sizeof(operations), &hasPinInterface);
     if (server == nullptr || fuse_mount(server, mountPath.c_str()) != 0 ||
-        write(ready, "m", 1) != 1) {
+        write(ready.Get(), "m", 1) != 1) {
         _exit(1);
     }
-    close(ready);
+    ready = ScopedFd();
     _exit(fuse_loop(server) == 0 ? 0 : 1);
 }
 
@@ -86,18 +88,19 @@ FakeDriver::FakeDriver(const std::string &name, bool hasPinInterface)
     if (!skipReason.empty() || pipe(ready.data()) != 0) {
         return;
     }
+    ScopedFd readEnd(ready[0]);
+    ScopedFd writeEnd(ready[1]);
     std::filesystem::create_directory(mountPath_);
     server_ = fork();
     if (server_ == 0) {
-        close(ready[0]);
-        Serve(mountPath_, hasPinInterface, ready[1]);
+        readEnd = ScopedFd();
+        Serve(mountPath_, hasPinInterface, std::move(writeEnd));
     }
-    close(ready[1]);
+    writeEnd = ScopedFd();
     char byte = 0;
-    if (read(ready[0], &byte, 1) != 1) {
+    if (read(readEnd.Get(), &byte, 1) != 1) {
         skipReason = "FUSE does not mount here";
     }
-    close(ready[0]);
 }
 
 FakeDriver::~FakeDriver() {

@@ -3,6 +3,8 @@
 // Does it to COUNT ranges of LENGTH bytes, the first at FIRST and the next each STEP bytes further,
 // from the last to the first: collapsing one moves what lies behind it. One process for a thousand
 // ranges, where fallocate(1) would be a thousand.
+#include "base/scoped_fd.h"
+
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -20,9 +22,9 @@ int main(int argc, char *argv[]) {
     const long long step = strtoll(argv[4], nullptr, 10);
     const long long length = strtoll(argv[5], nullptr, 10);
     const long long count = strtoll(argv[6], nullptr, 10);
-    const int fd = open(argv[1], O_RDWR | O_CLOEXEC);
+    const ScopedFd file(open(argv[1], O_RDWR | O_CLOEXEC));
     for (long long i = count - 1; i >= 0; --i) {
-        if (fallocate(fd, mode, first + i * step, length) != 0) {
+        if (fallocate(file.Get(), mode, first + i * step, length) != 0) {
             fprintf(stderr, "system_fallocate: %s: %s\n", argv[1], strerror(errno));
             return 1;
         }

@@ -1,5 +1,7 @@
 #include "tests/system/scripted/script.h"
 
+#include "base/scoped_fd.h"
+
 #include <cstdlib>
 #include <fcntl.h>
 #include <fstream>
@@ -50,9 +52,9 @@ std::string ScriptText(const ScriptLine &line, size_t index) {
 void ScriptCall(const std::string &text) {
     const std::string line = text + "\n";
     const std::string path = ScriptPath() + ".calls";
-    const int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
-    if (fd < 0 || write(fd, line.data(), line.size()) != static_cast<ssize_t>(line.size())) {
+    const ScopedFd file(open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644));
+    if (!file.IsOpen() ||
+        write(file.Get(), line.data(), line.size()) != static_cast<ssize_t>(line.size())) {
         abort(); // a test must not pass by a call that is not seen
     }
-    close(fd);
 }

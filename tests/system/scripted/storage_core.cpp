@@ -1,5 +1,7 @@
 // The storage-core library as a test scripts it.
 #include "vesk/storage_core.h"
+
+#include "base/deleter.h"
 #include "tests/system/scripted/script.h"
 
 #include <atomic>
@@ -11,15 +13,13 @@ namespace {
 
 std::atomic<unsigned> lookups{0}; // calls of GetMappingByInode so far, in this process
 
-struct ListDeleter {
-    void operator()(VESKSpaceInfo *list) const {
-        while (list != nullptr) {
-            const std::unique_ptr<VESKSpaceInfo> first(list);
-            list = first->next;
-        }
+void FreeList(VESKSpaceInfo *list) {
+    while (list != nullptr) {
+        const std::unique_ptr<VESKSpaceInfo> first(list);
+        list = first->next;
     }
-};
-using List = std::unique_ptr<VESKSpaceInfo, ListDeleter>;
+}
+using List = std::unique_ptr<VESKSpaceInfo, Deleter<FreeList>>;
 
 List MakeList(const std::vector<ScriptLine> &spaces) {
     List list;
@@ -73,7 +73,7 @@ extern "C" int VESKSpaceInfoEnum(int scope, VESKSpaceInfo **list) {
 
 extern "C" void VESKSpaceInfoFree(VESKSpaceInfo *list) {
     ScriptCall("enum-free");
-    ListDeleter()(list);
+    FreeList(list);
 }
 
 extern "C" char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
