@@ -2,8 +2,8 @@
 //
 // A reference path is the mount path, the volume's top directory. Every lookup enumerates the
 // spaces afresh; nothing is kept between calls. A returned text is malloc'd for the caller (wrap it
-// in MallocText); null means not found or, after an error message, failure. Whoever asks for a cause
-// is told why.
+// in MallocText); null means not found or, after an error message, failure. Whoever asks for a
+// cause is told why.
 //
 // Thread rule: no state; callable from any thread.
 #ifndef SPACE_SPACE_H

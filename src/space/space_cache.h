@@ -1,8 +1,8 @@
 // A space's SSD cache: whether there is one, where its device is and whether it supports pinning.
 //
 // Spaces are named by UUID or by mount path. Nothing is kept between calls. A returned text is
-// malloc'd for the caller; null means not found or, after an error message, failure. Whoever asks for
-// a cause (space/space.h) is told why.
+// malloc'd for the caller; null means not found or, after an error message, failure. Whoever asks
+// for a cause (space/space.h) is told why.
 //
 // Thread rule: no state; callable from any thread.
 #ifndef SPACE_SPACE_CACHE_H

@@ -9,7 +9,7 @@
 #include <fcntl.h>
 
 WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
-                           const char *mountPath) {
+                                  const char *mountPath) {
     const WarmBuffer buffer = WarmBufferAllocate();
     if (!buffer) {
         LogError("Can't allocate memory\n");
