@@ -68,6 +68,25 @@ int StatGet(const char *ssdPath, VESKFlashCacheStat *&stat) {
     return 1;
 }
 
+// What `get` finds for the query's `key`; -1 for a query that makes no sense. The record is null
+// where nothing is found.
+template <typename Query, typename Record>
+int Answer(const Query *query, int32_t kind, const char *Query::*key, Record **record,
+           int (*get)(const char *key, Record *&record)) {
+    if (record == nullptr) {
+        return -1;
+    }
+    *record = nullptr;
+    if (query == nullptr || query->kind != kind || query->*key == nullptr) {
+        return -1;
+    }
+    try {
+        return get(query->*key, *record);
+    } catch (const std::exception &) {
+        return -1;
+    }
+}
+
 int CachePathGet(const char *ssdPath, char *buffer, size_t size) {
     CacheConfigEntry cache;
     if (CacheFind(&CacheConfigEntry::ssdPath, ssdPath, cache) != Lookup::Found ||
@@ -82,18 +101,8 @@ int CachePathGet(const char *ssdPath, char *buffer, size_t size) {
 
 extern "C" int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,
                                           VESKFlashCacheConfig **config) {
-    if (config == nullptr) {
-        return -1;
-    }
-    *config = nullptr;
-    if (query == nullptr || query->kind != kConfigBySpaceUuid || query->spaceUuid == nullptr) {
-        return -1;
-    }
-    try {
-        return ConfigGet(query->spaceUuid, *config);
-    } catch (const std::exception &) {
-        return -1;
-    }
+    return Answer(query, kConfigBySpaceUuid, &VESKFlashCacheConfigQuery::spaceUuid, config,
+                  ConfigGet);
 }
 
 extern "C" void VESKFlashCacheConfigFree(VESKFlashCacheConfig *config) {
@@ -105,18 +114,7 @@ extern "C" void VESKFlashCacheConfigFree(VESKFlashCacheConfig *config) {
 
 extern "C" int VESKFlashCacheStatGet(const VESKFlashCacheStatQuery *query,
                                      VESKFlashCacheStat **stat) {
-    if (stat == nullptr) {
-        return -1;
-    }
-    *stat = nullptr;
-    if (query == nullptr || query->kind != kStatBySsdPath || query->ssdPath == nullptr) {
-        return -1;
-    }
-    try {
-        return StatGet(query->ssdPath, *stat);
-    } catch (const std::exception &) {
-        return -1;
-    }
+    return Answer(query, kStatBySsdPath, &VESKFlashCacheStatQuery::ssdPath, stat, StatGet);
 }
 
 extern "C" void VESKFlashCacheStatFree(VESKFlashCacheStat **stat) {
