@@ -1,9 +1,10 @@
 // How the measurements are named: ROW/ours/SIZE and ROW/limit/SIZE, which scripts/bench pairs.
-#ifndef BENCH_BENCH_NAMES_H
-#define BENCH_BENCH_NAMES_H
+#pragma once
 
 #include <benchmark/benchmark.h>
 #include <string>
+
+namespace vesk {
 
 template <typename Ours, typename Limit>
 void BenchPair(const std::string &row, const std::vector<int64_t> &sizes, Ours ours, Limit limit) {
@@ -13,4 +14,4 @@ void BenchPair(const std::string &row, const std::vector<int64_t> &sizes, Ours o
     }
 }
 
-#endif
+} // namespace vesk

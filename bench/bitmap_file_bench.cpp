@@ -9,14 +9,16 @@
 #include <unistd.h>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
-const char path[] = "/dev/shm/bitmap";
-const int64_t fullBytes = 32 << 20;
-const size_t chunk = 4096;
+const char kPath[] = "/dev/shm/bitmap";
+const int64_t kFullBytes = 32 << 20;
+const size_t kChunk = 4096;
 
 void MakeFile(const std::vector<unsigned char> &bytes) {
-    const ScopedFd file(open(path, O_WRONLY | O_CREAT | O_TRUNC, 0644));
+    const ScopedFd file(open(kPath, O_WRONLY | O_CREAT | O_TRUNC, 0644));
     benchmark::DoNotOptimize(write(file.Get(), bytes.data(), bytes.size()));
 }
 
@@ -28,39 +30,41 @@ template <typename Operation> void WithFile(benchmark::State &state, Operation o
     for (auto _ : state) {
         operation(&bitmap);
     }
-    unlink(path);
+    unlink(kPath);
 }
 
 void Load(benchmark::State &state) {
-    WithFile(state, [](PinBitmap *bitmap) { BitmapInitByFile(path, bitmap); });
+    WithFile(state, [](PinBitmap *bitmap) { BitmapInitByFile(kPath, bitmap); });
 }
 
 void LoadPlainly(benchmark::State &state) {
     WithFile(state, [](PinBitmap *bitmap) {
-        const ScopedFd file(open(path, O_RDONLY));
-        for (size_t at = 0; at < bitmap->size; at += chunk) {
-            benchmark::DoNotOptimize(read(file.Get(), bitmap->data + at, chunk));
+        const ScopedFd file(open(kPath, O_RDONLY));
+        for (size_t at = 0; at < bitmap->size; at += kChunk) {
+            benchmark::DoNotOptimize(read(file.Get(), bitmap->data + at, kChunk));
         }
     });
 }
 
 void Save(benchmark::State &state) {
-    WithFile(state, [](PinBitmap *bitmap) { BitmapWriteToFile(bitmap, path); });
+    WithFile(state, [](PinBitmap *bitmap) { BitmapWriteToFile(bitmap, kPath); });
 }
 
 void SavePlainly(benchmark::State &state) {
     WithFile(state, [](PinBitmap *bitmap) {
-        const ScopedFd file(open(path, O_RDWR | O_CREAT, 0644));
-        for (size_t at = 0; at < bitmap->size; at += chunk) {
-            benchmark::DoNotOptimize(write(file.Get(), bitmap->data + at, chunk));
+        const ScopedFd file(open(kPath, O_RDWR | O_CREAT, 0644));
+        for (size_t at = 0; at < bitmap->size; at += kChunk) {
+            benchmark::DoNotOptimize(write(file.Get(), bitmap->data + at, kChunk));
         }
     });
 }
 
-const bool registered = [] {
-    BenchPair("bitmap_load", {fullBytes / 16, fullBytes / 4, fullBytes}, Load, LoadPlainly);
-    BenchPair("bitmap_save", {fullBytes / 16, fullBytes / 4, fullBytes}, Save, SavePlainly);
+const bool kRegistered = [] {
+    BenchPair("bitmap_load", {kFullBytes / 16, kFullBytes / 4, kFullBytes}, Load, LoadPlainly);
+    BenchPair("bitmap_save", {kFullBytes / 16, kFullBytes / 4, kFullBytes}, Save, SavePlainly);
     return true;
 }();
 
 } // namespace
+
+} // namespace vesk

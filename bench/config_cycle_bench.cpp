@@ -18,10 +18,12 @@
 #include <memory>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const char path[] = "/dev/shm/pins.json";
-const char newPath[] = "/dev/shm/pins.json.new";
+const char kPath[] = "/dev/shm/pins.json";
+const char kNewPath[] = "/dev/shm/pins.json.new";
 
 void MakeDocument(int64_t files) {
     Json::Value root;
@@ -32,7 +34,7 @@ void MakeDocument(int64_t files) {
         root["volumes"]["/volume1"]["files"][std::to_string(100000 + i)] =
             "share/folder/file" + std::to_string(i);
     }
-    std::ofstream(path) << root;
+    std::ofstream(kPath) << root;
 }
 
 void Cycle(benchmark::State &state) {
@@ -40,20 +42,20 @@ void Cycle(benchmark::State &state) {
     ServiceStateInitialize();
     MakeDocument(state.range(0));
     RequestRecord record{};
-    record.type = requestReloadPinBlocks;
+    record.type = kRequestReloadPinBlocks;
     strcpy(record.mountPath, "/volume1");
     int number = 1;
     for (auto _ : state) {
-        if (ConfigAddRequest(path, &record) != 0 ||
-            ConfigUpdatedByFinishedRequest(path, &record, std::to_string(number++)) != 0) {
+        if (ConfigAddRequest(kPath, &record) != 0 ||
+            ConfigUpdatedByFinishedRequest(kPath, &record, std::to_string(number++)) != 0) {
             abort();
         }
     }
-    unlink(path);
+    unlink(kPath);
 }
 
 Json::Value ReadPlainly() {
-    std::ifstream file(path);
+    std::ifstream file(kPath);
     const std::string text((std::istreambuf_iterator<char>(file)),
                            std::istreambuf_iterator<char>());
     Json::Value root;
@@ -64,11 +66,11 @@ Json::Value ReadPlainly() {
 
 void WritePlainly(const Json::Value &root) {
     const std::string text = Json::writeString(Json::StreamWriterBuilder(), root);
-    FILE *file = fopen(newPath, "w");
+    FILE *file = fopen(kNewPath, "w");
     fwrite(text.data(), 1, text.size(), file);
     fsync(fileno(file));
     fclose(file);
-    rename(newPath, path);
+    rename(kNewPath, kPath);
 }
 
 void PlainCycle(benchmark::State &state) {
@@ -85,12 +87,14 @@ void PlainCycle(benchmark::State &state) {
         again["requests"].removeMember(name);
         WritePlainly(again);
     }
-    unlink(path);
+    unlink(kPath);
 }
 
-const bool registered = [] {
+const bool kRegistered = [] {
     BenchPair("config_cycle", {0, 100, 10000, 100000}, Cycle, PlainCycle);
     return true;
 }();
 
 } // namespace
+
+} // namespace vesk

@@ -7,10 +7,12 @@
 #include <random>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
-const int64_t fullBytes = 32 << 20; // of a 16 TiB device
-const size_t extentCount = 1000000;
+const int64_t kFullBytes = 32 << 20; // of a 16 TiB device
+const size_t kExtentCount = 1000000;
 
 struct Bytes {
     explicit Bytes(int64_t size) : bytes(static_cast<size_t>(size)) {}
@@ -22,7 +24,7 @@ struct Bytes {
 void MarkAll(benchmark::State &state) {
     Bytes bytes(state.range(0));
     PinBitmap bitmap = bytes.Bitmap();
-    const uint64_t sectors = static_cast<uint64_t>(state.range(0)) << (bitmapSectorShift + 3);
+    const uint64_t sectors = static_cast<uint64_t>(state.range(0)) << (kBitmapSectorShift + 3);
     for (auto _ : state) {
         BitmapSetRange(&bitmap, 0, sectors);
         benchmark::ClobberMemory();
@@ -50,7 +52,7 @@ struct Extent {
 std::vector<Extent> RandomExtents(uint64_t blocks, uint64_t most) {
     std::mt19937_64 random(1);
     std::vector<Extent> extents;
-    for (size_t i = 0; i < extentCount; ++i) {
+    for (size_t i = 0; i < kExtentCount; ++i) {
         const uint64_t count = random() % most + 1;
         uint64_t start = random() % (blocks - most);
         if (most <= 64) {
@@ -68,9 +70,9 @@ template <uint64_t most> void MarkExtents(benchmark::State &state) {
     const auto extents = RandomExtents(bytes.bytes.size() * 8, most);
     size_t i = 0;
     for (auto _ : state) {
-        const Extent &extent = extents[i++ % extentCount];
-        BitmapSetRange(&bitmap, extent.start << bitmapSectorShift,
-                       extent.count << bitmapSectorShift);
+        const Extent &extent = extents[i++ % kExtentCount];
+        BitmapSetRange(&bitmap, extent.start << kBitmapSectorShift,
+                       extent.count << kBitmapSectorShift);
     }
     benchmark::ClobberMemory();
 }
@@ -85,7 +87,7 @@ void MarkWords(benchmark::State &state) {
     }
     size_t i = 0;
     for (auto _ : state) {
-        const Extent &mask = masks[i++ % extentCount];
+        const Extent &mask = masks[i++ % kExtentCount];
         words[mask.start] |= mask.count;
     }
     benchmark::ClobberMemory();
@@ -97,20 +99,22 @@ void FillExtents(benchmark::State &state) {
     const auto extents = RandomExtents(bytes.bytes.size() * 8, 4096);
     size_t i = 0;
     for (auto _ : state) {
-        const Extent &extent = extents[i++ % extentCount];
+        const Extent &extent = extents[i++ % kExtentCount];
         memset(bytes.bytes.data() + extent.start / 8, 0xFF,
                (extent.start + extent.count - 1) / 8 - extent.start / 8 + 1);
     }
     benchmark::ClobberMemory();
 }
 
-const bool registered = [] {
-    BenchPair("mark_all", {fullBytes / 16, fullBytes / 4, fullBytes}, MarkAll, FillAll);
-    BenchPair("mark_word", {fullBytes / 1024, fullBytes / 16, fullBytes}, MarkExtents<64>,
+const bool kRegistered = [] {
+    BenchPair("mark_all", {kFullBytes / 16, kFullBytes / 4, kFullBytes}, MarkAll, FillAll);
+    BenchPair("mark_word", {kFullBytes / 1024, kFullBytes / 16, kFullBytes}, MarkExtents<64>,
               MarkWords);
-    BenchPair("mark_extent", {fullBytes / 16, fullBytes / 4, fullBytes}, MarkExtents<4096>,
+    BenchPair("mark_extent", {kFullBytes / 16, kFullBytes / 4, kFullBytes}, MarkExtents<4096>,
               FillExtents);
     return true;
 }();
 
 } // namespace
+
+} // namespace vesk

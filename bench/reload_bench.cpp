@@ -17,10 +17,12 @@
 #include <unistd.h>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
-const char device[] = "/dev/shm/device";
-const int64_t fullBytes = 32 << 20;
+const char kDevice[] = "/dev/shm/device";
+const int64_t kFullBytes = 32 << 20;
 
 using Bytes = std::vector<unsigned char>;
 
@@ -48,9 +50,9 @@ Bytes OnePercent(size_t size) {
 }
 
 void MakeDevice(size_t bitmapBytes) {
-    const ScopedFd file(open(device, O_RDWR | O_CREAT, 0600));
+    const ScopedFd file(open(kDevice, O_RDWR | O_CREAT, 0600));
     if (!file.IsOpen() ||
-        ftruncate(file.Get(), static_cast<off_t>(bitmapBytes) << bitmapSizeShift) != 0) {
+        ftruncate(file.Get(), static_cast<off_t>(bitmapBytes) << kBitmapSizeShift) != 0) {
         abort();
     }
 }
@@ -62,11 +64,11 @@ template <Bytes (*make)(size_t)> void Walk(benchmark::State &state) {
     MakeDevice(bytes.size());
     const PinBitmap bitmap{bytes.data(), static_cast<uint32_t>(bytes.size())};
     for (auto _ : state) {
-        if (ReloadPinBlocksToCache(&bitmap, device, "/volume1") != WorkResult::Done) {
+        if (ReloadPinBlocksToCache(&bitmap, kDevice, "/volume1") != WorkResult::Done) {
             abort();
         }
     }
-    unlink(device);
+    unlink(kDevice);
 }
 
 // Looking at every byte once: for the one that is not there.
@@ -84,24 +86,27 @@ template <Bytes (*make)(size_t)> void Reads(benchmark::State &state) {
     const std::vector<BitRun> runs = BitRunsOf(bytes.data(), bytes.size());
     const WarmBuffer buffer = WarmBufferAllocate();
     for (auto _ : state) {
-        const ScopedFd file(open(device, O_RDONLY | O_DIRECT));
+        const ScopedFd file(open(kDevice, O_RDONLY | O_DIRECT));
         for (const BitRun &run : runs) {
             for (uint64_t block = 0; block < run.count; ++block) {
-                lseek(file.Get(), static_cast<off_t>((run.first + block) << bitmapByteShift),
+                lseek(file.Get(), static_cast<off_t>((run.first + block) << kBitmapByteShift),
                       SEEK_SET);
-                benchmark::DoNotOptimize(read(file.Get(), buffer.get(), warmBufferBytes));
+                benchmark::DoNotOptimize(read(file.Get(), buffer.get(), kWarmBufferBytes));
             }
         }
     }
-    unlink(device);
+    unlink(kDevice);
 }
 
-const bool registered = [] {
-    BenchPair("reload_empty", {fullBytes / 16, fullBytes / 4, fullBytes}, Walk<Empty>, Scan<Empty>);
-    BenchPair("reload_full", {fullBytes}, Walk<Full>, Scan<Full>);
+const bool kRegistered = [] {
+    BenchPair("reload_empty", {kFullBytes / 16, kFullBytes / 4, kFullBytes}, Walk<Empty>,
+              Scan<Empty>);
+    BenchPair("reload_full", {kFullBytes}, Walk<Full>, Scan<Full>);
     BenchPair("reload_alternating", {1024, 4096, 16384}, Walk<Alternating>, Reads<Alternating>);
     BenchPair("reload_random", {1 << 16, 1 << 18, 1 << 20}, Walk<OnePercent>, Reads<OnePercent>);
     return true;
 }();
 
 } // namespace
+
+} // namespace vesk

@@ -11,6 +11,8 @@
 #include <cstdio>
 #include <sys/stat.h>
 
+using namespace vesk;
+
 int main(int argc, char *argv[]) {
     LogToSyslog = 0;
     if (argc < 3 || ServiceStateInitialize() != 0) {

@@ -7,6 +7,8 @@
 #include <unistd.h>
 #include <utility>
 
+namespace vesk {
+
 namespace {
 
 // Waits for the byte that BackgroundReady writes; the end of the pipe means the daemon is gone.
@@ -64,3 +66,5 @@ void BackgroundReady(Background &background) {
     static_cast<void>(written);
     background.ready = ScopedFd();
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include <utility>
 
+namespace vesk {
+
 namespace {
 
 void MakeEvictable(BlockCache &cache, uint32_t number) {
@@ -138,3 +140,5 @@ std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache) {
     }
     return runs;
 }
+
+} // namespace vesk

@@ -17,6 +17,8 @@
 #include <unordered_map>
 #include <vector>
 
+namespace vesk {
+
 constexpr uint64_t kNoBlock = UINT64_MAX;
 constexpr uint32_t kNoSlot = UINT32_MAX;
 
@@ -90,3 +92,5 @@ void BlockCacheUnpinAll(BlockCache &cache);
 
 // The pinned blocks as runs in ascending order, no two of them adjacent.
 std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache);
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace vesk {
+
 BlockRangeGuard::BlockRangeGuard(BlockRangeLock &rangeLock, const BlockRange &range)
     : lock(rangeLock) {
     std::unique_lock<std::mutex> hold(lock.mutex);
@@ -27,3 +29,5 @@ BlockRangeGuard::~BlockRangeGuard() {
         lock.released.notify_all();
     }
 }
+
+} // namespace vesk

@@ -12,6 +12,8 @@
 #include <list>
 #include <mutex>
 
+namespace vesk {
+
 struct BlockRange {
     uint64_t first; // block number
     uint64_t last;  // block number, not less than first
@@ -37,3 +39,5 @@ private:
     BlockRangeLock &lock;
     std::list<BlockRange>::iterator place; // this range in lock.queue
 };
+
+} // namespace vesk

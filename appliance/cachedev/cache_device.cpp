@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cerrno>
 
+namespace vesk {
+
 namespace {
 
 bool PassesEnd(const SectorRange &range, uint64_t deviceSectors) {
@@ -101,3 +103,5 @@ CacheSnapshot CacheDeviceSnapshot(CacheDevice &device) {
     snapshot.lastUnpin = device.lastUnpin;
     return snapshot;
 }
+
+} // namespace vesk

@@ -26,6 +26,8 @@
 #include <mutex>
 #include <vector>
 
+namespace vesk {
+
 // Faults to order, for tests.
 struct CacheFaults {
     std::map<uint32_t, int> failRequest; // request number -> errno
@@ -131,3 +133,5 @@ void CacheDeviceCountRequest(CacheDevice &device, uint64_t RequestCounters::*kin
 
 // A consistent picture of the device; changes nothing.
 CacheSnapshot CacheDeviceSnapshot(CacheDevice &device);
+
+} // namespace vesk

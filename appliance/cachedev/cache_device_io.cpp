@@ -10,6 +10,8 @@
 #include <memory>
 #include <thread>
 
+namespace vesk {
+
 namespace {
 
 // The bytes of a request, or of the part of it that one run covers.
@@ -204,3 +206,5 @@ int64_t CacheDeviceWrite(CacheDevice &device, uint64_t offset, const char *buffe
     const int error = WriteRequest(device, {offset, end, const_cast<char *>(buffer)});
     return error != 0 ? error : static_cast<int64_t>(end - offset);
 }
+
+} // namespace vesk

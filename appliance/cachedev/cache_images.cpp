@@ -11,6 +11,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 using TransferCall = ssize_t (*)(int, const struct iovec *, int, off_t);
@@ -174,3 +176,5 @@ int CacheImagesSyncAll(const CacheImages &images) {
     const int ssd = fdatasync(images.ssd.Get()) == 0 ? 0 : -errno;
     return backing != 0 ? backing : ssd;
 }
+
+} // namespace vesk

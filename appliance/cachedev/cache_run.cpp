@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <mutex>
 
+namespace vesk {
+
 namespace {
 
 size_t MostBlocks(uint64_t first, uint64_t last) {
@@ -160,3 +162,5 @@ size_t CacheRunGroupEnd(const CacheRun &run, size_t index) {
 uint64_t CacheRunBlockStart(const CacheRun &run, size_t index) {
     return (run.firstBlock + index) * kBlockBytes;
 }
+
+} // namespace vesk

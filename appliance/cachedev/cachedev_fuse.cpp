@@ -11,6 +11,8 @@
 #include <unistd.h>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 // Not in every libfuse header: the caller has 4-byte pointers.
@@ -267,3 +269,5 @@ struct fuse_lowlevel_ops CachedevFuseOperations() {
     operations.ioctl = Ioctl;
     return operations;
 }
+
+} // namespace vesk

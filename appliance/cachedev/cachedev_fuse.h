@@ -19,6 +19,8 @@
 #define FUSE_USE_VERSION 312
 #include <fuse_lowlevel.h>
 
+namespace vesk {
+
 struct ServedDevice {
     CacheDevice &device;
     std::string deviceName;        // file name of the device
@@ -30,3 +32,5 @@ struct ServedDevice {
 
 // The callbacks; to be registered with a ServedDevice as user data, which must outlive the session.
 struct fuse_lowlevel_ops CachedevFuseOperations();
+
+} // namespace vesk

@@ -11,6 +11,8 @@
 #include <sys/stat.h>
 #include <system_error>
 
+namespace vesk {
+
 namespace {
 
 using SessionPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_session_destroy>>;
@@ -98,3 +100,5 @@ bool CachedevServe(ServedDevice &served, const std::string &folder) {
     }
     return true;
 }
+
+} // namespace vesk

@@ -6,6 +6,8 @@
 #include <getopt.h>
 #include <limits>
 
+namespace vesk {
+
 namespace {
 
 constexpr uint64_t kMostErrno = 4095; // what the kernel takes for an error number
@@ -179,3 +181,5 @@ Numbers are decimal, or hexadecimal after 0x. Ends on SIGTERM, SIGINT and when t
 unmounted.
 )";
 }
+
+} // namespace vesk

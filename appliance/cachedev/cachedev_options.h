@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace vesk {
+
 struct CachedevOptions {
     std::string folder;      // absolute path of the folder that becomes the mount point
     std::string deviceName;  // file name of the device in it
@@ -23,3 +25,5 @@ bool CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
 
 // The usage text.
 const char *CachedevUsage();
+
+} // namespace vesk

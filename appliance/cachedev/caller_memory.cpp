@@ -5,6 +5,8 @@
 #include <cstring>
 #include <sys/uio.h>
 
+namespace vesk {
+
 namespace {
 
 using TransferCall = ssize_t (*)(pid_t, const struct iovec *, unsigned long, const struct iovec *,
@@ -67,3 +69,5 @@ BitmapDescriptor DescriptorDecode(const unsigned char *bytes, bool is32bit) {
     }
     return descriptor;
 }
+
+} // namespace vesk

@@ -12,6 +12,8 @@
 #include <fstream>
 #include <unistd.h>
 
+using namespace vesk;
+
 namespace {
 
 int Fail(const std::string &message) {

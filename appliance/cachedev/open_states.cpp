@@ -5,6 +5,8 @@
 #include <unistd.h>
 #include <utility>
 
+namespace vesk {
+
 uint64_t OpenStatesOpen(OpenStates &states, CacheDevice &device) {
     auto text =
         std::make_shared<const std::string>(StateJsonText(CacheDeviceSnapshot(device), getpid()));
@@ -35,3 +37,5 @@ uint64_t OpenStatesBytes(OpenStates &states, CacheDevice &device) {
     }
     return StateJsonText(CacheDeviceSnapshot(device), getpid()).size();
 }
+
+} // namespace vesk

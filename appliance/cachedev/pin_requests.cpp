@@ -3,6 +3,8 @@
 #include <cerrno>
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
 int SetBitmap(CacheDevice &device, const PinRequest &request) {
@@ -100,3 +102,5 @@ int PinRequestHandle(CacheDevice &device, const PinRequest &request) {
     CacheDeviceCountRequest(device, CounterOf(request.number), result != 0);
     return result;
 }
+
+} // namespace vesk

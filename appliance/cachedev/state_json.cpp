@@ -4,6 +4,8 @@
 
 #include <json/json.h>
 
+namespace vesk {
+
 namespace {
 
 Json::Value Number(uint64_t value) {
@@ -72,3 +74,5 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     writer["indentation"] = ""; // one line: some thousand slots are polled often
     return Json::writeString(writer, state) + "\n";
 }
+
+} // namespace vesk

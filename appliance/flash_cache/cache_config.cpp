@@ -7,6 +7,8 @@
 #include <fstream>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 constexpr char kDefaultPath[] = "/etc/veskflashcache.json";
@@ -86,3 +88,5 @@ bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &ent
     entries.swap(caches);
     return true;
 }
+
+} // namespace vesk

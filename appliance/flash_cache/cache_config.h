@@ -5,11 +5,12 @@
 // Further members are ignored.
 //
 // Thread rule: no state; the functions are independent of each other.
-#ifndef VESK_FLASH_CACHE_CACHE_CONFIG_H
-#define VESK_FLASH_CACHE_CACHE_CONFIG_H
+#pragma once
 
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // One cache. No text is empty or holds a NUL.
 struct CacheConfigEntry {
@@ -27,4 +28,4 @@ std::string CacheConfigPath();
 // form; `entries` is then empty.
 bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &entries);
 
-#endif
+} // namespace vesk

@@ -8,6 +8,8 @@
 
 #include <cstdint>
 
+namespace vesk {
+
 namespace {
 
 // The driver writes whether all blocks are unpinned into a 32-bit int. A driver without the pin
@@ -29,3 +31,5 @@ CacheDeviceState CacheDeviceAsk(const std::string &devicePath) {
     state.supportsPin = ioctl(device.Get(), kQueryAllUnpinned, &allUnpinned) >= 0;
     return state;
 }
+
+} // namespace vesk

@@ -1,10 +1,11 @@
 // What a cache device tells about itself.
 //
 // Thread rule: no state.
-#ifndef VESK_FLASH_CACHE_CACHE_DEVICE_H
-#define VESK_FLASH_CACHE_CACHE_DEVICE_H
+#pragma once
 
 #include <string>
+
+namespace vesk {
 
 struct CacheDeviceState {
     bool isUp = false;        // the device is there and opens
@@ -15,4 +16,4 @@ struct CacheDeviceState {
 // (an emulated device) is no cache device and counts as not up.
 CacheDeviceState CacheDeviceAsk(const std::string &devicePath);
 
-#endif
+} // namespace vesk

@@ -9,6 +9,8 @@
 #include <exception>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 constexpr int32_t kConfigBySpaceUuid = 2;
@@ -134,3 +136,5 @@ extern "C" int VESKFlashcacheGetCachePath(const char *ssdPath, char *buffer, siz
         return 0;
     }
 }
+
+} // namespace vesk

@@ -9,6 +9,8 @@
 
 #include <memory>
 
+namespace vesk {
+
 std::string BlockDeviceOfMount(const MountEntry &mount) {
     // A source such as "tank/data" or "none" must not be looked up in the current directory.
     const bool isPath = !mount.source.empty() && mount.source.front() == '/';
@@ -52,3 +54,5 @@ std::string BlockDeviceProbe(const std::string &devicePath, const char *name) {
     }
     return value;
 }
+
+} // namespace vesk

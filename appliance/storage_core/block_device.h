@@ -1,14 +1,15 @@
 // Block devices: their paths, and what a probe of their superblocks tells.
 //
 // Thread rule: no state; the functions are independent of each other.
-#ifndef VESK_STORAGE_CORE_BLOCK_DEVICE_H
-#define VESK_STORAGE_CORE_BLOCK_DEVICE_H
+#pragma once
 
 #include "storage_core/mount_table.h"
 
 #include <sys/types.h>
 
 #include <string>
+
+namespace vesk {
 
 // The path of the block device that a mounted filesystem sits on, or an empty text where it has
 // none. The mount's source is the path if it is a node of that very device; where it is not
@@ -27,4 +28,4 @@ dev_t BlockDeviceNumber(const std::string &devicePath);
 // other.
 std::string BlockDeviceProbe(const std::string &devicePath, const char *name);
 
-#endif
+} // namespace vesk

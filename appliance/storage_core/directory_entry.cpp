@@ -9,6 +9,8 @@
 #include <limits>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 // Symbolic links, devices and directories have no extents to give, and opening a device can do
@@ -77,3 +79,5 @@ ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
     }
     return file;
 }
+
+} // namespace vesk

@@ -1,13 +1,14 @@
 // Finding a directory's file by its inode number.
 //
 // Thread rule: no state; the functions are independent of each other.
-#ifndef VESK_STORAGE_CORE_DIRECTORY_ENTRY_H
-#define VESK_STORAGE_CORE_DIRECTORY_ENTRY_H
+#pragma once
 
 #include "base/scoped_fd.h"
 
 #include <cstdint>
 #include <string>
+
+namespace vesk {
 
 // A search through the entries of one directory. The number looked for may be only the low 32 bits
 // of the file's: the entry with exactly this number is the result, else the one file whose low 32
@@ -30,4 +31,4 @@ bool InodeSearchFound(const InodeSearch &search);
 // reading, without following a symbolic link. Not open: no such file, or a failure.
 ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode);
 
-#endif
+} // namespace vesk

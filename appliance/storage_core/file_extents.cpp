@@ -9,6 +9,8 @@
 #include <memory>
 #include <new>
 
+namespace vesk {
+
 namespace {
 
 constexpr uint64_t kSectorBytes = 512;
@@ -68,3 +70,5 @@ bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
         start = last.fe_logical + last.fe_length;
     }
 }
+
+} // namespace vesk

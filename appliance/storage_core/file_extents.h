@@ -1,14 +1,15 @@
 // The extents of an open file, asked of the kernel by FIEMAP.
 //
 // Thread rule: no state; the functions are independent of each other.
-#ifndef VESK_STORAGE_CORE_FILE_EXTENTS_H
-#define VESK_STORAGE_CORE_FILE_EXTENTS_H
+#pragma once
 
 #include "vesk/storage_core.h"
 
 #include <linux/fiemap.h>
 
 #include <vector>
+
+namespace vesk {
 
 // Turns one extent into sectors. False: the extent has no place of whole sectors on the device (not
 // allocated yet, kept in the inode, packed or compressed) and `entry` is left alone.
@@ -19,4 +20,4 @@ bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry);
 // answer; `entries` then holds what came before.
 bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries);
 
-#endif
+} // namespace vesk

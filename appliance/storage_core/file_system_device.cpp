@@ -12,6 +12,9 @@
 #include <cstdlib>
 #include <exception>
 
+// The interface's classes, whose members are defined here, are in no namespace.
+using namespace vesk;
+
 namespace {
 
 class FiemapDevice final : public FileSystemDevice {

@@ -6,6 +6,8 @@
 
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 std::string TextOrEmpty(const char *text) {
@@ -88,3 +90,5 @@ bool FileSystemIsMappable(const MountEntry &mount) {
     }
     return mount.type == "ext2" || mount.type == "ext3" || mount.type == "ext4";
 }
+
+} // namespace vesk

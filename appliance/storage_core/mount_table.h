@@ -1,13 +1,14 @@
 // The kernel's mount table as plain records, and the two ways to find a mount in it.
 //
 // Thread rule: no state; the functions are independent of each other.
-#ifndef VESK_STORAGE_CORE_MOUNT_TABLE_H
-#define VESK_STORAGE_CORE_MOUNT_TABLE_H
+#pragma once
 
 #include <sys/types.h>
 
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // The table of the calling thread's mount namespace. Not the process's: a process whose first
 // thread has ended, as the pin service's can, has no readable table of its own.
@@ -46,4 +47,4 @@ std::string MountOptionValue(const MountEntry &entry, const char *name);
 // its block device.
 bool FileSystemIsMappable(const MountEntry &mount);
 
-#endif
+} // namespace vesk

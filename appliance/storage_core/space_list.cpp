@@ -10,6 +10,8 @@
 #include <exception>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 // A mount of a directory inside the filesystem (a bind mount) is not the space's top directory. A
@@ -92,3 +94,5 @@ extern "C" void VESKSpaceInfoFree(VESKSpaceInfo *list) {
         list = first->next;
     }
 }
+
+} // namespace vesk

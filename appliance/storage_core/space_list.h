@@ -1,14 +1,15 @@
 // The choice of the storage spaces among the mounts.
 //
 // Thread rule: no state; the functions are independent of each other.
-#ifndef VESK_STORAGE_CORE_SPACE_LIST_H
-#define VESK_STORAGE_CORE_SPACE_LIST_H
+#pragma once
 
 #include "storage_core/mount_table.h"
 
 #include <functional>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // One storage space. Both texts fit their fields of VESKSpaceInfo with the NUL.
 struct Space {
@@ -25,4 +26,4 @@ using SpaceDeviceLookup = std::function<std::string(const MountEntry &)>;
 std::vector<Space> SpaceListSelect(const std::vector<MountEntry> &mounts,
                                    const SpaceDeviceLookup &deviceOf);
 
-#endif
+} // namespace vesk

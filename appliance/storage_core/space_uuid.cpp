@@ -4,6 +4,8 @@
 #include <cstring>
 #include <exception>
 
+namespace vesk {
+
 extern "C" char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
     if (space == nullptr) {
         return nullptr;
@@ -17,3 +19,5 @@ extern "C" char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
         return nullptr;
     }
 }
+
+} // namespace vesk

@@ -1,12 +1,13 @@
 // Lets a std::unique_ptr give its object back with a function of the C kind:
 // std::unique_ptr<DIR, Deleter<closedir>>.
-#ifndef BASE_DELETER_H
-#define BASE_DELETER_H
+#pragma once
 
 #include <memory>
+
+namespace vesk {
 
 template <auto release> struct Deleter {
     template <typename Object> void operator()(Object *object) const { release(object); }
 };
 
-#endif
+} // namespace vesk

@@ -9,6 +9,8 @@
 #include <sys/time.h>
 #include <syslog.h>
 
+namespace vesk {
+
 int LogToSyslog = 1;
 int LogLevel = 1;
 const char *ProgramName = nullptr;
@@ -17,7 +19,7 @@ namespace {
 
 // Readers of the log know the program by this one file name, in whichever source file a message
 // stands.
-const char sourceFileName[] = "veskcachepinfiletool.cpp";
+const char kSourceFileName[] = "veskcachepinfiletool.cpp";
 
 // One message text: a buffer on the stack, which a text that does not fit leaves for the heap.
 // Where no memory is left the text is cut: a log call never fails.
@@ -49,7 +51,7 @@ private:
 
 void WriteShort(const LogPlace &place, const char *core) {
     if (LogToSyslog == 1) {
-        syslog(LOG_ERR, "%s:%d %s", sourceFileName, place.line, core);
+        syslog(LOG_ERR, "%s:%d %s", kSourceFileName, place.line, core);
     } else {
         printf("%s: %s\n", ProgramName, core);
     }
@@ -59,7 +61,7 @@ void WriteShort(const LogPlace &place, const char *core) {
 // text.
 void WriteLong(const LogPlace &place, const char *colon, const char *marker, const char *core) {
     if (LogToSyslog == 1) {
-        syslog(LOG_ERR, "%s:%d %s() [%d] : %s%s", sourceFileName, place.line, place.function,
+        syslog(LOG_ERR, "%s:%d %s() [%d] : %s%s", kSourceFileName, place.line, place.function,
                place.line, marker, core);
     } else {
         printf("%s: %s() [%d]%s%s%s\n", ProgramName, place.function, place.line, colon, marker,
@@ -115,3 +117,5 @@ const char *GetTimeString() {
              microseconds / 1000, microseconds);
     return text;
 }
+
+} // namespace vesk

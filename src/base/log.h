@@ -10,10 +10,11 @@
 //
 // Thread rule: the settings are written before any thread starts and only read afterwards; messages
 // may be logged from any thread. GetTimeString is for one thread at a time.
-#ifndef BASE_LOG_H
-#define BASE_LOG_H
+#pragma once
 
 #include <cstdint>
+
+namespace vesk {
 
 extern int LogToSyslog;         // 1: system log, 0: standard output
 extern int LogLevel;            // 1 normal, 2 verbose, 3 debug
@@ -27,7 +28,7 @@ struct LogPlace {
     const char *function;
     int line;
 };
-#define LogHere() (LogPlace{__func__, __LINE__})
+#define LogHere() (vesk::LogPlace{__func__, __LINE__})
 
 // Writes one message, printf-like; verbose and debug ones only where the level asks for them. Use
 // the macros below, which add the calling place; LogWrite itself in a helper that was given one.
@@ -35,30 +36,30 @@ void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
     __attribute__((format(printf, 3, 4)));
 
 // Error and notice messages are always written, the error's long form carries a marker.
-#define LogError(...) LogWrite(LogClass::Error, LogHere(), __VA_ARGS__)
-#define LogNotice(...) LogWrite(LogClass::Notice, LogHere(), __VA_ARGS__)
+#define LogError(...) vesk::LogWrite(vesk::LogClass::Error, LogHere(), __VA_ARGS__)
+#define LogNotice(...) vesk::LogWrite(vesk::LogClass::Notice, LogHere(), __VA_ARGS__)
 
 // The arguments of verbose and debug messages are evaluated only when the level asks for them: some
 // of them log for themselves.
 #define LogVerboseAt(place, ...)                                                                   \
     do {                                                                                           \
-        if (LogLevel > 1) {                                                                        \
-            LogWrite(LogClass::Verbose, place, __VA_ARGS__);                                       \
+        if (vesk::LogLevel > 1) {                                                                  \
+            vesk::LogWrite(vesk::LogClass::Verbose, place, __VA_ARGS__);                           \
         }                                                                                          \
     } while (0)
 #define LogVerbose(...) LogVerboseAt(LogHere(), __VA_ARGS__)
 #define LogDebug(...)                                                                              \
     do {                                                                                           \
-        if (LogLevel > 2) {                                                                        \
-            LogWrite(LogClass::Debug, LogHere(), __VA_ARGS__);                                     \
+        if (vesk::LogLevel > 2) {                                                                  \
+            vesk::LogWrite(vesk::LogClass::Debug, LogHere(), __VA_ARGS__);                         \
         }                                                                                          \
     } while (0)
 
 // The entry/exit trace: "+++++" and "-----", written at level 2 and above in the long form of a
 // notice.
 void LogTraceMark(const char *mark, const LogPlace &place);
-#define LogTraceEntry() LogTraceMark("+++++", LogHere())
-#define LogTraceExit() LogTraceMark("-----", LogHere())
+#define LogTraceEntry() vesk::LogTraceMark("+++++", LogHere())
+#define LogTraceExit() vesk::LogTraceMark("-----", LogHere())
 
 // Both for a whole scope. Not for a function whose callee ends the thread: the thread's end unwinds
 // the scope, and a trace would tell of a return that never was.
@@ -72,7 +73,7 @@ public:
 private:
     LogPlace place_;
 };
-#define LogTraceScope() const LogTrace logTrace(LogHere())
+#define LogTraceScope() const vesk::LogTrace logTrace(LogHere())
 
 // Takes every message in the place of the system log and standard output; the text is without place
 // and marker and ends with the call. Null: back to those. For programs that show messages in their
@@ -89,4 +90,4 @@ inline unsigned long long LogU64(uint64_t value) {
 // overwrites. usec repeats the whole sub-second part in microseconds.
 const char *GetTimeString();
 
-#endif
+} // namespace vesk

@@ -1,12 +1,13 @@
 // A file descriptor that is closed when its scope ends, also on an error path.
 //
 // Thread rule: one owner at a time, no locking.
-#ifndef BASE_SCOPED_FD_H
-#define BASE_SCOPED_FD_H
+#pragma once
 
 #include <unistd.h>
 
 #include <utility>
+
+namespace vesk {
 
 class ScopedFd {
 public:
@@ -32,4 +33,4 @@ private:
     int fd_; // negative: nothing to close
 };
 
-#endif
+} // namespace vesk

@@ -4,9 +4,11 @@
 #include <cstring>
 #include <utility>
 
+namespace vesk {
+
 namespace {
 
-const size_t stretchBytes = 4096;
+const size_t kStretchBytes = 4096;
 
 // How many bytes from `bytes` on are equal, `size` at most.
 size_t CountEqualBytes(const unsigned char *bytes, size_t size) {
@@ -28,7 +30,7 @@ uint64_t CountEqualBits(const unsigned char *bytes, size_t size, unsigned within
         return static_cast<uint64_t>(__builtin_ctz(others));
     }
     return within != 0 ? 8 - within
-                       : uint64_t{CountEqualBytes(bytes, std::min(size, stretchBytes))} * 8;
+                       : uint64_t{CountEqualBytes(bytes, std::min(size, kStretchBytes))} * 8;
 }
 
 } // namespace
@@ -70,3 +72,5 @@ std::vector<BitRun> BitRunsOf(const unsigned char *bytes, size_t size) {
 bool BitIsSet(const unsigned char *bytes, size_t size, uint64_t bit) {
     return bit >> 3 < size && (bytes[static_cast<size_t>(bit >> 3)] >> (bit & 7) & 1) != 0;
 }
+
+} // namespace vesk

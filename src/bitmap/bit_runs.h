@@ -5,12 +5,13 @@
 // it.
 //
 // Thread rule: no state; the bytes must not change meanwhile.
-#ifndef BITMAP_BIT_RUNS_H
-#define BITMAP_BIT_RUNS_H
+#pragma once
 
 #include <cstddef>
 #include <cstdint>
 #include <vector>
+
+namespace vesk {
 
 struct BitRun {
     uint64_t first; // number of the first bit
@@ -36,4 +37,4 @@ std::vector<BitRun> BitRunsOf(const unsigned char *bytes, size_t size);
 // A bit past the end is not set.
 bool BitIsSet(const unsigned char *bytes, size_t size, uint64_t bit);
 
-#endif
+} // namespace vesk

@@ -9,13 +9,15 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const int64_t chunkBytes = 4096;
+const int64_t kChunkBytes = 4096;
 
 // The file lies where a volume's users may write. A link planted in its place must not lead to
 // another file, and neither a FIFO nor a device may hold the service up or take its writes.
-const int cautiously = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+const int kCautiously = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
 
 bool IsSpecial(int fd) {
     struct stat status {};
@@ -34,7 +36,7 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
         LogError("Get the size of file (%s) error", path);
         return -1;
     }
-    const ScopedFd file(open(path, O_RDONLY | cautiously));
+    const ScopedFd file(open(path, O_RDONLY | kCautiously));
     if (!file.IsOpen() || IsSpecial(file.Get())) {
         LogError("Can't open bitmap file (%s)\n", path);
         return -1;
@@ -44,7 +46,7 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
     auto remaining = static_cast<int64_t>(std::min<uint64_t>(fileBytes, bitmap->size));
     int64_t offset = 0;
     while (remaining >= 1) {
-        const int64_t bytes = std::min(remaining, chunkBytes);
+        const int64_t bytes = std::min(remaining, kChunkBytes);
         LogDebug("Next read start = %d bytes=%d", static_cast<int>(offset),
                  static_cast<int>(bytes));
         const ssize_t result = read(file.Get(), bitmap->data + offset, static_cast<size_t>(bytes));
@@ -62,14 +64,14 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
 
 int BitmapWriteToFile(PinBitmap *bitmap, const char *path) {
     LogVerbose("Bytes to write = %d", static_cast<int>(bitmap->size));
-    const ScopedFd file(open(path, O_RDWR | O_CREAT | cautiously, 0644));
+    const ScopedFd file(open(path, O_RDWR | O_CREAT | kCautiously, 0644));
     if (!file.IsOpen() || IsSpecial(file.Get())) {
         LogError("Can't open bitmap file (%s) \n", path);
         return -1;
     }
     int64_t offset = 0;
     while (offset < bitmap->size) {
-        const int64_t bytes = std::min<int64_t>(bitmap->size - offset, chunkBytes);
+        const int64_t bytes = std::min<int64_t>(bitmap->size - offset, kChunkBytes);
         const ssize_t result = write(file.Get(), bitmap->data + offset, static_cast<size_t>(bytes));
         if (result == -1) {
             LogError("Write bitmap file (%s) error\n", path);
@@ -80,3 +82,5 @@ int BitmapWriteToFile(PinBitmap *bitmap, const char *path) {
     LogVerbose("Write to bitmap file (%s) size (%d) Finish", path, static_cast<int>(bitmap->size));
     return 0;
 }
+
+} // namespace vesk

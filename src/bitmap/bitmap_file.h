@@ -2,10 +2,11 @@
 // written in chunks of 4096 bytes.
 //
 // Thread rule: no state; a bitmap belongs to one thread at a time.
-#ifndef BITMAP_BITMAP_FILE_H
-#define BITMAP_BITMAP_FILE_H
+#pragma once
 
 #include "bitmap/pin_bitmap.h"
+
+namespace vesk {
 
 // Reads the file into the start of the bitmap's bytes; a file longer than the bitmap fills it
 // whole. A file that shrinks while it is read is read again and again until its bytes are there. 0,
@@ -16,4 +17,4 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap);
 // one. 0, or -1 after an error message; then the file may be partly rewritten.
 int BitmapWriteToFile(PinBitmap *bitmap, const char *path);
 
-#endif
+} // namespace vesk

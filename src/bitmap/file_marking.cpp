@@ -5,10 +5,12 @@
 
 #include <chrono>
 
+namespace vesk {
+
 namespace {
 
 // Times the extent lookup, for measurements on the appliance; off in every build that ships.
-const bool timeExtentLookup = false;
+const bool kTimeExtentLookup = false;
 
 using Clock = std::chrono::steady_clock;
 
@@ -36,14 +38,14 @@ int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &f
     LogVerbose("Add file (%s) start", filePath.c_str());
     FileMappingTable table;
     const Clock::time_point start = Clock::now(); // NOLINT(clang-analyzer-deadcode.DeadStores)
-    if (timeExtentLookup) {
+    if (kTimeExtentLookup) {
         LogVerbose("Get mapping of file (%s) start. Time=%s", filePath.c_str(), GetTimeString());
     }
     if (GetMappingTableFromFile(&table, mountPath, filePath, inode) < 0) {
         LogVerbose("Can't get mapping table of file (%s)", filePath.c_str());
         return -1;
     }
-    if (timeExtentLookup) {
+    if (kTimeExtentLookup) {
         LogVerbose("Geting mapping of file (%s) finish. Time=%s", filePath.c_str(),
                    GetTimeString());
         LogVerbose("Spend %f seconds", std::chrono::duration<double>(Clock::now() - start).count());
@@ -65,3 +67,5 @@ int UnsetBitmapAndAppendUnpinInfos(const char * /*cachePath*/, PinBitmap *bitmap
     ApplyExtents(table, filePath, bitmap, infos, LogHere());
     return 0;
 }
+
+} // namespace vesk

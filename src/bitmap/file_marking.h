@@ -5,8 +5,7 @@
 // either of them.
 //
 // Thread rule: no state; a bitmap belongs to one thread at a time.
-#ifndef BITMAP_FILE_MARKING_H
-#define BITMAP_FILE_MARKING_H
+#pragma once
 
 #include "bitmap/pin_bitmap.h"
 #include "driver/pin_interface.h"
@@ -16,6 +15,8 @@
 #include <cstdint>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // Marks the file's blocks and copies its extents to `*tableOut`. 0, or -1 with the bitmap
 // untouched.
@@ -28,4 +29,4 @@ int UnsetBitmapAndAppendUnpinInfos(const char *cachePath, PinBitmap *bitmap, con
                                    const std::string &filePath, uint32_t inode,
                                    std::vector<UnpinInfo> *infos);
 
-#endif
+} // namespace vesk

@@ -7,6 +7,8 @@
 #include <cstring>
 #include <endian.h>
 
+namespace vesk {
+
 namespace {
 
 void ApplyMask(unsigned char *byte, unsigned mask, bool set) {
@@ -64,8 +66,8 @@ void BitmapFree(PinBitmap *bitmap) {
 int BitmapOperation(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors, int op) {
     LogDebug("Disk start sector=%llu num sectors=%llu\n", LogU64(startSector), LogU64(numSectors));
     const uint64_t bits = static_cast<uint64_t>(bitmap->size) * 8;
-    const uint64_t first = startSector >> bitmapSectorShift;
-    const uint64_t last = (startSector + numSectors - 1) >> bitmapSectorShift;
+    const uint64_t first = startSector >> kBitmapSectorShift;
+    const uint64_t last = (startSector + numSectors - 1) >> kBitmapSectorShift;
     if (first > last || first >= bits) {
         return 0;
     }
@@ -80,3 +82,5 @@ int BitmapSetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors)
 int BitmapUnsetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors) {
     return BitmapOperation(bitmap, startSector, numSectors, 0);
 }
+
+} // namespace vesk

@@ -5,16 +5,17 @@
 // to 128*b + 127.
 //
 // Thread rule: no locking; a bitmap belongs to one thread at a time.
-#ifndef BITMAP_PIN_BITMAP_H
-#define BITMAP_PIN_BITMAP_H
+#pragma once
 
 #include "driver/pin_interface.h"
 
 #include <cstdint>
 
-const unsigned bitmapSectorShift = 7; // sectors to blocks: 128 sectors of 512 bytes
-const unsigned bitmapByteShift = 16;  // bytes to blocks: 64 KiB
-const unsigned bitmapSizeShift = 19;  // device bytes to bitmap bytes: 8 blocks a byte, rounded down
+namespace vesk {
+
+const unsigned kBitmapSectorShift = 7; // sectors to blocks: 128 sectors of 512 bytes
+const unsigned kBitmapByteShift = 16;  // bytes to blocks: 64 KiB
+const unsigned kBitmapSizeShift = 19; // device bytes to bitmap bytes: 8 blocks a byte, rounded down
 
 // Frees the bytes and the record (both malloc'd). A null record or null bytes are an error message.
 void BitmapFree(PinBitmap *bitmap);
@@ -28,4 +29,4 @@ int BitmapOperation(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors
 int BitmapSetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors);
 int BitmapUnsetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors);
 
-#endif
+} // namespace vesk

@@ -10,6 +10,8 @@
 
 #include <cstdlib>
 
+namespace vesk {
+
 namespace {
 
 // A record whose bytes were allocated is released here, and the caller's pointer says so.
@@ -27,7 +29,7 @@ int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes) {
         return -1;
     }
     LogVerbose("Disk size = %llu byte", LogU64(deviceBytes));
-    *sizeBytes = deviceBytes >> bitmapSizeShift;
+    *sizeBytes = deviceBytes >> kBitmapSizeShift;
     return 0;
 }
 
@@ -122,3 +124,5 @@ int BitmapWriteAndSend(PinBitmap *bitmap, const char *bitmapPath, const char *ca
     }
     return 0;
 }
+
+} // namespace vesk

@@ -2,8 +2,7 @@
 // file.
 //
 // Thread rule: no state; a bitmap belongs to one thread at a time.
-#ifndef BITMAP_SPACE_BITMAP_H
-#define BITMAP_SPACE_BITMAP_H
+#pragma once
 
 #include "base/log.h"
 #include "base/malloc_text.h"
@@ -11,6 +10,8 @@
 
 #include <cstdint>
 #include <memory>
+
+namespace vesk {
 
 // The bitmap size (bytes) that the cache device at `cachePath` needs. 0, or -1 after an error
 // message.
@@ -47,4 +48,4 @@ int VolumeBitmapOpen(const char *mountPath, VolumeBitmap *volume, const LogPlace
 int BitmapWriteAndSend(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
                        const LogPlace &place);
 
-#endif
+} // namespace vesk

@@ -5,6 +5,8 @@
 
 #include <cstring>
 
+namespace vesk {
+
 int CheckFilesExist(const char *paths) {
     if (paths == nullptr) {
         LogError("The file paths should not be NULL");
@@ -30,3 +32,5 @@ int CheckFilesExist(const char *paths) {
     }
     return 0;
 }
+
+} // namespace vesk

@@ -28,29 +28,31 @@
 #include <libgen.h>
 #include <new>
 
+using namespace vesk;
+
 namespace {
 
-const char buildStamp[] = "2018-06-08-15:24";
+const char kBuildStamp[] = "2018-06-08-15:24";
 
-const int success = 0; // exit values
-const int failure = -1;
+const int kSuccess = 0; // exit values
+const int kFailure = -1;
 
 // Readers of the log look for main, whichever of its handlers speaks.
 #define AtMain() (LogPlace{"main", __LINE__})
 
 // The exit value behind the message that tells of it.
-#define Succeed(...) (LogWrite(LogClass::Notice, AtMain(), __VA_ARGS__), success)
-#define Fail(...) (LogWrite(LogClass::Error, AtMain(), __VA_ARGS__), failure)
+#define Succeed(...) (LogWrite(LogClass::Notice, AtMain(), __VA_ARGS__), kSuccess)
+#define Fail(...) (LogWrite(LogClass::Error, AtMain(), __VA_ARGS__), kFailure)
 
 int PrintAnswer(bool yes) {
     puts(yes ? "Yes" : "No");
-    return success;
+    return kSuccess;
 }
 
 int NoCommand(const ToolParameters & /*asked*/) {
     LogWrite(LogClass::Error, AtMain(), "Invalid input");
     Usage();
-    return success;
+    return kSuccess;
 }
 
 int RunPinFiles(const ToolParameters &asked) {
@@ -73,8 +75,8 @@ int RunSendBitmap(const ToolParameters &asked) {
 }
 
 int RunStartService(const ToolParameters &asked) {
-    LogWrite(LogClass::Notice, AtMain(), "Service starts (Build time: %s)", buildStamp);
-    return StartService(&asked) < 0 ? Fail("Can't start service") : success;
+    LogWrite(LogClass::Notice, AtMain(), "Service starts (Build time: %s)", kBuildStamp);
+    return StartService(&asked) < 0 ? Fail("Can't start service") : kSuccess;
 }
 
 int RunHandleMount(const ToolParameters &asked) {
@@ -82,7 +84,7 @@ int RunHandleMount(const ToolParameters &asked) {
         return Fail("Handle space (%s) mount failed", asked.mountPath);
     }
     LogVerboseAt(AtMain(), "Handle space (%s) mount OK", asked.mountPath);
-    return success;
+    return kSuccess;
 }
 
 int RunHandleUmount(const ToolParameters &asked) {
@@ -90,7 +92,7 @@ int RunHandleUmount(const ToolParameters &asked) {
         return Fail("Handle space (%s) umount failed", asked.mountPath);
     }
     LogVerboseAt(AtMain(), "Handle space (%s) umount OK", asked.mountPath);
-    return success;
+    return kSuccess;
 }
 
 int RunSupportPin(const ToolParameters &asked) {
@@ -116,7 +118,7 @@ int RunGetUuid(const ToolParameters &asked) {
     if (uuid) {
         puts(uuid.get());
     }
-    return success;
+    return kSuccess;
 }
 
 int RunDeleteBitmap(const ToolParameters &asked) {
@@ -131,7 +133,7 @@ int RunCheckPin(const ToolParameters &asked) {
     case PinCheck::NotPinned: return PrintAnswer(false);
     case PinCheck::Error: puts("Error"); break;
     }
-    return success;
+    return kSuccess;
 }
 
 int RunReloadPinBlocks(const ToolParameters &asked) {
@@ -142,14 +144,14 @@ int RunReloadPinBlocks(const ToolParameters &asked) {
 }
 
 int RunUnpinAll(const ToolParameters &asked) {
-    return UnpinAllBlocks(&asked) == 0 ? success : failure;
+    return UnpinAllBlocks(&asked) == 0 ? kSuccess : kFailure;
 }
 
 int RunIsAllUnpin(const ToolParameters &asked) {
     int allUnpinned = 0;
     if (isAllBlocksUnpin(asked.cachePath, &allUnpinned) < 0) {
         puts("Get unpin information failed. (This cache doesn't support pin ?)");
-        return failure;
+        return kFailure;
     }
     return PrintAnswer(allUnpinned != 0);
 }
@@ -159,7 +161,7 @@ int ReportRange(int result, const char *what, const ToolParameters &asked) {
     LogWrite(result < 0 ? LogClass::Error : LogClass::Notice, AtMain(),
              "%s%s) %s (Start sector = %llu Num of sector = %llu)", what, asked.mountPath,
              result < 0 ? "failed" : "OK", LogU64(asked.startSector), LogU64(asked.numSectors));
-    return result < 0 ? failure : success;
+    return result < 0 ? kFailure : kSuccess;
 }
 
 int RunSetBitmap(const ToolParameters &asked) {
@@ -183,7 +185,7 @@ int RunGetBitmapSize(const ToolParameters &asked) {
         return Fail("Get bitmap size for volume (%s) failed", asked.mountPath);
     }
     printf("%llu\n", LogU64(size));
-    return success;
+    return kSuccess;
 }
 
 // In value order of the commands; each gives the exit value.
@@ -194,7 +196,7 @@ int (*const handlers[])(const ToolParameters &asked) = {
     RunUnpinAll,      RunIsAllUnpin,   RunSetBitmap,    RunUnsetBitmap, RunUnpinRange,
     RunGetBitmapSize,
 };
-static_assert(std::size(handlers) == commandGetBitmapSizeByte + 1, "a handler for every command");
+static_assert(std::size(handlers) == kCommandGetBitmapSizeByte + 1, "a handler for every command");
 
 // Static: the service's worker reads it after the first thread may have ended.
 ToolParameters parameters;
@@ -206,7 +208,7 @@ int main(int argc, char *argv[]) try {
     LogVerbose("Process name = %s", ProgramName);
     if (GetOptions(argc, argv, &parameters) < 0) {
         Usage();
-        return failure;
+        return kFailure;
     }
     if (parameters.debug != 0) {
         LogLevel = 3;

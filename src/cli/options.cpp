@@ -13,6 +13,8 @@
 #include <getopt.h>
 #include <iterator>
 
+namespace vesk {
+
 namespace {
 
 // An option where it was met on the command line; messages about it name that place.
@@ -86,49 +88,49 @@ const OptionAction KeepStartSector = KeepNumber<&ToolParameters::startSector>;
 const OptionAction KeepNumSectors = KeepNumber<&ToolParameters::numSectors>;
 
 using Requirement = int RequiredParameters::*;
-const Requirement cache = &RequiredParameters::cachePath;
-const Requirement config = &RequiredParameters::configPath;
-const Requirement files = &RequiredParameters::files;
-const Requirement mount = &RequiredParameters::mountPath;
-const Requirement start = &RequiredParameters::startSector;
-const Requirement count = &RequiredParameters::numSectors;
+const Requirement kCache = &RequiredParameters::cachePath;
+const Requirement kConfig = &RequiredParameters::configPath;
+const Requirement kFiles = &RequiredParameters::files;
+const Requirement kMount = &RequiredParameters::mountPath;
+const Requirement kStart = &RequiredParameters::startSector;
+const Requirement kCount = &RequiredParameters::numSectors;
 
 struct OptionRow {
     const char *name;
     int argument;
     int value; // the short option; a value that no character has: there is none
     OptionAction act = nullptr;
-    ToolCommand command = commandInvalid; // chooses none
+    ToolCommand command = kCommandInvalid; // chooses none
     Requirement needs[3] = {};
 };
 
-const OptionRow optionRows[] = {
-    {"pin-files", required_argument, 'a', KeepFiles, commandPinFiles, {files, mount}},
-    {"unpin-files", required_argument, 'b', KeepFiles, commandUnpinFiles, {files, mount}},
-    {"start-service", no_argument, 'c', nullptr, commandStartService, {config}},
+const OptionRow kOptionRows[] = {
+    {"pin-files", required_argument, 'a', KeepFiles, kCommandPinFiles, {kFiles, kMount}},
+    {"unpin-files", required_argument, 'b', KeepFiles, kCommandUnpinFiles, {kFiles, kMount}},
+    {"start-service", no_argument, 'c', nullptr, kCommandStartService, {kConfig}},
     {"config-path", required_argument, 'f', KeepConfigPath},
     {"space-uuid", required_argument, 'g', KeepSpaceUuid},
-    {"send-bitmap", no_argument, 'i', nullptr, commandSendBitmap, {mount}},
+    {"send-bitmap", no_argument, 'i', nullptr, kCommandSendBitmap, {kMount}},
     {"mount-path", required_argument, 'j', KeepMountPath},
-    {"support-pin", no_argument, 'k', nullptr, commandSupportPin, {mount}},
+    {"support-pin", no_argument, 'k', nullptr, kCommandSupportPin, {kMount}},
     {"stdout", no_argument, 'l', LogToStandardOutput},
-    {"check-bitmap", no_argument, 'm', nullptr, commandCheckBitmap, {mount}},
-    {"add-pending", no_argument, 'n', nullptr, commandAddPendingSpace, {mount}},
-    {"remove-pending", no_argument, 'o', nullptr, commandRemovePendingSpace, {mount}},
-    {"handle-mount", no_argument, 'p', nullptr, commandHandleMount, {mount, config}},
-    {"handle-umount", no_argument, 'q', nullptr, commandHandleUmount, {mount}},
-    {"get-uuid", no_argument, 'r', nullptr, commandGetUUID, {mount}},
-    {"delete-bitmap", no_argument, 's', nullptr, commandDeleteBitmap, {mount}},
-    {"check-pin", required_argument, 't', KeepCheckPinFile, commandCheckPin, {config}},
-    {"reload-blocks", no_argument, 'u', nullptr, commandReloadPinBlocks, {mount}},
-    {"unpin-all", no_argument, 'v', nullptr, commandUnpinAllBlocks},
-    {"is-all-unpin", required_argument, 'w', KeepCachePath, commandIsAllUnpin, {cache}},
-    {"set-bitmap", no_argument, 'x', nullptr, commandSetBitmap, {mount, start, count}},
+    {"check-bitmap", no_argument, 'm', nullptr, kCommandCheckBitmap, {kMount}},
+    {"add-pending", no_argument, 'n', nullptr, kCommandAddPendingSpace, {kMount}},
+    {"remove-pending", no_argument, 'o', nullptr, kCommandRemovePendingSpace, {kMount}},
+    {"handle-mount", no_argument, 'p', nullptr, kCommandHandleMount, {kMount, kConfig}},
+    {"handle-umount", no_argument, 'q', nullptr, kCommandHandleUmount, {kMount}},
+    {"get-uuid", no_argument, 'r', nullptr, kCommandGetUUID, {kMount}},
+    {"delete-bitmap", no_argument, 's', nullptr, kCommandDeleteBitmap, {kMount}},
+    {"check-pin", required_argument, 't', KeepCheckPinFile, kCommandCheckPin, {kConfig}},
+    {"reload-blocks", no_argument, 'u', nullptr, kCommandReloadPinBlocks, {kMount}},
+    {"unpin-all", no_argument, 'v', nullptr, kCommandUnpinAllBlocks},
+    {"is-all-unpin", required_argument, 'w', KeepCachePath, kCommandIsAllUnpin, {kCache}},
+    {"set-bitmap", no_argument, 'x', nullptr, kCommandSetBitmap, {kMount, kStart, kCount}},
     {"start-sector", required_argument, 0, KeepStartSector},
     {"num-sectors", required_argument, 1, KeepNumSectors},
-    {"unset-bitmap", no_argument, 2, nullptr, commandUnsetBitmap, {mount, start, count}},
-    {"unpin-range", no_argument, 3, nullptr, commandUnpinRange, {mount, start, count}},
-    {"get-bitmap-size-byte", no_argument, 4, nullptr, commandGetBitmapSizeByte, {mount}},
+    {"unset-bitmap", no_argument, 2, nullptr, kCommandUnsetBitmap, {kMount, kStart, kCount}},
+    {"unpin-range", no_argument, 3, nullptr, kCommandUnpinRange, {kMount, kStart, kCount}},
+    {"get-bitmap-size-byte", no_argument, 4, nullptr, kCommandGetBitmapSizeByte, {kMount}},
     {"cache-path", required_argument, 5, KeepCachePath},
     {"help", no_argument, 'h', Help},
     {"verbose", no_argument, 'y', EnableVerbose},
@@ -137,11 +139,11 @@ const OptionRow optionRows[] = {
 
 // 'r' and 'x' are missing and 'd' and 'e' have no option: scripts rely on what each of them does
 // now.
-const char shortOptions[] = "a:b:cdef:g:hij:klmnopqst:uvw:yz";
+const char kShortOptions[] = "a:b:cdef:g:hij:klmnopqst:uvw:yz";
 
 // No entry for "is all unpin": the names behind it answer for one value less, and the first
 // option's name for the last.
-const char *const commandNames[] = {
+const char *const kCommandNames[] = {
     "invalid",      "pinFiles",        "unpinFiles",         "sendBitmap",
     "startService", "handleMount",     "handleUmount",       "supportPin",
     "checkBitmap",  "addPendingSpace", "removePendingSpace", "getUUID",
@@ -151,7 +153,7 @@ const char *const commandNames[] = {
 };
 
 bool ActOnOption(const OptionRow &row, RequiredParameters *required, const MetOption &met) {
-    if (row.command != commandInvalid) {
+    if (row.command != kCommandInvalid) {
         met.parameters->command = row.command;
     }
     for (const Requirement need : row.needs) {
@@ -165,7 +167,7 @@ bool ActOnOption(const OptionRow &row, RequiredParameters *required, const MetOp
 } // namespace
 
 const char *ToolCommandToString(int command) {
-    return commandNames[command];
+    return kCommandNames[command];
 }
 
 void StripTrailingSlash(char *text) {
@@ -205,11 +207,11 @@ int CheckParameter(const RequiredParameters *required, const ToolParameters *par
         LogError("Check file paths error");
         return -1;
     }
-    if (required->startSector != 0 && parameters->startSector == sectorNotSet) {
+    if (required->startSector != 0 && parameters->startSector == kSectorNotSet) {
         LogError("Start sector is not set");
         return -1;
     }
-    if (required->numSectors != 0 && parameters->numSectors == sectorNotSet) {
+    if (required->numSectors != 0 && parameters->numSectors == kSectorNotSet) {
         LogError("Num of sectors is not set");
         return -1;
     }
@@ -217,22 +219,22 @@ int CheckParameter(const RequiredParameters *required, const ToolParameters *par
 }
 
 int GetOptions(int argc, char *argv[], ToolParameters *parameters) {
-    option longOptions[std::size(optionRows) + 1] = {};
-    std::transform(std::begin(optionRows), std::end(optionRows), longOptions,
+    option longOptions[std::size(kOptionRows) + 1] = {};
+    std::transform(std::begin(kOptionRows), std::end(kOptionRows), longOptions,
                    [](const OptionRow &row) {
                        return option{row.name, row.argument, nullptr, row.value};
                    });
     RequiredParameters required;
     optind = 0; // begin anew, whoever has parsed before
     int value = 0;
-    while ((value = getopt_long(argc, argv, shortOptions, longOptions, nullptr)) != -1) {
+    while ((value = getopt_long(argc, argv, kShortOptions, longOptions, nullptr)) != -1) {
         if (value == '?') {
             continue; // getopt_long has complained on standard error
         }
         const OptionRow *row =
-            std::find_if(std::begin(optionRows), std::end(optionRows),
+            std::find_if(std::begin(kOptionRows), std::end(kOptionRows),
                          [value](const OptionRow &one) { return one.value == value; });
-        if (row == std::end(optionRows)) {
+        if (row == std::end(kOptionRows)) {
             LogError("Get unhandled option = %c", value);
             fflush(stdout);
             abort();
@@ -247,7 +249,7 @@ int GetOptions(int argc, char *argv[], ToolParameters *parameters) {
         LogError("Check parameter failed");
         return -1;
     }
-    if (parameters->command == commandUnpinAllBlocks) {
+    if (parameters->command == kCommandUnpinAllBlocks) {
         if (parameters->mountPath == nullptr && parameters->cachePath == nullptr) {
             LogError("You must use --mount-path or --cache-path option!");
             return -1;
@@ -259,3 +261,5 @@ int GetOptions(int argc, char *argv[], ToolParameters *parameters) {
     }
     return 0;
 }
+
+} // namespace vesk

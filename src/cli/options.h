@@ -1,10 +1,11 @@
 // The command line: parsing it and checking that the chosen command has what it needs.
 //
 // Thread rule: called once, before any thread starts.
-#ifndef CLI_OPTIONS_H
-#define CLI_OPTIONS_H
+#pragma once
 
 #include "request/tool_parameters.h"
+
+namespace vesk {
 
 // What the command options ask for; several command options add up.
 struct RequiredParameters {
@@ -32,4 +33,4 @@ const char *ToolCommandToString(int command);
 // Takes one "/" off the end of a text longer than that. Null is left alone.
 void StripTrailingSlash(char *text);
 
-#endif
+} // namespace vesk

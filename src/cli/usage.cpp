@@ -4,11 +4,13 @@
 
 #include <cstdio>
 
+namespace vesk {
+
 namespace {
 
 // Scripts and people compare this text, so its slips stay: "--check-bitmp", the parenthesis left
 // open, the trailing blanks. Every %s is the program's name.
-const char *const usageLines[] = {
+const char *const kUsageLines[] = {
     "Usage:\n",
     "\tStart service:\n",
     "\t\t%s --start-service --config-path conf_path\n",
@@ -51,7 +53,9 @@ const char *const usageLines[] = {
 } // namespace
 
 void Usage() {
-    for (const char *line : usageLines) {
+    for (const char *line : kUsageLines) {
         printf(line, ProgramName); // NOLINT: every line has one %s or none
     }
 }
+
+} // namespace vesk

@@ -1,8 +1,9 @@
 // The usage text. Thread rule: writes to standard output; no state.
-#ifndef CLI_USAGE_H
-#define CLI_USAGE_H
+#pragma once
+
+namespace vesk {
 
 // Prints the usage text, with ProgramName in its example lines, to standard output.
 void Usage();
 
-#endif
+} // namespace vesk

@@ -5,6 +5,8 @@
 #include "driver/bitmap_control.h"
 #include "space/space_cache.h"
 
+namespace vesk {
+
 int CheckBitmapSet(const char *mountPath) {
     int result = 0;
     MallocText cachePath;
@@ -23,3 +25,5 @@ int CheckBitmapSet(const char *mountPath) {
     LogVerbose("Bitmap set state = %d", result);
     return result;
 }
+
+} // namespace vesk

@@ -7,6 +7,8 @@
 
 #include <string>
 
+namespace vesk {
+
 PinCheck CheckFileIsPin(const char *configPath, const char *filePath) {
     if (!PathExists(configPath)) {
         LogError("Can't find config file (%s)", configPath);
@@ -35,3 +37,5 @@ PinCheck CheckFileIsPin(const char *configPath, const char *filePath) {
     return volumes[mountPath]["files"].isMember(std::to_string(inode)) ? PinCheck::Pinned
                                                                        : PinCheck::NotPinned;
 }
+
+} // namespace vesk

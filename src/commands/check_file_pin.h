@@ -1,7 +1,8 @@
 // Asking the configuration whether a file is pinned.
 // Thread rule: for one-shot processes; no lock is taken.
-#ifndef COMMANDS_CHECK_FILE_PIN_H
-#define COMMANDS_CHECK_FILE_PIN_H
+#pragma once
+
+namespace vesk {
 
 enum class PinCheck : int {
     Pinned = 0,
@@ -12,4 +13,4 @@ enum class PinCheck : int {
 // Whether the file's inode number is recorded for the volume of its top directory.
 PinCheck CheckFileIsPin(const char *configPath, const char *filePath);
 
-#endif
+} // namespace vesk

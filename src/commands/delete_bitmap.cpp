@@ -7,6 +7,8 @@
 
 #include <unistd.h>
 
+namespace vesk {
+
 int DeleteBitmap(const char *mountPath) {
     const MallocText bitmapPath(BitmapGetPathByReferencePath(mountPath));
     if (!bitmapPath) {
@@ -23,3 +25,5 @@ int DeleteBitmap(const char *mountPath) {
     }
     return 0;
 }
+
+} // namespace vesk

@@ -1,10 +1,11 @@
 // Deleting a volume's bitmap file.
 // Thread rule: for one-shot processes; no lock is taken.
-#ifndef COMMANDS_DELETE_BITMAP_H
-#define COMMANDS_DELETE_BITMAP_H
+#pragma once
+
+namespace vesk {
 
 // Records and driver keep what they have. 0, also when there is no bitmap file, or -1 after an
 // error message.
 int DeleteBitmap(const char *mountPath);
 
-#endif
+} // namespace vesk

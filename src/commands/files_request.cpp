@@ -10,17 +10,19 @@
 #include <cerrno>
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
 bool IsFilesRequest(int requestType) {
-    return requestType == requestPinFiles || requestType == requestUnpinFiles;
+    return requestType == kRequestPinFiles || requestType == kRequestUnpinFiles;
 }
 
 } // namespace
 
 int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) {
     LogTraceScope();
-    if (!IsFilesRequest(requestType) && requestType != requestReloadPinBlocks) {
+    if (!IsFilesRequest(requestType) && requestType != kRequestReloadPinBlocks) {
         LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
         return -1;
     }
@@ -28,7 +30,7 @@ int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) 
         LogError("Volume (%s) doesn't support pin", parameters->mountPath);
         return -1;
     }
-    const int queueId = MsgQueueGet(messageKeyFile);
+    const int queueId = MsgQueueGet(kMessageKeyFile);
     if (queueId == -1) {
         LogError("Can't get server messsage queue: %s", strerror(errno));
         return -1;
@@ -39,13 +41,15 @@ int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) 
 }
 
 int PinFilesRequest(const ToolParameters *parameters) {
-    return HandleFilesByRequestType(parameters, requestPinFiles);
+    return HandleFilesByRequestType(parameters, kRequestPinFiles);
 }
 
 int UnpinFilesRequest(const ToolParameters *parameters) {
-    return HandleFilesByRequestType(parameters, requestUnpinFiles);
+    return HandleFilesByRequestType(parameters, kRequestUnpinFiles);
 }
 
 int ReloadPinBlocksRequest(const ToolParameters *parameters) {
-    return HandleFilesByRequestType(parameters, requestReloadPinBlocks);
+    return HandleFilesByRequestType(parameters, kRequestReloadPinBlocks);
 }
+
+} // namespace vesk

@@ -3,8 +3,9 @@
 // It is checked first that the volume's cache supports pinning; without it no queue is touched.
 //
 // Thread rule: for one-shot processes; any number of them may send at once.
-#ifndef COMMANDS_FILES_REQUEST_H
-#define COMMANDS_FILES_REQUEST_H
+#pragma once
+
+namespace vesk {
 
 struct ToolParameters;
 
@@ -15,4 +16,4 @@ int PinFilesRequest(const ToolParameters *parameters);
 int UnpinFilesRequest(const ToolParameters *parameters);
 int ReloadPinBlocksRequest(const ToolParameters *parameters);
 
-#endif
+} // namespace vesk

@@ -5,6 +5,8 @@
 #include "bitmap/space_bitmap.h"
 #include "space/space_cache.h"
 
+namespace vesk {
+
 int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
     const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
     if (!cachePath) {
@@ -17,3 +19,5 @@ int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
     }
     return 0;
 }
+
+} // namespace vesk

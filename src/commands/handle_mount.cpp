@@ -9,6 +9,8 @@
 
 #include <unistd.h>
 
+namespace vesk {
+
 int HandleSpaceMount(const char *configPath, const char *mountPath) {
     if (SpaceHasCacheAndSupportPin(mountPath) == 1) {
         return 0;
@@ -32,3 +34,5 @@ int HandleSpaceMount(const char *configPath, const char *mountPath) {
     }
     return 0;
 }
+
+} // namespace vesk

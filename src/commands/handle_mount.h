@@ -4,10 +4,11 @@
 // a cache loses its records and its bitmap file, so that stale pins never reach a cache made later.
 //
 // Thread rule: for one-shot processes. The configuration is changed without the service's lock.
-#ifndef COMMANDS_HANDLE_MOUNT_H
-#define COMMANDS_HANDLE_MOUNT_H
+#pragma once
+
+namespace vesk {
 
 // 0, or -1 after an error message; records already removed stay removed.
 int HandleSpaceMount(const char *configPath, const char *mountPath);
 
-#endif
+} // namespace vesk

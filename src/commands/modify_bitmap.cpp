@@ -3,10 +3,12 @@
 #include "base/log.h"
 #include "bitmap/space_bitmap.h"
 
+namespace vesk {
+
 namespace {
 
-const int opUnset = 0;
-const int opSet = 1;
+const int kOpUnset = 0;
+const int kOpSet = 1;
 
 } // namespace
 
@@ -15,12 +17,12 @@ int ModifyBitmap(const char *mountPath, uint64_t startSector, uint64_t numSector
     if (VolumeBitmapOpen(mountPath, &volume, LogHere()) < 0) {
         return -1;
     }
-    if (op != opSet && op != opUnset) {
+    if (op != kOpSet && op != kOpUnset) {
         LogError("Unknown bitmap op = %d", op);
         return -1;
     }
     if (BitmapOperation(volume.bitmap.get(), startSector, numSectors, op) != 0) {
-        LogError(op == opSet ? "Can't get bitmap to file" : "Can't unset bitmap to file");
+        LogError(op == kOpSet ? "Can't get bitmap to file" : "Can't unset bitmap to file");
         return -1;
     }
     return BitmapWriteAndSend(volume.bitmap.get(), volume.bitmapPath.get(), volume.cachePath.get(),
@@ -28,7 +30,7 @@ int ModifyBitmap(const char *mountPath, uint64_t startSector, uint64_t numSector
 }
 
 int SetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
-    if (ModifyBitmap(mountPath, startSector, numSectors, opSet) != 0) {
+    if (ModifyBitmap(mountPath, startSector, numSectors, kOpSet) != 0) {
         LogError("Set bitmap failed");
         return -1;
     }
@@ -36,9 +38,11 @@ int SetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) 
 }
 
 int UnsetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
-    if (ModifyBitmap(mountPath, startSector, numSectors, opUnset) != 0) {
+    if (ModifyBitmap(mountPath, startSector, numSectors, kOpUnset) != 0) {
         LogError("Set bitmap failed");
         return -1;
     }
     return 0;
 }
+
+} // namespace vesk

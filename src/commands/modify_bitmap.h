@@ -2,10 +2,11 @@
 // read into the cache and no record changes.
 //
 // Thread rule: for one-shot processes; no lock is taken.
-#ifndef COMMANDS_MODIFY_BITMAP_H
-#define COMMANDS_MODIFY_BITMAP_H
+#pragma once
 
 #include <cstdint>
+
+namespace vesk {
 
 // Sets (op 1) or clears (op 0) the range (512-byte sectors), writes the bitmap file and sends the
 // bitmap to the driver. 0, or -1 after an error message; what came before the failure stays.
@@ -14,4 +15,4 @@ int ModifyBitmap(const char *mountPath, uint64_t startSector, uint64_t numSector
 int SetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors);
 int UnsetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors);
 
-#endif
+} // namespace vesk

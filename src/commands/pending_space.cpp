@@ -9,13 +9,15 @@
 #include <cerrno>
 #include <cstring>
 
+namespace vesk {
+
 int SetSpaceStateRequest(const char *mountPath, int requestType) {
     LogTraceScope();
     if (!SpaceHasCacheAndSupportPin(mountPath)) {
         LogError("Volume (%s) doesn't support pin", mountPath);
         return -1;
     }
-    if (requestType != requestAddPendingSpace && requestType != requestRemovePendigSpace) {
+    if (requestType != kRequestAddPendingSpace && requestType != kRequestRemovePendigSpace) {
         LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
         return -1;
     }
@@ -24,7 +26,7 @@ int SetSpaceStateRequest(const char *mountPath, int requestType) {
     // failure does not matter either, and its message is never written.
     const int queueId = -1;
     const bool queueMatters = false;
-    if (MsgQueueGet(messageKeyFile) == -1 && queueMatters) {
+    if (MsgQueueGet(kMessageKeyFile) == -1 && queueMatters) {
         LogError("Can't open server messsage queue: %s", strerror(errno));
         return -1;
     }
@@ -33,9 +35,11 @@ int SetSpaceStateRequest(const char *mountPath, int requestType) {
 }
 
 int AddPendingSpaceRequest(const char *mountPath) {
-    return SetSpaceStateRequest(mountPath, requestAddPendingSpace);
+    return SetSpaceStateRequest(mountPath, kRequestAddPendingSpace);
 }
 
 int RemovePendingSpaceRequest(const char *mountPath) {
-    return SetSpaceStateRequest(mountPath, requestRemovePendigSpace);
+    return SetSpaceStateRequest(mountPath, kRequestRemovePendigSpace);
 }
+
+} // namespace vesk

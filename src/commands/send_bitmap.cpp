@@ -8,6 +8,8 @@
 #include "space/space_bitmap_path.h"
 #include "space/space_cache.h"
 
+namespace vesk {
+
 int SendBitmap(const char *mountPath) {
     if (!SpaceHasCacheAndSupportPin(mountPath)) {
         LogError("Volume (%s) doesn't support pin", mountPath);
@@ -48,3 +50,5 @@ int SendBitmap(const char *mountPath) {
     return BitmapWriteAndSend(volume.bitmap.get(), volume.sizeChanged ? bitmapPath : nullptr,
                               cachePath, LogHere());
 }
+
+} // namespace vesk

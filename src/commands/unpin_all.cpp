@@ -7,12 +7,14 @@
 #include "request/tool_parameters.h"
 #include "space/space_cache.h"
 
+namespace vesk {
+
 int UnpinAllBlocksByCachePath(const char *cachePath) {
     if (cachePath == nullptr) {
         LogError("Incorrect parameter");
         return -1;
     }
-    return DoIoctlOrSay("Ioctl for unpin all cache blocks failed", cachePath, pinIoctlUnpinAll,
+    return DoIoctlOrSay("Ioctl for unpin all cache blocks failed", cachePath, kPinIoctlUnpinAll,
                         nullptr, 0, LogHere());
 }
 
@@ -41,3 +43,5 @@ int UnpinAllBlocks(const ToolParameters *parameters) {
     LogNotice("Unpin all blocks of %s (%s) finish", kind, path);
     return 0;
 }
+
+} // namespace vesk

@@ -1,7 +1,8 @@
 // Unpinning every block of a cache. Neither bitmap file nor configuration is changed.
 // Thread rule: for one-shot processes; no lock is taken.
-#ifndef COMMANDS_UNPIN_ALL_H
-#define COMMANDS_UNPIN_ALL_H
+#pragma once
+
+namespace vesk {
 
 struct ToolParameters;
 
@@ -11,4 +12,4 @@ int UnpinAllBlocks(const ToolParameters *parameters);
 int UnpinAllBlocksByMouhtPath(const char *mountPath);
 int UnpinAllBlocksByCachePath(const char *cachePath);
 
-#endif
+} // namespace vesk

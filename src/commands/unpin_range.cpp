@@ -5,6 +5,8 @@
 #include "driver/unpin_ranges.h"
 #include "space/space_cache.h"
 
+namespace vesk {
+
 int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
     LogTraceScope();
     const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
@@ -16,3 +18,5 @@ int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors)
     list.ranges[0] = {startSector, numSectors};
     return SendUnpinList(cachePath.get(), &list, LogHere());
 }
+
+} // namespace vesk

@@ -5,6 +5,8 @@
 
 #include <algorithm>
 
+namespace vesk {
+
 namespace {
 
 bool IsText(const Json::Value &value) {
@@ -98,3 +100,5 @@ int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig m
     }
     return -1;
 }
+
+} // namespace vesk

@@ -6,13 +6,14 @@
 // may be any scalar, as jsoncpp converts those.
 //
 // Thread rule: no state; callers that change the document hold the service lock over the cycle.
-#ifndef CONFIG_CONFIG_DOCUMENT_H
-#define CONFIG_CONFIG_DOCUMENT_H
+#pragma once
 
 #include "base/log.h"
 
 #include <functional>
 #include <json/value.h>
+
+namespace vesk {
 
 // Whether the operations on the document can work on it without a type error.
 bool ConfigHasShape(const Json::Value &root);
@@ -37,4 +38,4 @@ int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChan
 int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig missing,
                 const LogPlace &place);
 
-#endif
+} // namespace vesk

@@ -1,9 +1,10 @@
 // Arrays of strings inside the configuration document. Thread rule: no state.
-#ifndef CONFIG_JSON_ARRAY_H
-#define CONFIG_JSON_ARRAY_H
+#pragma once
 
 #include <json/value.h>
 #include <string>
+
+namespace vesk {
 
 // Whether some element, taken as a string, equals `text`. Anything but an array answers false.
 // Elements must be scalars: others make jsoncpp throw.
@@ -14,4 +15,4 @@ bool JsonArrayHasString(Json::Value array, const char *text);
 // guess, and the array stays as it was. Elements must be scalars.
 int JsonArrayRemoveString(Json::Value &array, const std::string &text);
 
-#endif
+} // namespace vesk

@@ -13,6 +13,8 @@
 #include <sstream>
 #include <sys/stat.h>
 
+namespace vesk {
+
 namespace {
 
 // jsoncpp throws on a document nested deeper than it is willing to follow. What only a lenient
@@ -82,3 +84,5 @@ int WriteJsonToFile(const Json::Value &root, const char *path) {
     }
     return 0;
 }
+
+} // namespace vesk

@@ -1,11 +1,12 @@
 // The two file primitives of the configuration: read a whole JSON document, write a whole JSON
 // document. Thread rule: no state; callers that change a document hold the service lock over the
 // cycle.
-#ifndef CONFIG_JSON_FILE_H
-#define CONFIG_JSON_FILE_H
+#pragma once
 
 #include <json/value.h>
 #include <string>
+
+namespace vesk {
 
 // 0, or -1 after an error message when the file cannot be opened or is not JSON (an empty one is
 // not);
@@ -17,4 +18,4 @@ int ReadFileToJson(const std::string &path, Json::Value *root);
 // leaves the old one in place and is not reported: 0.
 int WriteJsonToFile(const Json::Value &root, const char *path);
 
-#endif
+} // namespace vesk

@@ -9,10 +9,12 @@
 
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
-const int volumeAbsent = 1;
-const int volumeRemoved = 2;
+const int kVolumeAbsent = 1;
+const int kVolumeRemoved = 2;
 
 } // namespace
 
@@ -22,7 +24,7 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
         RequestToString(&text, record);
         LogVerbose("mount path = %s request = %s", record->mountPath, text.c_str());
     }
-    if (record->type != requestPinFiles && record->type != requestUnpinFiles) {
+    if (record->type != kRequestPinFiles && record->type != kRequestUnpinFiles) {
         LogVerbose("No need to update pin file list");
         return 0;
     }
@@ -32,7 +34,7 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
         LogError("Can't get file infos");
         return -1;
     }
-    const bool pins = record->type == requestPinFiles;
+    const bool pins = record->type == kRequestPinFiles;
     for (const FileInfo &info : infos) {
         const std::string key = std::to_string(info.inodeNum);
         const char *path = info.szRelativePath;
@@ -58,10 +60,10 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
 int JsonRemovePinFileVolume(Json::Value &root, const char *mountPath) {
     Json::Value &volumes = root["volumes"];
     if (!volumes.isMember(mountPath) || volumes[mountPath].isNull()) {
-        return volumeAbsent;
+        return kVolumeAbsent;
     }
     volumes.removeMember(mountPath);
-    return volumeRemoved;
+    return kVolumeRemoved;
 }
 
 int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *record,
@@ -80,7 +82,7 @@ int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
     const LogPlace place = LogHere();
     bool removed = false;
     const auto remove = [mountPath, &place, &removed](Json::Value &root) {
-        removed = JsonRemovePinFileVolume(root, mountPath) == volumeRemoved;
+        removed = JsonRemovePinFileVolume(root, mountPath) == kVolumeRemoved;
         if (!removed) {
             LogWrite(LogClass::Verbose, place,
                      "Volume (%s) deson't has pin files, no need to remove", mountPath);
@@ -93,3 +95,5 @@ int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
     }
     return result;
 }
+
+} // namespace vesk

@@ -6,14 +6,15 @@
 // Locks: ConfigUpdatedByFinishedRequest holds the service lock over its cycle;
 // ConfigRemovePinFileVolume takes no lock, it runs in a one-shot process. The Json... functions
 // work on a tree of the documented shape that nobody else uses.
-#ifndef CONFIG_PINNED_FILES_H
-#define CONFIG_PINNED_FILES_H
+#pragma once
 
 #include "request/request_record.h"
 #include "state/service_state.h"
 
 #include <json/value.h>
 #include <string>
+
+namespace vesk {
 
 // Applies a finished pin or unpin request to the volume's records; other types change nothing. 0,
 // or -1 after an error message; then the tree must not be written.
@@ -31,4 +32,4 @@ int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *
 // nothing. 0, or -1 after an error message with the file as it was.
 int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath);
 
-#endif
+} // namespace vesk

@@ -10,14 +10,16 @@
 #include <cstdint>
 #include <cstdio>
 
+namespace vesk {
+
 namespace {
 
-const int64_t requestNumberModulus = 2147483646;
+const int64_t kRequestNumberModulus = 2147483646;
 
 // The number of the next request; the document's counter moves on.
 int TakeRequestNumber(Json::Value &nextRequestNum) {
     const int number = nextRequestNum.asInt(); // 0 for null
-    nextRequestNum = static_cast<int>((static_cast<int64_t>(number) + 1) % requestNumberModulus);
+    nextRequestNum = static_cast<int>((static_cast<int64_t>(number) + 1) % kRequestNumberModulus);
     return number;
 }
 
@@ -44,8 +46,8 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
     request["type"] = typeName;
     request["mountPath"] = record->mountPath;
     request["data"] = Json::Value();
-    if (record->type == requestPinFiles || record->type == requestUnpinFiles) {
-        char list[requestDataBytes] = {};
+    if (record->type == kRequestPinFiles || record->type == kRequestUnpinFiles) {
+        char list[kRequestDataBytes] = {};
         if (AbsolutePathsToFileInodeList(record->mountPath, record->data, list, sizeof(list)) < 0) {
             LogError("Get relative paths failed");
             return -1;
@@ -105,3 +107,5 @@ int ConfigDropErrorRequest(const char *configPath, const RequestRecord * /*recor
     };
     return ConfigUpdate(configPath, MissingConfig::IsAnError, remove, LogHere());
 }
+
+} // namespace vesk

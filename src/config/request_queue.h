@@ -6,14 +6,15 @@
 // Locks: the Config... functions hold the service lock over their read-change-write cycle unless
 // they say otherwise; the Json... functions work on a tree of the documented shape that nobody else
 // uses.
-#ifndef CONFIG_REQUEST_QUEUE_H
-#define CONFIG_REQUEST_QUEUE_H
+#pragma once
 
 #include "request/request_record.h"
 #include "state/service_state.h"
 
 #include <json/value.h>
 #include <string>
+
+namespace vesk {
 
 // Adds the request to the document in memory. The record's texts are NUL-terminated. 0, or -1 after
 // an error message; then the tree is half changed and must not be written.
@@ -38,4 +39,4 @@ int ConfigGetJsonAndNumRequest(const char *configPath, Json::Value *root, int *c
 int ConfigDropErrorRequest(const char *configPath, const RequestRecord *record,
                            const std::string &num) NEEDS_NO_LOCK(serviceLock);
 
-#endif
+} // namespace vesk

@@ -3,7 +3,9 @@
 #include "base/log.h"
 #include "driver/device_ioctl.h"
 
-static_assert(sizeof(void *) != 4 || sizeof(PinBitmap) == pinBitmapDescriptorBytes,
+namespace vesk {
+
+static_assert(sizeof(void *) != 4 || sizeof(PinBitmap) == kPinBitmapDescriptorBytes,
               "the record is the descriptor that the driver of the 32-bit target reads");
 
 int BitmapSendToDriver(PinBitmap *bitmap, const char *cachePath) {
@@ -12,12 +14,12 @@ int BitmapSendToDriver(PinBitmap *bitmap, const char *cachePath) {
         LogError("Incorrect parameter");
         return -1;
     }
-    return DoIoctlOrSay("Ioctl error", cachePath, pinIoctlSetBitmap, bitmap,
-                        pinBitmapDescriptorBytes, LogHere());
+    return DoIoctlOrSay("Ioctl error", cachePath, kPinIoctlSetBitmap, bitmap,
+                        kPinBitmapDescriptorBytes, LogHere());
 }
 
 int BitmapIsSet(const char *cachePath, int *isSet) {
-    if (DoIoctlOrSay("Ioctl error", cachePath, pinIoctlQueryBitmapSet, isSet, sizeof(*isSet),
+    if (DoIoctlOrSay("Ioctl error", cachePath, kPinIoctlQueryBitmapSet, isSet, sizeof(*isSet),
                      LogHere()) < 0) {
         return -1;
     }
@@ -28,10 +30,12 @@ int BitmapIsSet(const char *cachePath, int *isSet) {
 int isAllBlocksUnpin(const char *cachePath, int *allUnpinned) {
     LogTraceScope();
     LogVerbose("Cache path = %s", cachePath);
-    if (DoIoctlOrSay("Ioctl error", cachePath, pinIoctlQueryAllUnpinned, allUnpinned,
+    if (DoIoctlOrSay("Ioctl error", cachePath, kPinIoctlQueryAllUnpinned, allUnpinned,
                      sizeof(*allUnpinned), LogHere()) < 0) {
         return -1;
     }
     LogVerbose("Is all block unpin = %d", *allUnpinned);
     return 0;
 }
+
+} // namespace vesk

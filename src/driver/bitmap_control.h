@@ -1,10 +1,11 @@
 // Handing the pin bitmap to the cache driver and asking for the driver's pin state.
 //
 // Thread rule: no state; every request opens the device anew.
-#ifndef DRIVER_BITMAP_CONTROL_H
-#define DRIVER_BITMAP_CONTROL_H
+#pragma once
 
 #include "driver/pin_interface.h"
+
+namespace vesk {
 
 // Hands over the whole bitmap. 0, or -1 after an error message (also for null arguments).
 int BitmapSendToDriver(PinBitmap *bitmap, const char *cachePath);
@@ -16,4 +17,4 @@ int BitmapIsSet(const char *cachePath, int *isSet);
 // message.
 int isAllBlocksUnpin(const char *cachePath, int *allUnpinned);
 
-#endif
+} // namespace vesk

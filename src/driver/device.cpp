@@ -7,6 +7,8 @@
 #include <linux/fs.h>
 #include <sys/ioctl.h>
 
+namespace vesk {
+
 // The request number carries the size of size_t, not of the 64-bit count that the kernel writes.
 static_assert(sizeof(void *) != 4 || BLKGETSIZE64 == 0x80041272, "request of the 32-bit target");
 
@@ -22,3 +24,5 @@ int DeviceGetSizeByte(const char *path, uint64_t *sizeBytes) {
     }
     return 0;
 }
+
+} // namespace vesk

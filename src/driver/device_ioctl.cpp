@@ -5,6 +5,8 @@
 #include <fcntl.h>
 #include <sys/ioctl.h>
 
+namespace vesk {
+
 int DoIoctl(const char *devicePath, unsigned request, void *data, int size) {
     LogTraceScope();
     const ScopedFd device(open(devicePath, O_RDWR | O_CLOEXEC));
@@ -30,3 +32,5 @@ int DoIoctlOrSay(const char *failure, const char *devicePath, unsigned request, 
     }
     return result;
 }
+
+} // namespace vesk

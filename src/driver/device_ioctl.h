@@ -1,8 +1,9 @@
 // One ioctl request on a cache device node. Thread rule: no state; callable from any thread.
-#ifndef DRIVER_DEVICE_IOCTL_H
-#define DRIVER_DEVICE_IOCTL_H
+#pragma once
 
 #include "base/log.h"
+
+namespace vesk {
 
 // Opens the device for reading and writing, issues the request (with no third argument when `data`
 // is null) and closes it. `size` (bytes of `data`) is for the error message only. 0 when the
@@ -13,4 +14,4 @@ int DoIoctl(const char *devicePath, unsigned request, void *data, int size);
 int DoIoctlOrSay(const char *failure, const char *devicePath, unsigned request, void *data,
                  int size, const LogPlace &place);
 
-#endif
+} // namespace vesk

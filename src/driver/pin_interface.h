@@ -2,20 +2,21 @@
 //
 // Numbers are fixed constants: the two requests that hand over a record carry no size and no
 // direction in their encoding although the driver follows the pointer.
-#ifndef DRIVER_PIN_INTERFACE_H
-#define DRIVER_PIN_INTERFACE_H
+#pragma once
 
 #include <cstddef>
 #include <cstdint>
 
-const unsigned pinIoctlSetBitmap = 0x0000FECF;        // payload: PinBitmap, the bitmap descriptor
-const unsigned pinIoctlQueryBitmapSet = 0x8004FECF;   // payload: 32-bit int, filled by the driver
-const unsigned pinIoctlUnpinRanges = 0x0000FED0;      // payload: a whole range list
-const unsigned pinIoctlUnpinAll = 0x0000FED1;         // no payload
-const unsigned pinIoctlQueryAllUnpinned = 0x8004FED2; // payload: 32-bit int, filled by the driver
+namespace vesk {
+
+const unsigned kPinIoctlSetBitmap = 0x0000FECF;        // payload: PinBitmap, the bitmap descriptor
+const unsigned kPinIoctlQueryBitmapSet = 0x8004FECF;   // payload: 32-bit int, filled by the driver
+const unsigned kPinIoctlUnpinRanges = 0x0000FED0;      // payload: a whole range list
+const unsigned kPinIoctlUnpinAll = 0x0000FED1;         // no payload
+const unsigned kPinIoctlQueryAllUnpinned = 0x8004FED2; // payload: 32-bit int, filled by the driver
 
 // Size of the bitmap descriptor (bytes): a 32-bit address and a 32-bit length.
-const int pinBitmapDescriptorBytes = 8;
+const int kPinBitmapDescriptorBytes = 8;
 
 // A pin bitmap, and the descriptor that the driver reads (8 bytes on the 32-bit target): field
 // order counts. What the bits mean stands in bitmap/pin_bitmap.h.
@@ -33,11 +34,11 @@ struct UnpinInfo {
 static_assert(sizeof(UnpinInfo) == 16, "the driver reads 16-byte records");
 
 // The range list: filled from the front; an all-zero record ends it unless all records are used.
-const size_t unpinListRecords = 1024;
-const size_t unpinListBytes = 16384;
+const size_t kUnpinListRecords = 1024;
+const size_t kUnpinListBytes = 16384;
 struct UnpinList {
-    UnpinInfo ranges[unpinListRecords];
+    UnpinInfo ranges[kUnpinListRecords];
 };
-static_assert(sizeof(UnpinList) == unpinListBytes, "the driver copies 16384 bytes");
+static_assert(sizeof(UnpinList) == kUnpinListBytes, "the driver copies 16384 bytes");
 
-#endif
+} // namespace vesk

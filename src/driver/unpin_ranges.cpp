@@ -4,6 +4,8 @@
 
 #include <sys/types.h>
 
+namespace vesk {
+
 void DumpRanges(const UnpinInfo *ranges, size_t count) {
     for (size_t i = 0; i < count; ++i) {
         LogNotice("Unpin range [%zd] start sector = %llu num sectors = %llu",
@@ -13,8 +15,8 @@ void DumpRanges(const UnpinInfo *ranges, size_t count) {
 }
 
 int SendUnpinList(const char *cachePath, UnpinList *list, const LogPlace &place) {
-    return DoIoctlOrSay("Send unpin inctl to driver failed", cachePath, pinIoctlUnpinRanges, list,
-                        unpinListBytes, place);
+    return DoIoctlOrSay("Send unpin inctl to driver failed", cachePath, kPinIoctlUnpinRanges, list,
+                        kUnpinListBytes, place);
 }
 
 int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &ranges) {
@@ -24,7 +26,7 @@ int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &r
     size_t count = 0;
     for (size_t i = 0; i <= ranges.size(); ++i) {
         const bool atEnd = i == ranges.size();
-        if (!atEnd && count < unpinListRecords) {
+        if (!atEnd && count < kUnpinListRecords) {
             list.ranges[count++] = ranges[i];
             continue;
         }
@@ -35,7 +37,7 @@ int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &r
         // field have only ever seen lists cut this way.
         if (LogLevel > 1) {
             LogVerbose("Send unpin inctl to driver, size=%zd",
-                       static_cast<ssize_t>(unpinListBytes));
+                       static_cast<ssize_t>(kUnpinListBytes));
             DumpRanges(list.ranges, count);
         }
         if (SendUnpinList(cachePath, &list, LogHere()) < 0) {
@@ -46,3 +48,5 @@ int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &r
     }
     return 0;
 }
+
+} // namespace vesk

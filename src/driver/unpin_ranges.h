@@ -1,14 +1,15 @@
 // Telling the cache driver which sector ranges it may release.
 //
 // Thread rule: no state; every request opens the device anew.
-#ifndef DRIVER_UNPIN_RANGES_H
-#define DRIVER_UNPIN_RANGES_H
+#pragma once
 
 #include "base/log.h"
 #include "driver/pin_interface.h"
 
 #include <cstddef>
 #include <vector>
+
+namespace vesk {
 
 // Logs each range, at every level.
 void DumpRanges(const UnpinInfo *ranges, size_t count);
@@ -21,4 +22,4 @@ int SendUnpinList(const char *cachePath, UnpinList *list, const LogPlace &place)
 // -1 after an error message; lists sent before the failure stay sent.
 int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &ranges);
 
-#endif
+} // namespace vesk

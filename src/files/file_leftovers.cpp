@@ -14,16 +14,18 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 // A process of another PID namespace looks gone while it is still at work, though not for this
 // long.
-const time_t quietSeconds = 60;
+const time_t kQuietSeconds = 60;
 
 // The process id in the name of a temporary file, or 0.
 pid_t ProcessOf(const char *name) {
-    const size_t prefix = strlen(temporaryPrefix);
-    if (strncmp(name, temporaryPrefix, prefix) != 0) {
+    const size_t prefix = strlen(kTemporaryPrefix);
+    if (strncmp(name, kTemporaryPrefix, prefix) != 0) {
         return 0;
     }
     char *end = nullptr;
@@ -33,7 +35,7 @@ pid_t ProcessOf(const char *name) {
         return 0;
     }
     const char *suffix = number + strspn(number, "0123456789");
-    return suffix != number && strcmp(suffix, temporarySuffix) == 0 ? static_cast<pid_t>(pid) : 0;
+    return suffix != number && strcmp(suffix, kTemporarySuffix) == 0 ? static_cast<pid_t>(pid) : 0;
 }
 
 bool IsLeftover(int folder, const char *name) {
@@ -43,7 +45,7 @@ bool IsLeftover(int folder, const char *name) {
     }
     struct stat status {};
     return fstatat(folder, name, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode) &&
-           status.st_mtime + quietSeconds < time(nullptr);
+           status.st_mtime + kQuietSeconds < time(nullptr);
 }
 
 } // namespace
@@ -63,3 +65,5 @@ void FileRemoveLeftovers(const char *path) {
         }
     }
 }
+
+} // namespace vesk

@@ -2,16 +2,17 @@
 // folder, so that years of crashes do not fill it.
 //
 // Thread rule: no state.
-#ifndef FILES_FILE_LEFTOVERS_H
-#define FILES_FILE_LEFTOVERS_H
+#pragma once
+
+namespace vesk {
 
 // The names of the temporary files through which a file is replaced:
 // ".veskcachepinfile." + process id + "." + a number + ".tmp".
-const char temporaryPrefix[] = ".veskcachepinfile.";
-const char temporarySuffix[] = ".tmp";
+const char kTemporaryPrefix[] = ".veskcachepinfile.";
+const char kTemporarySuffix[] = ".tmp";
 
 // Removes the temporary files beside `path` whose process is gone and that nobody has written to
 // for a minute; what cannot be removed stays. Never logs.
 void FileRemoveLeftovers(const char *path);
 
-#endif
+} // namespace vesk

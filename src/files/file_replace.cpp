@@ -12,6 +12,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 enum class Attempt { Done, NotCreated, NotWritten, NotAllowed };
@@ -50,8 +52,8 @@ int CreateTemporary(int folder, mode_t mode, std::string *name) {
     static std::atomic<unsigned> counter{0};
     const int tries = 100;
     for (int i = 0; i < tries; ++i) {
-        *name = temporaryPrefix + std::to_string(getpid()) + "." +
-                std::to_string(counter.fetch_add(1)) + temporarySuffix;
+        *name = kTemporaryPrefix + std::to_string(getpid()) + "." +
+                std::to_string(counter.fetch_add(1)) + kTemporarySuffix;
         const int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
         const int fd = openat(folder, name->c_str(), flags, mode);
         if (fd >= 0 || errno != EEXIST) {
@@ -163,3 +165,5 @@ FileReplaceResult FileReplaceContent(const char *path, const std::string &conten
     }
     return WriteInPlace(path, content);
 }
+
+} // namespace vesk

@@ -7,10 +7,11 @@
 //
 // Thread rule: no state but a counter of names; two callers that replace the same file at once each
 // leave a whole file, the later rename wins.
-#ifndef FILES_FILE_REPLACE_H
-#define FILES_FILE_REPLACE_H
+#pragma once
 
 #include <string>
+
+namespace vesk {
 
 enum class FileReplaceResult {
     Done,
@@ -21,4 +22,4 @@ enum class FileReplaceResult {
 // Never blocks on a FIFO: a path that cannot be opened for writing at once is CannotOpen.
 FileReplaceResult FileReplaceContent(const char *path, const std::string &content);
 
-#endif
+} // namespace vesk

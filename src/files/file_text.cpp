@@ -8,6 +8,8 @@
 #include <cstring>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 using Stream = std::unique_ptr<FILE, Deleter<fclose>>;
@@ -50,3 +52,5 @@ int FileReadString(const char *path, std::string *text) {
     LogVerbose("Get text = %s", text->c_str());
     return 0;
 }
+
+} // namespace vesk

@@ -1,8 +1,9 @@
 // Small text files: the message-queue key and the like. Thread rule: no state.
-#ifndef FILES_FILE_TEXT_H
-#define FILES_FILE_TEXT_H
+#pragma once
 
 #include <string>
+
+namespace vesk {
 
 // What becomes of the content of a file that is there already.
 enum class OldContent { Emptied, Kept };
@@ -15,4 +16,4 @@ int FileWriteString(const char *path, const char *text, OldContent old = OldCont
 // when the file cannot be opened or is empty.
 int FileReadString(const char *path, std::string *text);
 
-#endif
+} // namespace vesk

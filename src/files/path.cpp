@@ -5,10 +5,12 @@
 #include <cerrno>
 #include <sys/stat.h>
 
+namespace vesk {
+
 namespace {
 
-const mode_t fileBit = 0x8000;
-const mode_t directoryBit = 0x4000;
+const mode_t kFileBit = 0x8000;
+const mode_t kDirectoryBit = 0x4000;
 
 int HasModeBit(const char *path, mode_t bit, const LogPlace &place) {
     struct stat status {};
@@ -55,9 +57,11 @@ int PathIsMissing(const char *path) {
 }
 
 int PathIsFile(const char *path) {
-    return HasModeBit(path, fileBit, LogHere());
+    return HasModeBit(path, kFileBit, LogHere());
 }
 
 int PathIsDir(const char *path) {
-    return HasModeBit(path, directoryBit, LogHere());
+    return HasModeBit(path, kDirectoryBit, LogHere());
 }
+
+} // namespace vesk

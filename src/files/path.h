@@ -1,10 +1,11 @@
 // Questions about paths, answered by a stat that follows symbolic links.
 //
 // Thread rule: no state; callable from any thread.
-#ifndef FILES_PATH_H
-#define FILES_PATH_H
+#pragma once
 
 #include <cstdint>
+
+namespace vesk {
 
 // The file's size in `*sizeBytes` (bytes). 0, or -1 after an error message.
 int FileGetSizeByte(const char *path, uint64_t *sizeBytes);
@@ -25,4 +26,4 @@ int PathIsMissing(const char *path);
 int PathIsFile(const char *path);
 int PathIsDir(const char *path);
 
-#endif
+} // namespace vesk

@@ -12,9 +12,11 @@
 #include <cstdlib>
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
-const char entryFormat[] = "%s%s#%lu"; // separator, relative path, inode number
+const char kEntryFormat[] = "%s%s#%lu"; // separator, relative path, inode number
 
 // Fills the record from one entry; false when it is none. The entry is taken apart by hand: its
 // text comes from users.
@@ -57,10 +59,11 @@ int AbsolutePathsToFileInodeList(const char *mountPath, const char *absolutePath
             LogError("Cant' get inode number of file (%s)", path.c_str());
             return -1;
         }
-        LogVerbose("szFormat=%s pszRelativePath=%s szFileInodeList=%p size=%zu len=%d", entryFormat,
-                   relativePath.get(), static_cast<void *>(out), outSize, static_cast<int>(length));
+        LogVerbose("szFormat=%s pszRelativePath=%s szFileInodeList=%p size=%zu len=%d",
+                   kEntryFormat, relativePath.get(), static_cast<void *>(out), outSize,
+                   static_cast<int>(length));
         const int written =
-            snprintf(out + length, outSize - length, entryFormat, length == 0 ? "" : ";",
+            snprintf(out + length, outSize - length, kEntryFormat, length == 0 ? "" : ";",
                      relativePath.get(), static_cast<unsigned long>(inode));
         if (written < 0 || static_cast<size_t>(written) >= outSize - length) {
             LogError("File inode list doesn't fit in %zu bytes", outSize);
@@ -97,3 +100,5 @@ int RequestDataGetFileInfos(const char *data, std::vector<FileInfo> *infos) {
     }
     return 0;
 }
+
+} // namespace vesk

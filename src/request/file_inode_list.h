@@ -6,12 +6,13 @@
 // entry reads back wrong and the request fails when it is carried out.
 //
 // Thread rule: no state.
-#ifndef REQUEST_FILE_INODE_LIST_H
-#define REQUEST_FILE_INODE_LIST_H
+#pragma once
 
 #include <cstddef>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 struct FileInfo {
     char szRelativePath[512]; // NUL-terminated, relative to the volume's mount path
@@ -33,4 +34,4 @@ void SplitString(const char *text, const char *delimiters, std::vector<std::stri
 // message at the first entry that is none; those before it stay appended.
 int RequestDataGetFileInfos(const char *data, std::vector<FileInfo> *infos);
 
-#endif
+} // namespace vesk

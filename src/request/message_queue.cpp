@@ -13,12 +13,14 @@
 #include <sys/msg.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const int keyProject = 'x';
-const int keyReadTries = 3;
-const int sendTries = 3;
-const int ackTries = 3;
+const int kKeyProject = 'x';
+const int kKeyReadTries = 3;
+const int kSendTries = 3;
+const int kAckTries = 3;
 static_assert((IPC_CREAT | IPC_EXCL | 0644) == 0x7A4, "creation flags");
 
 } // namespace
@@ -42,7 +44,7 @@ int MsgCreateExclusive(const char *keyFile) {
         LogError("Create file (%s) failed", keyFile);
         return -1;
     }
-    const key_t key = ftok(keyFile, keyProject);
+    const key_t key = ftok(keyFile, kKeyProject);
     if (key == -1) {
         LogError("Can't get message queue key by file (%s)", keyFile);
         return -1;
@@ -61,13 +63,13 @@ int MsgCreateExclusive(const char *keyFile) {
         LogError("Can't get message queue data structure");
         return -1;
     }
-    limits.msg_qbytes = messageQueueBytes;
+    limits.msg_qbytes = kMessageQueueBytes;
     if (msgctl(queueId, IPC_SET, &limits) < 0) {
         LogError("Can't set message queue size");
         return -1;
     }
     LogVerbose("Set size = %ld (num of request = %d, request size = %zu)",
-               static_cast<long>(messageQueueBytes), messageQueueRequests, requestMessageBytes);
+               static_cast<long>(kMessageQueueBytes), kMessageQueueRequests, kRequestMessageBytes);
     if (FileWriteString(keyFile, keyText) < 0) {
         // This process can use the queue all the same; others cannot find it.
         LogError("Can't write to file (%s)", keyFile);
@@ -85,7 +87,7 @@ int MsgQueueGet(const char *keyFile) {
     LogVerbose("Message queue exist, try to get key");
     int key = 0;
     int result = -1;
-    for (int tries = 0; tries < keyReadTries && result < 0; ++tries) {
+    for (int tries = 0; tries < kKeyReadTries && result < 0; ++tries) {
         result = GetMsgKey(&key, keyFile);
     }
     if (result < 0) {
@@ -103,7 +105,7 @@ int MsgQueueGet(const char *keyFile) {
 
 int MsgQueueSend(int queueId, const RequestMessage *message, size_t size) {
     int sendErrno = 0;
-    for (int tries = 0; tries < sendTries; ++tries) {
+    for (int tries = 0; tries < kSendTries; ++tries) {
         LogVerbose("Send to message queue (id = %d) msg type = %ld", queueId, message->messageType);
         if (msgsnd(queueId, message, size, IPC_NOWAIT) == 0) {
             LogVerbose("Send to message queue (id = %d) OK", queueId);
@@ -112,7 +114,7 @@ int MsgQueueSend(int queueId, const RequestMessage *message, size_t size) {
         sendErrno = errno;
         sleep(1);
     }
-    LogError("Send message timeout (%d seconds)", sendTries);
+    LogError("Send message timeout (%d seconds)", kSendTries);
     errno = sendErrno;
     return -1;
 }
@@ -123,20 +125,22 @@ int WaitForAck(int queueId, long messageType) {
     int seconds = 0;
     ssize_t received = -1;
     while (received < 0) {
-        if (seconds >= ackTries) {
+        if (seconds >= kAckTries) {
             LogError("Can't get ack messages (Wait for %d sceounds)", seconds);
             return -1;
         }
         sleep(1);
         ++seconds;
         LogVerbose("Wait for ack. Secound = %d", seconds);
-        received = msgrcv(queueId, &message, requestMessageBytes, messageType, IPC_NOWAIT);
+        received = msgrcv(queueId, &message, kRequestMessageBytes, messageType, IPC_NOWAIT);
     }
     LogVerbose("Get message");
-    if (message.record.type != requestAck) {
+    if (message.record.type != kRequestAck) {
         LogError("Get wrong request");
         return -1;
     }
     LogVerbose("Get ACK from servier");
     return 0;
 }
+
+} // namespace vesk

@@ -6,10 +6,11 @@
 //
 // Thread rule: no state; any number of processes may create and send at once. A process that reads
 // the file between its creation and the writing of the key fails.
-#ifndef REQUEST_MESSAGE_QUEUE_H
-#define REQUEST_MESSAGE_QUEUE_H
+#pragma once
 
 #include "request/message.h"
+
+namespace vesk {
 
 // The queue's key from the first line of the file. 0, or -1 after an error message when the file
 // cannot be read. A line that does not begin with a number throws std::invalid_argument or
@@ -32,4 +33,4 @@ int MsgQueueSend(int queueId, const RequestMessage *message, size_t size);
 // message. The service sends none, and no command waits.
 int WaitForAck(int queueId, long messageType);
 
-#endif
+} // namespace vesk

@@ -2,23 +2,25 @@
 
 #include "base/log.h"
 
+namespace vesk {
+
 namespace {
 
 // In value order. "removePendigSpace" stands so in every configuration file there is.
-const char *const requestTypeNames[] = {
+const char *const kRequestTypeNames[] = {
     "unknown",         "pinFiles",          "unpinFiles",      "ack",
     "addPendingSpace", "removePendigSpace", "reloadPinBlocks",
 };
-const int requestTypeCount = sizeof(requestTypeNames) / sizeof(requestTypeNames[0]);
+const int kRequestTypeCount = sizeof(kRequestTypeNames) / sizeof(kRequestTypeNames[0]);
 
 } // namespace
 
 const char *RequestTypeToString(int type) {
-    if (type < 0 || type >= requestTypeCount) {
+    if (type < 0 || type >= kRequestTypeCount) {
         LogError("Convert request type to string errror");
         return nullptr;
     }
-    return requestTypeNames[type];
+    return kRequestTypeNames[type];
 }
 
 const char *RequestTypeForLog(int type) {
@@ -27,10 +29,12 @@ const char *RequestTypeForLog(int type) {
 }
 
 int StringToRequestType(const std::string &name) {
-    for (int type = 0; type < requestTypeCount; ++type) {
-        if (name == requestTypeNames[type]) {
+    for (int type = 0; type < kRequestTypeCount; ++type) {
+        if (name == kRequestTypeNames[type]) {
             return type;
         }
     }
-    return requestUnknown;
+    return kRequestUnknown;
 }
+
+} // namespace vesk

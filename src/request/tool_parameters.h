@@ -2,40 +2,41 @@
 //
 // All texts point into the argument vector and are neither copied nor freed. Thread rule: written
 // before any thread starts, only read afterwards.
-#ifndef REQUEST_TOOL_PARAMETERS_H
-#define REQUEST_TOOL_PARAMETERS_H
+#pragma once
 
 #include <cstdint>
 
+namespace vesk {
+
 enum ToolCommand : int {
-    commandInvalid = 0,
-    commandPinFiles = 1,
-    commandUnpinFiles = 2,
-    commandSendBitmap = 3,
-    commandStartService = 4,
-    commandHandleMount = 5,
-    commandHandleUmount = 6,
-    commandSupportPin = 7,
-    commandCheckBitmap = 8,
-    commandAddPendingSpace = 9,
-    commandRemovePendingSpace = 10,
-    commandGetUUID = 11,
-    commandDeleteBitmap = 12,
-    commandCheckPin = 13,
-    commandReloadPinBlocks = 14,
-    commandUnpinAllBlocks = 15,
-    commandIsAllUnpin = 16,
-    commandSetBitmap = 17,
-    commandUnsetBitmap = 18,
-    commandUnpinRange = 19,
-    commandGetBitmapSizeByte = 20,
+    kCommandInvalid = 0,
+    kCommandPinFiles = 1,
+    kCommandUnpinFiles = 2,
+    kCommandSendBitmap = 3,
+    kCommandStartService = 4,
+    kCommandHandleMount = 5,
+    kCommandHandleUmount = 6,
+    kCommandSupportPin = 7,
+    kCommandCheckBitmap = 8,
+    kCommandAddPendingSpace = 9,
+    kCommandRemovePendingSpace = 10,
+    kCommandGetUUID = 11,
+    kCommandDeleteBitmap = 12,
+    kCommandCheckPin = 13,
+    kCommandReloadPinBlocks = 14,
+    kCommandUnpinAllBlocks = 15,
+    kCommandIsAllUnpin = 16,
+    kCommandSetBitmap = 17,
+    kCommandUnsetBitmap = 18,
+    kCommandUnpinRange = 19,
+    kCommandGetBitmapSizeByte = 20,
 };
 
-const uint64_t sectorNotSet = UINT64_MAX;
+const uint64_t kSectorNotSet = UINT64_MAX;
 
 struct ToolParameters {
-    uint64_t startSector = sectorNotSet;    // 512-byte sectors; all ones: not given
-    uint64_t numSectors = sectorNotSet;     // 512-byte sectors; all ones: not given
+    uint64_t startSector = kSectorNotSet;   // 512-byte sectors; all ones: not given
+    uint64_t numSectors = kSectorNotSet;    // 512-byte sectors; all ones: not given
     const char *checkPinFilePath = nullptr; // the file of --check-pin
     const char *files = nullptr;            // absolute paths joined by ";"
     const char *cachePath = nullptr;        // cache device
@@ -44,7 +45,7 @@ struct ToolParameters {
     const char *mountPath = nullptr; // without a trailing "/"
     int debug = 0;
     int verbose = 0;
-    ToolCommand command = commandInvalid; // the last one on the command line
+    ToolCommand command = kCommandInvalid; // the last one on the command line
 };
 
-#endif
+} // namespace vesk

@@ -12,6 +12,8 @@
 #include <cstring>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 // Copies text into a field, cut so that a NUL ends it.
@@ -100,7 +102,7 @@ NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, Reques
             continue;
         }
         out->type = StringToRequestType(request["type"].asString());
-        if (out->type == requestUnknown) {
+        if (out->type == kRequestUnknown) {
             LogError("Can't get correct request type");
             return NextRequest::Error;
         }
@@ -117,3 +119,5 @@ NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, Reques
     }
     return found ? NextRequest::Taken : NextRequest::None;
 }
+
+} // namespace vesk

@@ -5,13 +5,14 @@
 // pinned-file records.
 //
 // Locks: holds the service lock throughout, except while it waits.
-#ifndef SERVICE_NEXT_REQUEST_H
-#define SERVICE_NEXT_REQUEST_H
+#pragma once
 
 #include "request/request_record.h"
 #include "state/service_state.h"
 
 #include <string>
+
+namespace vesk {
 
 enum class NextRequest : int {
     None = 0,  // requests are queued, none may run now
@@ -24,4 +25,4 @@ enum class NextRequest : int {
 NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
                                                   std::string *num) NEEDS_NO_LOCK(serviceLock);
 
-#endif
+} // namespace vesk

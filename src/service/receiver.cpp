@@ -16,6 +16,8 @@
 #include <sys/msg.h>
 #include <unistd.h>
 
+namespace vesk {
+
 int ServerMsgQueueId = -1;
 
 namespace {
@@ -46,7 +48,7 @@ bool ReceiveMessage(RequestMessage *message, const LogPlace &place) {
     ssize_t received = -1;
     do {
         ReceiverTakesNext();
-        received = msgrcv(ServerMsgQueueId, message, requestMessageBytes, requestMessageType, 0);
+        received = msgrcv(ServerMsgQueueId, message, kRequestMessageBytes, kRequestMessageType, 0);
     } while (received < 0 && errno == EINTR && ReceiverIsCalledToRest());
     if (received < 0) {
         LogWrite(LogClass::Error, place, "Receive messaged failed: %s", strerror(errno));
@@ -96,8 +98,8 @@ bool StoreRequest(const char *configPath, const RequestMessage *message, const L
 // Does what the message asks for. False after an error message.
 bool DoMessage(const char *configPath, RequestMessage *message, const LogPlace &place) {
     switch (message->record.type) {
-    case requestAddPendingSpace: return AddPendingSpace(message->record.mountPath, place);
-    case requestRemovePendigSpace: return RemovePendingSpace(message->record.mountPath, place);
+    case kRequestAddPendingSpace: return AddPendingSpace(message->record.mountPath, place);
+    case kRequestRemovePendigSpace: return RemovePendingSpace(message->record.mountPath, place);
     default: return StoreRequest(configPath, message, place);
     }
 }
@@ -107,9 +109,9 @@ bool DoMessage(const char *configPath, RequestMessage *message, const LogPlace &
 void GetRequests(const char *configPath) {
     {
         LogTraceScope();
-        ServerMsgQueueId = MsgQueueGet(messageKeyFile);
+        ServerMsgQueueId = MsgQueueGet(kMessageKeyFile);
         if (ServerMsgQueueId == -1) {
-            LogError("Create server messsage queue by file (%s) failed", messageKeyFile);
+            LogError("Create server messsage queue by file (%s) failed", kMessageKeyFile);
         } else {
             LogVerbose("Get server messsage queue id = %d", ServerMsgQueueId);
             RequestMessage message{}; // overwritten by each message
@@ -122,3 +124,5 @@ void GetRequests(const char *configPath) {
     ServiceThreadEnds();
     pthread_exit(nullptr);
 }
+
+} // namespace vesk

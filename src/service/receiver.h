@@ -6,12 +6,13 @@
 //
 // Thread rule: runs on the process's first thread; takes the service lock only inside the
 // configuration and pending-space operations.
-#ifndef SERVICE_RECEIVER_H
-#define SERVICE_RECEIVER_H
+#pragma once
+
+namespace vesk {
 
 extern int ServerMsgQueueId; // -1 until the receiver has opened the queue; used by its thread only
 
 // Does not return: ends the calling thread.
 [[noreturn]] void GetRequests(const char *configPath);
 
-#endif
+} // namespace vesk

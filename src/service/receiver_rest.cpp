@@ -5,10 +5,12 @@
 #include <pthread.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const int restTries = 350;
-const useconds_t tryMicroseconds = 1000;
+const int kRestTries = 350;
+const useconds_t kTryMicroseconds = 1000;
 
 // The receiver clears `atRest` and then looks at `called`; the ending thread sets `called` and then
 // looks at `atRest`: one of them sees the other.
@@ -48,8 +50,10 @@ void ReceiverAwaitRest() {
         return;
     }
     // Again and again: the signal may come just before the receiver begins to wait.
-    for (int tries = 0; tries < restTries && !atRest; ++tries) {
+    for (int tries = 0; tries < kRestTries && !atRest; ++tries) {
         pthread_kill(receiver, SIGUSR1);
-        usleep(tryMicroseconds);
+        usleep(kTryMicroseconds);
     }
 }
+
+} // namespace vesk

@@ -3,8 +3,9 @@
 //
 // Thread rule: the receiver's thread calls the first three, the thread that ends the process the
 // last.
-#ifndef SERVICE_RECEIVER_REST_H
-#define SERVICE_RECEIVER_REST_H
+#pragma once
+
+namespace vesk {
 
 // Before each message: from here on the receiver may have one in hand. Once it is called to rest
 // this does not return.
@@ -21,4 +22,4 @@ void ReceiverHasEnded();
 // reader of its output) may do so for good.
 void ReceiverAwaitRest();
 
-#endif
+} // namespace vesk

@@ -10,10 +10,13 @@
 
 #include <string>
 
+namespace vesk {
+
 namespace {
 
 bool IsHandledType(int type) {
-    return type == requestPinFiles || type == requestUnpinFiles || type == requestReloadPinBlocks;
+    return type == kRequestPinFiles || type == kRequestUnpinFiles ||
+           type == kRequestReloadPinBlocks;
 }
 
 std::string FullPath(const char *mountPath, const FileInfo &file) {
@@ -31,12 +34,12 @@ WorkResult HandleRequest(const RequestRecord *record) {
         LogError("Get unhandle request (%s)", RequestTypeForLog(record->type));
     } else if (VolumeBitmapOpen(record->mountPath, &volume, LogHere()) < 0) {
         // It has said what is missing.
-    } else if (record->type == requestReloadPinBlocks) {
+    } else if (record->type == kRequestReloadPinBlocks) {
         result =
             ReloadPinBlocksToCache(volume.bitmap.get(), volume.cachePath.get(), record->mountPath);
     } else if (RequestDataGetFileInfos(record->data, &files) < 0) {
         LogError("Can't parse file inodes from request's data (%s)", record->data);
-    } else if (record->type == requestPinFiles) {
+    } else if (record->type == kRequestPinFiles) {
         result = HandlePinRequest(files, volume.bitmap.get(), record->mountPath,
                                   volume.cachePath.get(), volume.bitmapPath.get());
     } else {
@@ -100,3 +103,5 @@ WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bit
     }
     return WorkResult::Done;
 }
+
+} // namespace vesk

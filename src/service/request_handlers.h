@@ -6,8 +6,7 @@
 // changed what came before.
 //
 // Thread rule: called on the worker's thread, one request at a time, without the service lock.
-#ifndef SERVICE_REQUEST_HANDLERS_H
-#define SERVICE_REQUEST_HANDLERS_H
+#pragma once
 
 #include "bitmap/pin_bitmap.h"
 #include "request/file_inode_list.h"
@@ -15,6 +14,8 @@
 #include "warming/work_result.h"
 
 #include <vector>
+
+namespace vesk {
 
 // The record's texts are NUL-terminated.
 WorkResult HandleRequest(const RequestRecord *record);
@@ -27,4 +28,4 @@ WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitma
 WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
                               const char *mountPath, const char *cachePath, const char *bitmapPath);
 
-#endif
+} // namespace vesk

@@ -13,6 +13,8 @@
 #include <pthread.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 // Chooses one request and has it carried out. False when none can be chosen.
@@ -32,7 +34,7 @@ bool DoNextRequest(const char *configPath, const LogPlace &place) {
         if (result == WorkResult::Interrupted) {
             LogWrite(LogClass::Notice, place, "Handle request (%s). Get interrupted !",
                      num.c_str());
-        } else if (record.type == requestPinFiles || record.type == requestUnpinFiles) {
+        } else if (record.type == kRequestPinFiles || record.type == kRequestUnpinFiles) {
             LogWrite(LogClass::Notice, place, "Handle request (type=%s files=%s) OK ", typeName,
                      record.data);
         } else {
@@ -89,3 +91,5 @@ WorkResult HandleRequestAndModifyConfig(const char *configPath, RequestRecord *r
     }
     return result;
 }
+
+} // namespace vesk

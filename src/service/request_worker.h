@@ -3,13 +3,14 @@
 //
 // Thread rule: runs on a thread of its own; takes the service lock only inside the configuration
 // operations, never while a request is carried out.
-#ifndef SERVICE_REQUEST_WORKER_H
-#define SERVICE_REQUEST_WORKER_H
+#pragma once
 
 #include "request/request_record.h"
 #include "warming/work_result.h"
 
 #include <string>
+
+namespace vesk {
 
 // The thread's start routine; `options` is the ToolParameters record, of which the configuration
 // path is used. Ends the thread when the next request cannot be chosen.
@@ -20,4 +21,4 @@ void *DoRequests(void *options);
 WorkResult HandleRequestAndModifyConfig(const char *configPath, RequestRecord *record,
                                         const std::string &num);
 
-#endif
+} // namespace vesk

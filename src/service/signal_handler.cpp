@@ -11,17 +11,19 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const int endingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
-const suseconds_t endGraceMicroseconds = 500000;
+const int kEndingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
+const suseconds_t kEndGraceMicroseconds = 500000;
 
 std::atomic<int> serviceThreads{0};
 
 sigset_t EndingSignalSet() {
     sigset_t set;
     sigemptyset(&set);
-    for (const int signalNumber : endingSignals) {
+    for (const int signalNumber : kEndingSignals) {
         sigaddset(&set, signalNumber);
     }
     return set;
@@ -39,7 +41,7 @@ void LimitEnd() {
         return;
     }
     itimerval limit{};
-    limit.it_value.tv_usec = endGraceMicroseconds;
+    limit.it_value.tv_usec = kEndGraceMicroseconds;
     sigset_t alarmSet;
     sigemptyset(&alarmSet);
     sigaddset(&alarmSet, SIGALRM);
@@ -80,7 +82,7 @@ int SetSignalHandler() {
     // Blocked before the handlers are there, so that no signal finds a handler but no waiter.
     const sigset_t set = EndingSignalSet();
     pthread_sigmask(SIG_BLOCK, &set, nullptr);
-    for (const int signalNumber : endingSignals) {
+    for (const int signalNumber : kEndingSignals) {
         if (signal(signalNumber, SignalHandler) == SIG_ERR) {
             LogError("Can't set handler");
             pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
@@ -108,3 +110,5 @@ void ServiceThreadEnds() {
         EndProcess();
     }
 }
+
+} // namespace vesk

@@ -5,8 +5,9 @@
 // that the end never starts inside another thread's malloc or printf. No destructor runs, buffered
 // standard output is written, and half a second later the process ends even if the message cannot
 // be stored or that output finds no reader.
-#ifndef SERVICE_SIGNAL_HANDLER_H
-#define SERVICE_SIGNAL_HANDLER_H
+#pragma once
+
+namespace vesk {
 
 // Installs the handler and starts the thread that waits for the signals; to be called before any
 // other thread is started, which inherits the blocked signals. 0, or -1 after an error message;
@@ -22,4 +23,4 @@ int SetSignalHandler();
 void SetServiceThreads(int count);
 void ServiceThreadEnds();
 
-#endif
+} // namespace vesk

@@ -12,6 +12,8 @@
 #include <cstring>
 #include <pthread.h>
 
+namespace vesk {
+
 int StartService(const ToolParameters *parameters) {
     LogTraceEntry();
     if (SetSignalHandler() < 0) {
@@ -33,3 +35,5 @@ int StartService(const ToolParameters *parameters) {
     }
     GetRequests(parameters->configPath);
 }
+
+} // namespace vesk

@@ -1,7 +1,8 @@
 // The pin service: shared state, signal handling, the worker on a thread of its own and the
 // receiver on the calling one.
-#ifndef SERVICE_START_SERVICE_H
-#define SERVICE_START_SERVICE_H
+#pragma once
+
+namespace vesk {
 
 struct ToolParameters;
 
@@ -10,4 +11,4 @@ struct ToolParameters;
 // process.
 int StartService(const ToolParameters *parameters);
 
-#endif
+} // namespace vesk

@@ -8,14 +8,16 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const char controlFile[] = "/tmp/veskcachepinfiletool.debug";
+const char kControlFile[] = "/tmp/veskcachepinfiletool.debug";
 
 // The whole file: a path with a second line behind it must not match. Anything longer than a path
 // can be is cut, which makes it differ from every path all the same.
 bool ReadControlFile(std::string *content) {
-    const ScopedFd file(open(controlFile, O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+    const ScopedFd file(open(kControlFile, O_RDONLY | O_NONBLOCK | O_CLOEXEC));
     struct stat status {};
     if (!file.IsOpen() || fstat(file.Get(), &status) < 0 || !S_ISREG(status.st_mode)) {
         return false;
@@ -40,7 +42,7 @@ bool ReadControlFile(std::string *content) {
 
 int FileSimulateGetMappingFailed(const std::string &filePath) {
     std::string failing;
-    if (!PathExists(controlFile) || !ReadControlFile(&failing)) {
+    if (!PathExists(kControlFile) || !ReadControlFile(&failing)) {
         return 0;
     }
     if (!failing.empty() && failing.back() == '\n') {
@@ -51,3 +53,5 @@ int FileSimulateGetMappingFailed(const std::string &filePath) {
              result);
     return result;
 }
+
+} // namespace vesk

@@ -4,13 +4,14 @@
 // shall fail, with or without one line feed behind it. Without the file nothing fails.
 //
 // Thread rule: no state.
-#ifndef SPACE_FAULT_INJECTION_H
-#define SPACE_FAULT_INJECTION_H
+#pragma once
 
 #include <string>
+
+namespace vesk {
 
 // 1 when the lookup of this file (full path, compared whole) shall fail, else 0. A control file
 // that is not a regular file counts as absent, and opening it never blocks.
 int FileSimulateGetMappingFailed(const std::string &filePath);
 
-#endif
+} // namespace vesk

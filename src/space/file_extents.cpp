@@ -8,10 +8,12 @@
 #include <memory>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const int lookupTries = 10;
-const uint32_t flagUninitialized = 1;
+const int kLookupTries = 10;
+const uint32_t kFlagUninitialized = 1;
 
 std::string DirectoryOf(const std::string &filePath) {
     char path[512 + 1] = {};
@@ -52,7 +54,7 @@ int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,
     const std::string directory = DirectoryOf(filePath);
     bool failed = false;
     bool synced = false;
-    for (int tries = 0; tries < lookupTries; ++tries) {
+    for (int tries = 0; tries < kLookupTries; ++tries) {
         int result = device->GetMappingByInode(directory, inode, *table);
         if (FileSimulateGetMappingFailed(filePath) == 1) {
             LogError("Simulate %s get mapping failed", filePath.c_str());
@@ -74,16 +76,18 @@ int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,
                    result, static_cast<ssize_t>(table->entries.size()));
         sleep(1);
     }
-    if (table->entries.size() == 1 && table->entries[0].flag == flagUninitialized) {
+    if (table->entries.size() == 1 && table->entries[0].flag == kFlagUninitialized) {
         LogNotice("Only get 1 unitilized entry from file (%s)", filePath.c_str());
     }
     if (failed) {
         return -1;
     }
     if (table->entries.empty()) {
-        LogError("Get mapping of file (%s) timeout (%d seconds)", filePath.c_str(), lookupTries);
+        LogError("Get mapping of file (%s) timeout (%d seconds)", filePath.c_str(), kLookupTries);
         return -1;
     }
     LogVerbose("Entry number = %zu", table->entries.size());
     return 0;
 }
+
+} // namespace vesk

@@ -3,13 +3,14 @@
 //
 // Thread rule: no state. A lookup can take about ten seconds: a file whose data has no place on the
 // device yet is waited for.
-#ifndef SPACE_FILE_EXTENTS_H
-#define SPACE_FILE_EXTENTS_H
+#pragma once
 
 #include "vesk/storage_core.h"
 
 #include <cstdint>
 #include <string>
+
+namespace vesk {
 
 // The device object of the file system that holds `path`, owned by the caller (delete it), or null
 // after an error message.
@@ -22,4 +23,4 @@ FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path);
 int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,
                             const std::string &filePath, uint32_t inode);
 
-#endif
+} // namespace vesk

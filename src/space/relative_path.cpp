@@ -7,11 +7,13 @@
 #include <cstdio>
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
-const char whiteSpace[] = " \t\n\v\f\r";
-const size_t relativePathMax = 511;
-const size_t topDirMax = 1023;
+const char kWhiteSpace[] = " \t\n\v\f\r";
+const size_t kRelativePathMax = 511;
+const size_t kTopDirMax = 1023;
 
 // The part of `filePath` behind `mountPath` and "/", or null when it lies elsewhere.
 const char *SkipMountPath(const char *mountPath, const char *filePath) {
@@ -24,9 +26,9 @@ const char *SkipMountPath(const char *mountPath, const char *filePath) {
 
 // The first word of `text`, or null when there is none or it is too long to be recorded whole.
 char *CopyFirstWord(const char *text) {
-    const char *start = text + strspn(text, whiteSpace);
-    const size_t length = strcspn(start, whiteSpace);
-    if (length == 0 || length > relativePathMax) {
+    const char *start = text + strspn(text, kWhiteSpace);
+    const size_t length = strcspn(start, kWhiteSpace);
+    if (length == 0 || length > kRelativePathMax) {
         return nullptr;
     }
     return strndup(start, length);
@@ -60,10 +62,12 @@ int FileGetTopDir(const char *path, char *out, size_t outSize) {
         return -1;
     }
     const size_t length = path[0] == '/' ? strcspn(path + 1, "/") : 0;
-    if (length == 0 || length > topDirMax) {
+    if (length == 0 || length > kTopDirMax) {
         LogError("Get top directory of file (%s) error\n", path);
         return -1;
     }
     snprintf(out, outSize, "/%.*s", static_cast<int>(length), path + 1);
     return 0;
 }
+
+} // namespace vesk

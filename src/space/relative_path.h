@@ -4,10 +4,11 @@
 // User text is compared and copied here, never handed to a scan or print format.
 //
 // Thread rule: no state; callable from any thread.
-#ifndef SPACE_RELATIVE_PATH_H
-#define SPACE_RELATIVE_PATH_H
+#pragma once
 
 #include <cstddef>
+
+namespace vesk {
 
 // What stands in `filePath` behind `mountPath` and "/": leading white space is skipped, then the
 // text up to the next white space is taken; so "/volume1/dir a/f" gives "dir". A mount path that
@@ -24,4 +25,4 @@ char *FileGetRelativePath(const char *uuid, const char *filePath);
 // 1023 characters, or an argument is null or 0.
 int FileGetTopDir(const char *path, char *out, size_t outSize);
 
-#endif
+} // namespace vesk

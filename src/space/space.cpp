@@ -5,6 +5,8 @@
 #include <cstring>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 struct SpaceListDeleter {
@@ -94,3 +96,5 @@ bool SpaceTake(char *text, MallocText *owner, const char *failure, const LogPlac
     }
     return text != nullptr;
 }
+
+} // namespace vesk

@@ -6,11 +6,12 @@
 // cause is told why.
 //
 // Thread rule: no state; callable from any thread.
-#ifndef SPACE_SPACE_H
-#define SPACE_SPACE_H
+#pragma once
 
 #include "base/log.h"
 #include "base/malloc_text.h"
+
+namespace vesk {
 
 // Why a look-up here or in space/space_cache.h has come to its answer.
 enum class SpaceCause {
@@ -43,4 +44,4 @@ inline void SpaceTell(SpaceCause *asked, SpaceCause cause) {
 // an error at the caller's place.
 bool SpaceTake(char *text, MallocText *owner, const char *failure, const LogPlace &place);
 
-#endif
+} // namespace vesk

@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <cstring>
 
+namespace vesk {
+
 char *SpaceGetBitmapPath(const char *uuid) {
     MallocText referencePath;
     MallocText bitmapPath;
@@ -22,3 +24,5 @@ char *BitmapGetPathByReferencePath(const char *referencePath) {
         snprintf(path, sizeof(path), "%s/%s", referencePath, "veskcachepinfile.bitmap");
     return length < 0 ? nullptr : strdup(path);
 }
+
+} // namespace vesk

@@ -5,10 +5,12 @@
 #include <cstring>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
-const int configBySpaceUuid = 2;
-const int statBySsdPath = 3;
+const int kConfigBySpaceUuid = 2;
+const int kStatBySsdPath = 3;
 
 struct ConfigDeleter {
     void operator()(VESKFlashCacheConfig *config) const { VESKFlashCacheConfigFree(config); }
@@ -24,7 +26,7 @@ using CacheStat = std::unique_ptr<VESKFlashCacheStat, StatDeleter>;
 
 VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid, SpaceCause *cause) {
     VESKFlashCacheConfigQuery query{};
-    query.kind = configBySpaceUuid;
+    query.kind = kConfigBySpaceUuid;
     query.spaceUuid = uuid;
     VESKFlashCacheConfig *config = nullptr;
     const int result = VESKFlashCacheConfigTmpGet(&query, &config);
@@ -111,7 +113,7 @@ int SpaceHasCacheAndSupportPinByUUID(const char *uuid, SpaceCause *cause) {
         return 0;
     }
     VESKFlashCacheStatQuery query{};
-    query.kind = statBySsdPath;
+    query.kind = kStatBySsdPath;
     query.ssdPath = ssdPath.get();
     VESKFlashCacheStat *answer = nullptr;
     const int result = VESKFlashCacheStatGet(&query, &answer);
@@ -131,3 +133,5 @@ int SpaceHasCacheAndSupportPinByUUID(const char *uuid, SpaceCause *cause) {
     }
     return canPin ? 1 : 0;
 }
+
+} // namespace vesk

@@ -5,12 +5,13 @@
 // for a cause (space/space.h) is told why.
 //
 // Thread rule: no state; callable from any thread.
-#ifndef SPACE_SPACE_CACHE_H
-#define SPACE_SPACE_CACHE_H
+#pragma once
 
 #include "space/space.h"
 
 struct VESKFlashCacheConfig;
+
+namespace vesk {
 
 // The space's cache configuration (release it with VESKFlashCacheConfigFree), or null.
 VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid, SpaceCause *cause = nullptr);
@@ -30,4 +31,4 @@ char *SpaceGetCachePathByMountPath(const char *mountPath, SpaceCause *cause = nu
 int SpaceHasCacheAndSupportPin(const char *mountPath, SpaceCause *cause = nullptr);
 int SpaceHasCacheAndSupportPinByUUID(const char *uuid, SpaceCause *cause = nullptr);
 
-#endif
+} // namespace vesk

@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+namespace vesk {
+
 ServiceLockName serviceLock;
 
 namespace {
@@ -137,3 +139,5 @@ int ServiceRemovePendingSpaceAtomic(char *mountPath) {
     LogVerbose("Remove pending space (%s)", mountPath);
     return 0;
 }
+
+} // namespace vesk

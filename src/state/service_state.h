@@ -9,10 +9,11 @@
 // change of the pending-space list and the state word. It is not recursive and never held while a
 // request is carried out. Reading the list takes no service lock: readers see a snapshot that never
 // changes under them.
-#ifndef STATE_SERVICE_STATE_H
-#define STATE_SERVICE_STATE_H
+#pragma once
 
 #include "state/thread_annotations.h"
+
+namespace vesk {
 
 // The service lock's name for the annotations below; the lock itself is nobody else's business.
 struct LOCK_KIND("service lock") ServiceLockName {};
@@ -62,4 +63,4 @@ public:
     ServiceLockGuard &operator=(const ServiceLockGuard &) = delete;
 };
 
-#endif
+} // namespace vesk

@@ -1,8 +1,7 @@
 // What clang's thread-safety analysis needs to know: which lock a function takes, gives back or
 // wants held, and which lock guards a field. A violation is a compile error there; other compilers
 // see nothing of it.
-#ifndef STATE_THREAD_ANNOTATIONS_H
-#define STATE_THREAD_ANNOTATIONS_H
+#pragma once
 
 #ifdef __clang__
 #define THREAD_ANNOTATION(attribute) __attribute__((attribute))
@@ -18,5 +17,3 @@
 #define NEEDS_NO_LOCK(lock) THREAD_ANNOTATION(locks_excluded(lock))
 #define GUARDED_BY_LOCK(lock) THREAD_ANNOTATION(guarded_by(lock))
 #define NOT_ANALYSED THREAD_ANNOTATION(no_thread_safety_analysis)
-
-#endif

@@ -8,8 +8,10 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+namespace vesk {
+
 WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector) {
-    const uint64_t bytesToRead = (lastSector + 1) << sectorByteShift;
+    const uint64_t bytesToRead = (lastSector + 1) << kSectorByteShift;
     LogVerbose("Read file (%s) to cache. last read sector = %llu bytes to read = %llu", filePath,
                LogU64(lastSector), LogU64(bytesToRead));
     const WarmBuffer buffer = WarmBufferAllocate();
@@ -25,7 +27,7 @@ WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t
     }
     uint64_t total = 0;
     for (;;) {
-        const ssize_t result = read(file.Get(), buffer.get(), warmBufferBytes);
+        const ssize_t result = read(file.Get(), buffer.get(), kWarmBufferBytes);
         if (result < 0) {
             LogError("Read error");
             return WorkResult::Failed;
@@ -47,3 +49,5 @@ WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t
                LogU64(total));
     return WorkResult::Done;
 }
+
+} // namespace vesk

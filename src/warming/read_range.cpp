@@ -7,8 +7,10 @@
 #include <cstdlib>
 #include <unistd.h>
 
+namespace vesk {
+
 WarmBuffer WarmBufferAllocate() {
-    return WarmBuffer(static_cast<char *>(aligned_alloc(warmBufferAlignment, warmBufferBytes)));
+    return WarmBuffer(static_cast<char *>(aligned_alloc(kWarmBufferAlignment, kWarmBufferBytes)));
 }
 
 int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t bufferSize) {
@@ -34,9 +36,11 @@ int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t b
 }
 
 int ReadFdToNullByRange(int fd, const BitRun &range, char *buffer, size_t bufferSize) {
-    const uint64_t bytes = range.count << bitmapByteShift;
+    const uint64_t bytes = range.count << kBitmapByteShift;
     LogVerbose("Range's bitStart=%llu numBits=%llu (size = %llu bytes)", LogU64(range.first),
                LogU64(range.count), LogU64(bytes));
-    return ReadFdToNull(fd, range.first << bitmapByteShift, static_cast<uint32_t>(bytes), buffer,
+    return ReadFdToNull(fd, range.first << kBitmapByteShift, static_cast<uint32_t>(bytes), buffer,
                         bufferSize);
 }
+
+} // namespace vesk

@@ -4,8 +4,7 @@
 // operation.
 //
 // Thread rule: no state; a buffer belongs to one call at a time.
-#ifndef WARMING_READ_RANGE_H
-#define WARMING_READ_RANGE_H
+#pragma once
 
 #include "base/malloc_text.h"
 #include "bitmap/bit_runs.h"
@@ -14,13 +13,15 @@
 #include <cstdint>
 #include <memory>
 
-const size_t warmBufferBytes = 65536;
-const size_t warmBufferAlignment = 4096;
-const unsigned sectorByteShift = 9; // sectors to bytes
+namespace vesk {
+
+const size_t kWarmBufferBytes = 65536;
+const size_t kWarmBufferAlignment = 4096;
+const unsigned kSectorByteShift = 9; // sectors to bytes
 
 using WarmBuffer = std::unique_ptr<char, FreeDeleter>;
 
-// An aligned buffer of warmBufferBytes, or null when memory runs out.
+// An aligned buffer of kWarmBufferBytes, or null when memory runs out.
 WarmBuffer WarmBufferAllocate();
 
 // Reads the low 32 bits of `count` (bytes) from `offset` (bytes), `bufferSize` bytes at a time. 0,
@@ -30,4 +31,4 @@ int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t b
 // The same for blocks of 64 KiB, counted from the start of the device.
 int ReadFdToNullByRange(int fd, const BitRun &range, char *buffer, size_t bufferSize);
 
-#endif
+} // namespace vesk

@@ -8,6 +8,8 @@
 
 #include <fcntl.h>
 
+namespace vesk {
+
 WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
                                   const char *mountPath) {
     const WarmBuffer buffer = WarmBufferAllocate();
@@ -30,7 +32,7 @@ WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevi
         more = BitScanStep(scan, run);
         seen = seen || run.count > 0;
         if (run.count > 0 &&
-            ReadFdToNullByRange(device.Get(), run, buffer.get(), warmBufferBytes) < 0) {
+            ReadFdToNullByRange(device.Get(), run, buffer.get(), kWarmBufferBytes) < 0) {
             LogError("Read range to cache failed");
             return WorkResult::Failed;
         }
@@ -45,3 +47,5 @@ WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevi
     }
     return WorkResult::Done;
 }
+
+} // namespace vesk

@@ -9,9 +9,11 @@
 
 #include <fcntl.h>
 
+namespace vesk {
+
 namespace {
 
-const uint32_t flagUninitialized = 1;
+const uint32_t kFlagUninitialized = 1;
 
 } // namespace
 
@@ -37,7 +39,7 @@ WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm>
             return WorkResult::Interrupted;
         }
         const WorkResult result = ReadMappingRangesToCache(mountPath, device.Get(), file.table,
-                                                           buffer.get(), warmBufferBytes);
+                                                           buffer.get(), kWarmBufferBytes);
         if (result == WorkResult::Failed) {
             LogError("Can't read file (%s) to cache", file.path.c_str());
             return WorkResult::Failed;
@@ -60,13 +62,13 @@ WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMap
             LogVerbose("Space is pending, Interrupted");
             return WorkResult::Interrupted;
         }
-        if (entry.flag == flagUninitialized) {
+        if (entry.flag == kFlagUninitialized) {
             LogVerbose("Skip uninitialized range (disk start sector = %llu num sectors = %llu)",
                        start, sectors);
             continue;
         }
         LogVerbose("Read to null (disk start sector = %llu num sectors = %llu)", start, sectors);
-        if (ReadFdToNull(fd, start << sectorByteShift, sectors << sectorByteShift, buffer,
+        if (ReadFdToNull(fd, start << kSectorByteShift, sectors << kSectorByteShift, buffer,
                          bufferSize) < 0) {
             LogError("Read fd to null failed (disk start sector = %llu num sectors = %llu)", start,
                      sectors);
@@ -75,3 +77,5 @@ WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMap
     }
     return WorkResult::Done;
 }
+
+} // namespace vesk

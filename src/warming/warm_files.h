@@ -3,8 +3,7 @@
 //
 // Thread rule: called on the worker's thread, without the service lock. Gives way before each file
 // and each extent when the volume is pending.
-#ifndef WARMING_WARM_FILES_H
-#define WARMING_WARM_FILES_H
+#pragma once
 
 #include "vesk/storage_core.h"
 #include "warming/work_result.h"
@@ -12,6 +11,8 @@
 #include <cstddef>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 struct FileToWarm {
     std::string path;       // full path, for messages
@@ -25,4 +26,4 @@ WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm>
 WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
                                     char *buffer, size_t bufferSize);
 
-#endif
+} // namespace vesk

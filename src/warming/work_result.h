@@ -1,6 +1,7 @@
 // What becomes of a request and of the warming that it asks for.
-#ifndef WARMING_WORK_RESULT_H
-#define WARMING_WORK_RESULT_H
+#pragma once
+
+namespace vesk {
 
 enum class WorkResult : int {
     Done = 0,
@@ -8,4 +9,4 @@ enum class WorkResult : int {
     Interrupted = 2, // the volume became pending while its data was read
 };
 
-#endif
+} // namespace vesk

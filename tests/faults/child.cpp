@@ -16,6 +16,8 @@
 #include <system_error>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 using Clock = std::chrono::steady_clock;
@@ -23,14 +25,14 @@ using Clock = std::chrono::steady_clock;
 // What a thread waits for is told by the arguments of the call that it is in: a record's size,
 // pthread_cond_wait's operation, sigwait's missing limit of time. The calls' numbers differ from
 // machine to machine.
-const char messageWait[] = " 0x604 ";
-const char requestWait[] = " 0x189 ";
-const char signalWait[] = " 0x0 0x8 ";
+const char kMessageWait[] = " 0x604 ";
+const char kRequestWait[] = " 0x189 ";
+const char kSignalWait[] = " 0x0 0x8 ";
 
-const char outputPath[] = "/run/faults/output";
-const char reportPath[] = "/run/faults/report";
-const int reportFd = 9;
-const int pollMicroseconds = 2000;
+const char kOutputPath[] = "/run/faults/output";
+const char kReportPath[] = "/run/faults/report";
+const int kReportFd = 9;
+const int kPollMicroseconds = 2000;
 const std::chrono::minutes hang(5); // nothing here takes that long, also where all is slow
 
 void Redirect(const char *path, int fd) {
@@ -43,9 +45,9 @@ void Redirect(const char *path, int fd) {
 
 [[noreturn]] void Become(const Program &program, const std::vector<std::string> &arguments,
                          const Fault &fault) {
-    Redirect(outputPath, STDOUT_FILENO);
+    Redirect(kOutputPath, STDOUT_FILENO);
     dup2(STDOUT_FILENO, STDERR_FILENO);
-    Redirect(reportPath, reportFd);
+    Redirect(kReportPath, kReportFd);
     setenv("LD_PRELOAD", program.preload.c_str(), 1);
     if (!fault.kind.empty()) {
         setenv("VESK_FAIL_CALL", fault.kind.c_str(), 1);
@@ -119,7 +121,7 @@ bool Child::AwaitHandler() const {
             (strtoull(status.c_str() + at + 8, nullptr, 16) & 1ULL << (SIGTERM - 1)) != 0) {
             return true;
         }
-        usleep(pollMicroseconds);
+        usleep(kPollMicroseconds);
     }
     return false;
 }
@@ -128,7 +130,7 @@ bool Child::IsQuiet() const {
     // The receiver, the first thread, comes first: before it waits it has made the others and woken
     // the worker for what it has stored.
     const std::string receiver = std::to_string(pid_);
-    if (!IsInCall(pid_, receiver, {messageWait}) &&
+    if (!IsInCall(pid_, receiver, {kMessageWait}) &&
         WorldRead(TaskPath(pid_, receiver + "/stat")).find(") Z ") == std::string::npos) {
         return false;
     }
@@ -138,7 +140,7 @@ bool Child::IsQuiet() const {
     for (const auto &entry : std::filesystem::directory_iterator(TaskPath(pid_, ""), gone)) {
         newest = std::max(newest, strtol(entry.path().filename().c_str(), nullptr, 10));
     }
-    return IsInCall(pid_, std::to_string(newest), {requestWait, signalWait, messageWait});
+    return IsInCall(pid_, std::to_string(newest), {kRequestWait, kSignalWait, kMessageWait});
 }
 
 bool Child::AwaitQuiet() const {
@@ -147,7 +149,7 @@ bool Child::AwaitQuiet() const {
         if (IsQuiet()) {
             return true;
         }
-        usleep(pollMicroseconds);
+        usleep(kPollMicroseconds);
     }
     return false;
 }
@@ -155,7 +157,7 @@ bool Child::AwaitQuiet() const {
 int Child::Descriptors(int enough) const {
     int lowest = CountDescriptors(pid_);
     for (int looks = 0; looks < 5 || (looks < 200 && lowest > enough); ++looks) {
-        usleep(pollMicroseconds);
+        usleep(kPollMicroseconds);
         lowest = std::min(lowest, CountDescriptors(pid_));
     }
     return lowest;
@@ -176,7 +178,7 @@ void Child::Signal(int number) const {
 int Child::AwaitEnd() {
     const Clock::time_point end = Clock::now() + hang;
     while (!HasEnded() && Clock::now() < end) {
-        usleep(pollMicroseconds / 4);
+        usleep(kPollMicroseconds / 4);
     }
     if (!HasEnded()) {
         return -1;
@@ -198,9 +200,11 @@ long Child::LiveAllocations() const {
 }
 
 std::string Child::Report() const {
-    return WorldRead(reportPath);
+    return WorldRead(kReportPath);
 }
 
 std::string Child::Output() const {
-    return WorldRead(outputPath);
+    return WorldRead(kOutputPath);
 }
+
+} // namespace vesk

@@ -1,12 +1,13 @@
 // The tool as a child process with one call that fails.
-#ifndef TESTS_FAULTS_CHILD_H
-#define TESTS_FAULTS_CHILD_H
+#pragma once
 
 #include "tests/faults/scenario.h"
 
 #include <string>
 #include <sys/types.h>
 #include <vector>
+
+namespace vesk {
 
 class Child {
 public:
@@ -40,4 +41,4 @@ private:
     pid_t pid_ = -1;
 };
 
-#endif
+} // namespace vesk

@@ -6,6 +6,8 @@
 #include <sstream>
 #include <tuple>
 
+namespace vesk {
+
 namespace {
 
 // A file as programs see it, and as the disk is sure to have it.
@@ -146,3 +148,5 @@ std::vector<CrashPoint> CrashPointsOf(const std::string &record, const Files &st
     } while (Step(words, &disk));
     return points;
 }
+
+} // namespace vesk

@@ -1,10 +1,11 @@
 // What a crash can leave on the disk, at every point of a recorded run.
-#ifndef TESTS_FAULTS_CRASH_POINTS_H
-#define TESTS_FAULTS_CRASH_POINTS_H
+#pragma once
 
 #include <map>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 using Files = std::map<std::string, std::string>; // path: content
 
@@ -24,4 +25,4 @@ struct CrashPoint {
 std::vector<CrashPoint> CrashPointsOf(const std::string &record, const Files &start,
                                       const std::string &bitmapPath);
 
-#endif
+} // namespace vesk

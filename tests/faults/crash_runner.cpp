@@ -16,14 +16,16 @@
 #include <filesystem>
 #include <unistd.h>
 
+using namespace vesk;
+
 namespace {
 
-const char config[] = "/run/faults/config.json";
-const char bitmapFile[] = "/volume1/veskcachepinfile.bitmap";
-const char deviceState[] = "/run/vesk1/cachedev_1.json";
-const std::vector<std::string> serve = {"--start-service", "--config-path", config};
+const char kConfig[] = "/run/faults/config.json";
+const char kBitmapFile[] = "/volume1/veskcachepinfile.bitmap";
+const char kDeviceState[] = "/run/vesk1/cachedev_1.json";
+const std::vector<std::string> kServe = {"--start-service", "--config-path", kConfig};
 // Pin, unpin, a pin that fails, a reload, one for a volume that is not there.
-const std::vector<char> messages = {'a', 'u', 'c', 'r', 'g', 'u', 'a'};
+const std::vector<char> kMessages = {'a', 'u', 'c', 'r', 'g', 'u', 'a'};
 
 // What a run leaves.
 struct Left {
@@ -35,14 +37,14 @@ struct Left {
 };
 
 std::string DriverBits() {
-    const std::string state = WorldRead(deviceState);
+    const std::string state = WorldRead(kDeviceState);
     const size_t at = state.find("\"bitmapBits\"");
     return at == std::string::npos ? "" : state.substr(at, state.find("]]", at) - at);
 }
 
 // A change of a block that holds nothing hands the bitmap file over, whatever the driver has.
 void TellDriver(const Program &program, const std::string &bitmap) {
-    WorldWrite(bitmapFile, bitmap);
+    WorldWrite(kBitmapFile, bitmap);
     Child(program,
           {"--unset-bitmap", "--mount-path", "/volume1", "--start-sector", "130944",
            "--num-sectors", "128"},
@@ -67,34 +69,34 @@ size_t Ended(const std::string &log) {
 // carried out.
 Left Serve(const Program &program, long next) {
     Left left;
-    Child service(program, serve, Fault{});
+    Child service(program, kServe, Fault{});
     if (!service.AwaitQuiet()) {
         left.complaint = "the service did not start";
-    } else if (!WorldIsIdle(config, next)) {
+    } else if (!WorldIsIdle(kConfig, next)) {
         left.complaint = "requests stay queued";
     }
     service.Signal(SIGTERM);
     if (service.AwaitEnd() != 0) {
         left.complaint = "the service did not end with 0";
     }
-    left.document = WorldRead(config);
-    left.bitmap = WorldRead(bitmapFile);
+    left.document = WorldRead(kConfig);
+    left.bitmap = WorldRead(kBitmapFile);
     left.driver = DriverBits();
     left.log = service.Output();
     return left;
 }
 
 void Reset(const Program &program, const std::vector<char> &queued, bool withDocument) {
-    WorldReset(config, queued);
+    WorldReset(kConfig, queued);
     if (!withDocument) {
-        std::filesystem::remove(config);
+        std::filesystem::remove(kConfig);
     }
     TellDriver(program, WorldBitmap());
 }
 
 void Restore(const Program &program, const CrashPoint &point) {
-    WorldReset(config, {});
-    std::filesystem::remove(config);
+    WorldReset(kConfig, {});
+    std::filesystem::remove(kConfig);
     TellDriver(program, point.driverBitmap);
     for (const auto &[path, content] : point.files) {
         WorldWrite(path, content);
@@ -103,7 +105,7 @@ void Restore(const Program &program, const CrashPoint &point) {
 
 // The requests that the document has, carried out or not.
 size_t RequestsIn(const Files &files, long first) {
-    WorldWrite("/run/faults/document", files.count(config) == 0 ? "" : files.at(config));
+    WorldWrite("/run/faults/document", files.count(kConfig) == 0 ? "" : files.at(kConfig));
     const long next = WorldNextNumber("/run/faults/document");
     std::filesystem::remove("/run/faults/document");
     return next == 0 ? 0 : static_cast<size_t>(next - first);
@@ -111,7 +113,7 @@ size_t RequestsIn(const Files &files, long first) {
 
 // The requests in the document that end with a message: those of the volume that is there.
 size_t QueuedIn(const Files &files) {
-    return files.count(config) == 0 ? 0 : Count(files.at(config), "\"mountPath\" : \"/volume1\"");
+    return files.count(kConfig) == 0 ? 0 : Count(files.at(kConfig), "\"mountPath\" : \"/volume1\"");
 }
 
 std::string Judge(const CrashPoint &point, size_t requests, const Left &left, const Left &good) {
@@ -140,24 +142,24 @@ void RunBeginning(const Program &recorded, const Program &program, bool withDocu
                   size_t *points, size_t *broken) {
     const long first = withDocument ? 1 : 0;
     std::vector<Left> good;
-    for (size_t k = 0; k <= messages.size(); ++k) {
-        Reset(program, {messages.begin(), messages.begin() + static_cast<long>(k)}, withDocument);
+    for (size_t k = 0; k <= kMessages.size(); ++k) {
+        Reset(program, {kMessages.begin(), kMessages.begin() + static_cast<long>(k)}, withDocument);
         good.push_back(Serve(program, first + static_cast<long>(k)));
     }
-    Reset(program, messages, withDocument);
-    Files start = {{bitmapFile, WorldBitmap()}};
+    Reset(program, kMessages, withDocument);
+    Files start = {{kBitmapFile, WorldBitmap()}};
     if (withDocument) {
-        start[config] = WorldDocument();
+        start[kConfig] = WorldDocument();
     }
     std::string record;
     {
-        Child service(recorded, serve, Fault{});
+        Child service(recorded, kServe, Fault{});
         service.AwaitQuiet();
         service.Signal(SIGTERM);
         service.AwaitEnd();
         record = service.Report();
     }
-    for (const CrashPoint &point : CrashPointsOf(record, start, bitmapFile)) {
+    for (const CrashPoint &point : CrashPointsOf(record, start, kBitmapFile)) {
         Restore(program, point);
         const size_t requests = RequestsIn(point.files, first);
         const Left left = Serve(program, first + static_cast<long>(requests));

@@ -21,6 +21,8 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+using namespace vesk;
+
 // The C library's own names for what is replaced here.
 extern "C" void *__libc_malloc(size_t size);
 extern "C" void *__libc_realloc(void *memory, size_t size);
@@ -30,7 +32,7 @@ extern "C" void *__libc_memalign(size_t alignment, size_t size);
 
 namespace {
 
-const int reportFd = 9;
+const int kReportFd = 9;
 
 std::atomic<bool> armed{false};
 std::atomic<long> calls{0};
@@ -63,7 +65,7 @@ void *Counted(void *memory) {
 __attribute__((destructor)) void ReportLive() {
     char text[32];
     const int length = snprintf(text, sizeof(text), " %ld", live.load());
-    syscall(SYS_write, reportFd, text, static_cast<size_t>(length));
+    syscall(SYS_write, kReportFd, text, static_cast<size_t>(length));
 }
 
 // A transfer of half the length, or the failure.
@@ -76,11 +78,11 @@ template <typename Call> ssize_t Transfer(const char *kind, size_t size, Call ca
 
 } // namespace
 
-bool FailsNow(const char *kind) {
+bool vesk::FailsNow(const char *kind) {
     if (!armed || strcmp(kind, failingKind) != 0 || ++calls != failingNumber) {
         return false;
     }
-    syscall(SYS_write, reportFd, "x", 1);
+    syscall(SYS_write, kReportFd, "x", 1);
     errno = failingErrno;
     return true;
 }

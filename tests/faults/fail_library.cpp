@@ -5,9 +5,11 @@
 #include "vesk/flash_cache.h"
 #include "vesk/storage_core.h"
 
+using namespace vesk;
+
 namespace {
 
-const char kind[] = "library";
+const char kKind[] = "library";
 
 using DevicePathFunction = int (*)(const std::string &, std::string &, bool);
 using CreateFunction = FileSystemDevice *(*)(const std::string &);
@@ -19,24 +21,24 @@ extern "C" {
 
 int VESKSpaceInfoEnum(int scope, VESKSpaceInfo **list) {
     static const auto real = REAL(VESKSpaceInfoEnum);
-    return FailsNow(kind) ? -1 : real(scope, list);
+    return FailsNow(kKind) ? -1 : real(scope, list);
 }
 char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
     static const auto real = REAL(VESKSpaceUUIDGet);
-    return FailsNow(kind) ? nullptr : real(space);
+    return FailsNow(kKind) ? nullptr : real(space);
 }
 int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,
                                VESKFlashCacheConfig **config) {
     static const auto real = REAL(VESKFlashCacheConfigTmpGet);
-    return FailsNow(kind) ? -1 : real(query, config);
+    return FailsNow(kKind) ? -1 : real(query, config);
 }
 int VESKFlashCacheStatGet(const VESKFlashCacheStatQuery *query, VESKFlashCacheStat **stat) {
     static const auto real = REAL(VESKFlashCacheStatGet);
-    return FailsNow(kind) ? -1 : real(query, stat);
+    return FailsNow(kKind) ? -1 : real(query, stat);
 }
 int VESKFlashcacheGetCachePath(const char *ssdPath, char *buffer, size_t size) {
     static const auto real = REAL(VESKFlashcacheGetCachePath);
-    return FailsNow(kind) ? -1 : real(ssdPath, buffer, size);
+    return FailsNow(kKind) ? -1 : real(ssdPath, buffer, size);
 }
 
 } // extern "C"
@@ -45,11 +47,11 @@ int FileSystemDevice::GetDevicePath(const std::string &filePath, std::string &de
                                     bool reserved) {
     static const auto real = RealFunction<DevicePathFunction>(
         "_ZN16FileSystemDevice13GetDevicePathE" TEXT_REFERENCE "RS5_b");
-    return FailsNow(kind) ? -1 : real(filePath, devicePath, reserved);
+    return FailsNow(kKind) ? -1 : real(filePath, devicePath, reserved);
 }
 
 FileSystemDevice *FileSystemDeviceCreater::Create(const std::string &devicePath) {
     static const auto real =
         RealFunction<CreateFunction>("_ZN23FileSystemDeviceCreater6CreateE" TEXT_REFERENCE);
-    return FailsNow(kind) ? nullptr : real(devicePath);
+    return FailsNow(kKind) ? nullptr : real(devicePath);
 }

@@ -14,6 +14,8 @@
 #include <string>
 #include <vector>
 
+using namespace vesk;
+
 namespace {
 
 struct Kind {
@@ -21,7 +23,7 @@ struct Kind {
     std::vector<int> errors; // 0: half the length
 };
 
-const Kind kinds[] = {
+const Kind kKinds[] = {
     {"open", {ENOENT, EACCES, EMFILE}},
     {"read", {EIO, EINTR, 0}},
     {"write", {ENOSPC, EIO, 0}},
@@ -40,7 +42,7 @@ const Kind kinds[] = {
     {"thread", {EAGAIN}},
     {"library", {EIO}},
 };
-const long callsMax = 100000; // a run that makes more of one kind does not end
+const long kCallsMax = 100000; // a run that makes more of one kind does not end
 
 } // namespace
 
@@ -66,10 +68,10 @@ int main(int argc, char *argv[]) {
                    good.complaint.c_str());
             return 1;
         }
-        for (const Kind &kind : kinds) {
+        for (const Kind &kind : kKinds) {
             const long stride = strcmp(kind.name, "malloc") == 0 ? step : 1;
             for (const int error : kind.errors) {
-                for (long n = 1; n < callsMax; n += stride) {
+                for (long n = 1; n < kCallsMax; n += stride) {
                     const Outcome outcome = ScenarioRun(
                         program, *scenario, Fault{kind.name, n, error}, good.descriptors);
                     ++runs;

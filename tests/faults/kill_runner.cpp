@@ -19,13 +19,15 @@
 #include <unistd.h>
 #include <vector>
 
+using namespace vesk;
+
 namespace {
 
 using Clock = std::chrono::steady_clock;
 
-const char config[] = "/run/faults/config.json";
-const std::vector<std::string> serve = {"--start-service", "--config-path", config};
-const std::vector<std::string> requests[] = {
+const char kConfig[] = "/run/faults/config.json";
+const std::vector<std::string> kServe = {"--start-service", "--config-path", kConfig};
+const std::vector<std::string> kRequests[] = {
     {"--pin-files", "/volume1/a", "--mount-path", "/volume1"},
     {"--unpin-files", "/volume1/a;/volume1/b", "--mount-path", "/volume1"},
     {"--reload-blocks", "--mount-path", "/volume1"},
@@ -38,7 +40,7 @@ int Fail(int kills, const char *what, const std::string &detail) {
 
 // Requests that have been sent and are neither on the queue nor stored.
 long Lost(long sent) {
-    const long stored = WorldNextNumber(config) - 1; // the document began with 1
+    const long stored = WorldNextNumber(kConfig) - 1; // the document began with 1
     return sent - stored - WorldMessagesLeft();
 }
 
@@ -58,14 +60,14 @@ int main(int argc, char *argv[]) {
     const Program program{argv[1], argv[2]};
     std::mt19937 random(static_cast<unsigned>(strtoul(argv[4], nullptr, 10)));
     // The queue is there: no kill comes between its making and the writing of its key.
-    WorldReset(config, {'a'});
+    WorldReset(kConfig, {'a'});
     long sent = 1;
     long lost = 0;
     std::vector<Clock::duration> ends;
     for (int i = 1; i <= kills; ++i) {
-        Child service(program, serve, Fault{});
+        Child service(program, kServe, Fault{});
         std::vector<std::unique_ptr<Child>> clients;
-        for (const auto &request : requests) {
+        for (const auto &request : kRequests) {
             clients.push_back(std::make_unique<Child>(program, request, Fault{}));
         }
         usleep(static_cast<useconds_t>(random() % 40000));
@@ -86,7 +88,7 @@ int main(int argc, char *argv[]) {
         for (const auto &client : clients) {
             sent += client->AwaitEnd() == 0 ? 1 : 0;
         }
-        if (const std::string complaint = WorldComplaint(WorldRead(config)); !complaint.empty()) {
+        if (const std::string complaint = WorldComplaint(WorldRead(kConfig)); !complaint.empty()) {
             return Fail(i, "the document:", complaint);
         }
         const long lostBefore = lost;
@@ -96,13 +98,13 @@ int main(int argc, char *argv[]) {
                         std::to_string(lost - lostBefore));
         }
     }
-    Child last(program, serve, Fault{});
+    Child last(program, kServe, Fault{});
     if (!last.AwaitQuiet()) {
         return Fail(kills, "the last service did not come to rest:", last.Output());
     }
     last.Signal(SIGTERM);
-    if (last.AwaitEnd() != 0 || !WorldIsIdle(config, WorldNextNumber(config))) {
-        return Fail(kills, "requests are left:", WorldRead(config));
+    if (last.AwaitEnd() != 0 || !WorldIsIdle(kConfig, WorldNextNumber(kConfig))) {
+        return Fail(kills, "requests are left:", WorldRead(kConfig));
     }
     std::sort(ends.begin(), ends.end());
     const long half = Milliseconds(ends[ends.size() / 2]);

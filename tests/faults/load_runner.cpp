@@ -20,16 +20,18 @@
 #include <thread>
 #include <unistd.h>
 
+using namespace vesk;
+
 namespace {
 
 using Clock = std::chrono::steady_clock;
 
-const char config[] = "/run/faults/config.json";
-const std::vector<std::string> serve = {"--start-service", "--config-path", config};
-const int clients = 3;
-const int filesOfClient = 50; // each client pins its own in turn, one in a request
-const int filesOfRequest = 50;
-const long growthMaxKiB = 2048; // what an allocator may keep, a few documents of that size
+const char kConfig[] = "/run/faults/config.json";
+const std::vector<std::string> kServe = {"--start-service", "--config-path", kConfig};
+const int kClients = 3;
+const int kFilesOfClient = 50; // each client pins its own in turn, one in a request
+const int kFilesOfRequest = 50;
+const long kGrowthMaxKiB = 2048; // what an allocator may keep, a few documents of that size
 
 struct Figures {
     long rounds = 0;
@@ -41,7 +43,7 @@ struct Figures {
 };
 
 std::string RoundFile(int client, long number) {
-    return "c" + std::to_string(client) + "-" + std::to_string(number % filesOfClient);
+    return "c" + std::to_string(client) + "-" + std::to_string(number % kFilesOfClient);
 }
 
 void MakeFile(const std::string &name) {
@@ -49,8 +51,8 @@ void MakeFile(const std::string &name) {
 }
 
 void MakeFiles(long files) {
-    for (int client = 0; client < clients; ++client) {
-        for (int i = 0; i < filesOfClient; ++i) {
+    for (int client = 0; client < kClients; ++client) {
+        for (int i = 0; i < kFilesOfClient; ++i) {
             MakeFile(RoundFile(client, i));
         }
     }
@@ -63,7 +65,7 @@ void MakeFiles(long files) {
 // Ten minutes for what takes seconds.
 bool AwaitStored(long requests) {
     for (int i = 0; i < 60000; ++i) {
-        if (WorldIsIdle(config, requests + 1)) {
+        if (WorldIsIdle(kConfig, requests + 1)) {
             return true;
         }
         usleep(10000);
@@ -74,9 +76,9 @@ bool AwaitStored(long requests) {
 // Returns the number of requests sent.
 long PinFiles(long files) {
     long requests = 0;
-    for (long first = 0; first < files; first += filesOfRequest) {
+    for (long first = 0; first < files; first += kFilesOfRequest) {
         std::string paths;
-        for (long i = first; i < std::min(first + filesOfRequest, files); ++i) {
+        for (long i = first; i < std::min(first + kFilesOfRequest, files); ++i) {
             paths += "/volume1/f" + std::to_string(i) + ";";
         }
         WorldSendPin(paths, true);
@@ -88,9 +90,9 @@ long PinFiles(long files) {
 // Every client sends until the queue is full or it has sent `most`; numbers[client] is its next
 // file's.
 long FillQueue(long *numbers, long most) {
-    long sent[clients] = {};
+    long sent[kClients] = {};
     std::vector<std::thread> threads;
-    for (int client = 0; client < clients; ++client) {
+    for (int client = 0; client < kClients; ++client) {
         threads.emplace_back([client, numbers, most, &sent] {
             while (sent[client] < most &&
                    WorldSendPin("/volume1/" + RoundFile(client, numbers[client]), false)) {
@@ -107,7 +109,7 @@ long FillQueue(long *numbers, long most) {
 
 // What is out of order, or missing, in the service's messages; empty: nothing.
 std::string OrderComplaint(const std::string &log, const long *numbers) {
-    long seen[clients] = {};
+    long seen[kClients] = {};
     std::istringstream lines(log);
     for (std::string line; std::getline(lines, line);) {
         const size_t at = line.find("files=c");
@@ -116,12 +118,12 @@ std::string OrderComplaint(const std::string &log, const long *numbers) {
         }
         const int client = line[at + 7] - '0';
         const std::string file = line.substr(at + 6, line.find('#') - at - 6);
-        if (client < 0 || client >= clients || file != RoundFile(client, seen[client])) {
+        if (client < 0 || client >= kClients || file != RoundFile(client, seen[client])) {
             return "out of order: " + line;
         }
         ++seen[client];
     }
-    return std::equal(seen, seen + clients, numbers) ? "" : "a request was not carried out";
+    return std::equal(seen, seen + kClients, numbers) ? "" : "a request was not carried out";
 }
 
 int Fail(const std::string &what) {
@@ -150,16 +152,16 @@ int main(int argc, char *argv[]) {
     const std::chrono::seconds time(strtol(argv[3], nullptr, 10));
     const long files = strtol(argv[4], nullptr, 10);
     const long most = strtol(argv[5], nullptr, 10);
-    WorldReset(config, {});
+    WorldReset(kConfig, {});
     MakeFiles(files);
-    Child service({argv[1], argv[2]}, serve, Fault{});
+    Child service({argv[1], argv[2]}, kServe, Fault{});
     WorldAwaitQueue();
     Figures figures;
     figures.sent = PinFiles(files);
     if (!AwaitStored(figures.sent)) {
         return Fail("the first requests stay queued");
     }
-    long numbers[clients] = {};
+    long numbers[kClients] = {};
     const Clock::time_point end = Clock::now() + time;
     while (figures.rounds < 3 || Clock::now() < end) {
         figures.sent += FillQueue(numbers, most);
@@ -177,13 +179,13 @@ int main(int argc, char *argv[]) {
     printf(
         "%ld rounds, %ld requests, %ld records of files; memory %ld kB after round 2, %ld kB at the "
         "end; descriptors %d and %d\n",
-        figures.rounds, figures.sent, WorldRecords(config), figures.memory, figures.memoryEnd,
+        figures.rounds, figures.sent, WorldRecords(kConfig), figures.memory, figures.memoryEnd,
         figures.descriptors, figures.descriptorsEnd);
     if (const std::string complaint = OrderComplaint(service.Output(), numbers);
         !complaint.empty()) {
         return Fail(complaint);
     }
-    const bool flat = figures.memoryEnd <= figures.memory + growthMaxKiB &&
+    const bool flat = figures.memoryEnd <= figures.memory + kGrowthMaxKiB &&
                       figures.descriptorsEnd <= figures.descriptors;
-    return flat && WorldRecords(config) >= files ? 0 : 1;
+    return flat && WorldRecords(kConfig) >= files ? 0 : 1;
 }

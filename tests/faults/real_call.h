@@ -1,11 +1,12 @@
 // For objects that are loaded before the C library: the call that they take the place of.
-#ifndef TESTS_FAULTS_REAL_CALL_H
-#define TESTS_FAULTS_REAL_CALL_H
+#pragma once
 
 #include <cstdarg>
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <sys/types.h>
+
+namespace vesk {
 
 // The function of that (mangled) name that would have been called without this object.
 template <typename Function> Function RealFunction(const char *name) {
@@ -21,4 +22,4 @@ inline mode_t ModeOf(int flags, va_list arguments) {
 // In the object that lets calls fail: whether this is the call that must; sets errno then.
 bool FailsNow(const char *kind);
 
-#endif
+} // namespace vesk

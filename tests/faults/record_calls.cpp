@@ -21,10 +21,12 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+using namespace vesk;
+
 namespace {
 
-const int reportFd = 9;
-const unsigned long setBitmapRequest = 0xFECF;
+const int kReportFd = 9;
+const unsigned long kSetBitmapRequest = 0xFECF;
 
 // Held over an operation and its line.
 std::mutex &Order() {
@@ -33,7 +35,7 @@ std::mutex &Order() {
 }
 
 void Report(const std::string &line) {
-    syscall(SYS_write, reportFd, line.data(), line.size());
+    syscall(SYS_write, kReportFd, line.data(), line.size());
 }
 
 std::string PathOf(int fd) {
@@ -142,7 +144,7 @@ int ioctl(int fd, unsigned long request, ...) noexcept {
     va_end(arguments);
     const std::lock_guard<std::mutex> lock(Order());
     const int result = real(fd, request, argument);
-    if (result == 0 && request == setBitmapRequest) {
+    if (result == 0 && request == kSetBitmapRequest) {
         Report("driver\n");
     }
     return result;

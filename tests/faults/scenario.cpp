@@ -5,11 +5,13 @@
 
 #include <signal.h>
 
+namespace vesk {
+
 namespace {
 
-const char config[] = "/run/faults/config.json";
+const char kConfig[] = "/run/faults/config.json";
 
-const Scenario scenarios[] = {
+const Scenario kScenarios[] = {
     {"pin-files", {"--pin-files", "/volume1/a", "--mount-path", "/volume1"}, 0, false, {}},
     {"reload-blocks", {"--reload-blocks", "--mount-path", "/volume1"}, 0, false, {}},
     {"add-pending", {"--add-pending", "--mount-path", "/volume1"}, 255, false, {}},
@@ -18,13 +20,13 @@ const Scenario scenarios[] = {
     {"get-uuid", {"--get-uuid", "--mount-path", "/volume1"}, 0, false, {}},
     {"send-bitmap", {"--send-bitmap", "--mount-path", "/volume1"}, 0, false, {}},
     {"handle-mount",
-     {"--handle-mount", "--mount-path", "/gone", "--config-path", config},
+     {"--handle-mount", "--mount-path", "/gone", "--config-path", kConfig},
      0,
      false,
      {}},
     {"handle-umount", {"--handle-umount", "--mount-path", "/volume1"}, 0, false, {}},
     {"delete-bitmap", {"--delete-bitmap", "--mount-path", "/volume1"}, 0, false, {}},
-    {"check-pin", {"--check-pin", "/volume1/b", "--config-path", config}, 0, false, {}},
+    {"check-pin", {"--check-pin", "/volume1/b", "--config-path", kConfig}, 0, false, {}},
     {"unpin-all", {"--unpin-all", "--mount-path", "/volume1"}, 0, false, {}},
     {"is-all-unpin", {"--is-all-unpin", "/run/vesk1/cachedev_1"}, 0, false, {}},
     {"set-bitmap",
@@ -44,7 +46,7 @@ const Scenario scenarios[] = {
      false,
      {}},
     {"get-bitmap-size", {"--get-bitmap-size-byte", "--mount-path", "/volume1"}, 0, false, {}},
-    {"service", {"--start-service", "--config-path", config}, 0, true, {'a', 'u'}},
+    {"service", {"--start-service", "--config-path", kConfig}, 0, true, {'a', 'u'}},
 };
 
 bool Contains(const std::string &text, const std::string &part) {
@@ -81,7 +83,7 @@ std::string LossComplaint(const Outcome &outcome) {
 } // namespace
 
 const Scenario *ScenarioFind(const std::string &name) {
-    for (const Scenario &scenario : scenarios) {
+    for (const Scenario &scenario : kScenarios) {
         if (name == scenario.name) {
             return &scenario;
         }
@@ -91,7 +93,7 @@ const Scenario *ScenarioFind(const std::string &name) {
 
 Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Fault &fault,
                     int descriptors) {
-    WorldReset(config, scenario.messages);
+    WorldReset(kConfig, scenario.messages);
     Outcome outcome;
     outcome.faultKind = fault.kind;
     Child child(program, scenario.arguments, fault);
@@ -104,7 +106,7 @@ Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Faul
     outcome.faultReached = child.FaultReached();
     outcome.allocations = child.LiveAllocations();
     outcome.log = child.Output();
-    outcome.document = WorldRead(config);
+    outcome.document = WorldRead(kConfig);
     outcome.bitmap = WorldRead("/volume1/veskcachepinfile.bitmap");
     outcome.messagesLeft = WorldMessagesLeft();
     if (outcome.status != 0 && outcome.status != 255) {
@@ -117,7 +119,7 @@ std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const O
     if (const std::string complaint = WorldComplaint(outcome.document); !complaint.empty()) {
         return complaint;
     }
-    if (WorldLeftovers(config)) {
+    if (WorldLeftovers(kConfig)) {
         return "a temporary file is left beside the configuration file";
     }
     if (scenario.isService) {
@@ -141,3 +143,5 @@ std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const O
     }
     return "";
 }
+
+} // namespace vesk

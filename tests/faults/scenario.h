@@ -1,10 +1,11 @@
 // One run of the tool, or of its service, from a known beginning, with or without a failing call;
 // and whether what it left is one of the things that it may leave.
-#ifndef TESTS_FAULTS_SCENARIO_H
-#define TESTS_FAULTS_SCENARIO_H
+#pragma once
 
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 struct Program {
     std::string tool;
@@ -48,4 +49,4 @@ Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Faul
 // What the outcome has wrong, beside the run without a fault; empty: nothing.
 std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const Outcome &outcome);
 
-#endif
+} // namespace vesk

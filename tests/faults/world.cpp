@@ -12,11 +12,13 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const char keyFile[] = "/run/veskcachepinfile-msg-server.key";
-const char bitmapFile[] = "/volume1/veskcachepinfile.bitmap";
-const size_t bitmapBytes = 128; // of the 64 MiB volume
+const char kKeyFile[] = "/run/veskcachepinfile-msg-server.key";
+const char kBitmapFile[] = "/volume1/veskcachepinfile.bitmap";
+const size_t kBitmapBytes = 128; // of the 64 MiB volume
 
 size_t messagesSent = 0;
 
@@ -36,7 +38,7 @@ std::string Inode(const char *path) {
 }
 
 int Queue() {
-    const key_t key = ftok(keyFile, 'x');
+    const key_t key = ftok(kKeyFile, 'x');
     return key == -1 ? -1 : msgget(key, 0);
 }
 
@@ -45,14 +47,14 @@ void RemoveQueue() {
     if (queue != -1) {
         msgctl(queue, IPC_RMID, nullptr);
     }
-    std::filesystem::remove(keyFile);
+    std::filesystem::remove(kKeyFile);
 }
 
 void Send(const std::vector<char> &messages) {
-    WorldWrite(keyFile, "");
-    const key_t key = ftok(keyFile, 'x');
+    WorldWrite(kKeyFile, "");
+    const key_t key = ftok(kKeyFile, 'x');
     const int queue = msgget(key, IPC_CREAT | 0644);
-    WorldWrite(keyFile, std::to_string(key));
+    WorldWrite(kKeyFile, std::to_string(key));
     for (const char kind : messages) {
         Message message;
         message.record.type = kind == 'u' ? 2 : kind == 'r' || kind == 'g' ? 6 : 1;
@@ -82,7 +84,7 @@ std::string WorldDocument() {
 }
 
 std::string WorldBitmap() {
-    std::string bitmap(bitmapBytes, '\0');
+    std::string bitmap(kBitmapBytes, '\0');
     bitmap[1] = 1; // sectors 1024 to 1151
     return bitmap;
 }
@@ -92,7 +94,7 @@ void WorldReset(const char *config, const std::vector<char> &messages) {
     std::filesystem::remove_all(folder);
     std::filesystem::create_directories(folder);
     WorldWrite(config, WorldDocument());
-    WorldWrite(bitmapFile, WorldBitmap());
+    WorldWrite(kBitmapFile, WorldBitmap());
     RemoveQueue();
     messagesSent = messages.size();
     if (!messages.empty()) {
@@ -188,3 +190,5 @@ bool WorldLeftovers(const std::string &path) {
     }
     return false;
 }
+
+} // namespace vesk

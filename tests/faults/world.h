@@ -1,10 +1,11 @@
 // What the runs begin with and leave behind: configuration file, bitmap file, message queue.
-#ifndef TESTS_FAULTS_WORLD_H
-#define TESTS_FAULTS_WORLD_H
+#pragma once
 
 #include <json/value.h>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // The known beginning: the document and the bitmap below, no queue; with messages a queue that
 // holds them: 'a' pins file a, 'c' file c, 'u' unpins file b, 'r' reloads, 'g' reloads a volume
@@ -42,4 +43,4 @@ void WorldWrite(const std::string &path, const std::string &content);
 // Whether anything but the file is in its folder, beside the runs' own output.
 bool WorldLeftovers(const std::string &path);
 
-#endif
+} // namespace vesk

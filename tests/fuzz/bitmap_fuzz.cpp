@@ -12,9 +12,11 @@
 #include <cstdlib>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
-const uint64_t bitmapBytesMax = 9000; // three chunks of a file
+const uint64_t kBitmapBytesMax = 9000; // three chunks of a file
 
 struct Range {
     bool set;
@@ -30,8 +32,8 @@ PinBitmap *NewBitmap(uint32_t bytes) {
 }
 
 void ApplyToModel(const Range &range, std::vector<char> *bits) {
-    const uint64_t last = (range.start + range.count - 1) >> bitmapSectorShift;
-    for (uint64_t bit = range.start >> bitmapSectorShift; bit <= last && bit < bits->size();
+    const uint64_t last = (range.start + range.count - 1) >> kBitmapSectorShift;
+    for (uint64_t bit = range.start >> kBitmapSectorShift; bit <= last && bit < bits->size();
          ++bit) {
         (*bits)[bit] = range.set ? 1 : 0;
     }
@@ -51,7 +53,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     LogToSyslog = 0;
     LogLevel = 0;
     FuzzInput input(data, size);
-    PinBitmap *bitmap = NewBitmap(static_cast<uint32_t>(input.Number(2) % bitmapBytesMax));
+    PinBitmap *bitmap = NewBitmap(static_cast<uint32_t>(input.Number(2) % kBitmapBytesMax));
     std::vector<Range> ranges(input.Byte() % 16);
     for (Range &range : ranges) {
         range.set = (input.Byte() & 1) != 0;
@@ -87,3 +89,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     BitmapFree(bitmap);
     return 0;
 }
+
+} // namespace vesk

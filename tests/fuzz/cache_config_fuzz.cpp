@@ -3,6 +3,8 @@
 
 #include "flash_cache/cache_config.h"
 
+namespace vesk {
+
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     static const std::string path = FuzzPath("veskflashcache.json");
     FuzzWrite(path, std::string(reinterpret_cast<const char *>(data), size));
@@ -17,3 +19,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
+
+} // namespace vesk

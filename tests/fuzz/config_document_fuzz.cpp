@@ -17,22 +17,24 @@
 #include <cstring>
 #include <json/value.h>
 
+namespace vesk {
+
 namespace {
 
-const char volume[] = "/volume1";
+const char kVolume[] = "/volume1";
 
 bool Prepare() {
     LogToSyslog = 0;
     LogLevel = 0;
     ServiceStateInitialize();
-    FakeApplianceOneVolume("/dev/null", volume);
+    FakeApplianceOneVolume("/dev/null", kVolume);
     return true;
 }
 
 RequestRecord Record(uint8_t choice) {
     RequestRecord record{};
     record.type = choice & 7;
-    strcpy(record.mountPath, (choice & 8) != 0 ? "/gone" : volume);
+    strcpy(record.mountPath, (choice & 8) != 0 ? "/gone" : kVolume);
     // What a finished request has; an added one names absolute paths.
     strcpy(record.data, (choice & 16) != 0 ? "a#12;b#13" : (choice & 32) != 0 ? "b#0" : "");
     return record;
@@ -111,3 +113,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
+
+} // namespace vesk

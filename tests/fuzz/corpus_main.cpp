@@ -7,6 +7,8 @@
 #include <filesystem>
 #include <unistd.h>
 
+using namespace vesk;
+
 int main(int argc, char *argv[]) {
     const int quiet = open("/dev/null", O_WRONLY | O_CLOEXEC);
     if (quiet < 0 || dup2(quiet, STDOUT_FILENO) < 0) {

@@ -13,22 +13,24 @@
 #include <memory>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const uint64_t blocks = 10;
-const uint64_t deviceBytes = blocks * kBlockBytes;
-const uint32_t slots = 3;
-const size_t memoryBytes = 32768; // holds a range list
+const uint64_t kBlocks = 10;
+const uint64_t kDeviceBytes = kBlocks * kBlockBytes;
+const uint32_t kSlots = 3;
+const size_t kMemoryBytes = 32768; // holds a range list
 
-const uint32_t numbers[] = {kRequestSetBitmap,   kRequestQueryBitmapSet,   kRequestUnpinRanges,
-                            kRequestUnpinAll,    kRequestQueryAllUnpinned, kRequestGetSize64Bit,
-                            kRequestGetSize32Bit};
+const uint32_t kNumbers[] = {kRequestSetBitmap,   kRequestQueryBitmapSet,   kRequestUnpinRanges,
+                             kRequestUnpinAll,    kRequestQueryAllUnpinned, kRequestGetSize64Bit,
+                             kRequestGetSize32Bit};
 
 struct Fixture {
-    TestDevice test{deviceBytes, slots};
-    std::string model = TestBytes(0, deviceBytes);
+    TestDevice test{kDeviceBytes, kSlots};
+    std::string model = TestBytes(0, kDeviceBytes);
     // Where requests find their records, above 4 GiB or not.
-    std::unique_ptr<unsigned char[]> memory{new unsigned char[memoryBytes]()};
+    std::unique_ptr<unsigned char[]> memory{new unsigned char[kMemoryBytes]()};
 };
 
 void Read(Fixture &fixture, FuzzInput &input) {
@@ -61,10 +63,10 @@ void Write(Fixture &fixture, FuzzInput &input) {
 void Request(Fixture &fixture, FuzzInput &input) {
     const uint8_t choice = input.Byte();
     PinRequest request{};
-    request.number = choice < 250 ? numbers[choice % std::size(numbers)]
+    request.number = choice < 250 ? kNumbers[choice % std::size(kNumbers)]
                                   : static_cast<uint32_t>(input.Number(4));
     request.caller = {getpid(), (choice & 128) != 0};
-    const std::string bytes = input.Text(input.Number(2) % memoryBytes);
+    const std::string bytes = input.Text(input.Number(2) % kMemoryBytes);
     memcpy(fixture.memory.get(), bytes.data(), bytes.size());
     const auto address = reinterpret_cast<uint64_t>(fixture.memory.get());
     const uint8_t place = input.Byte();
@@ -89,7 +91,7 @@ void Step(Fixture &fixture, FuzzInput &input) {
     default: Request(fixture, input); break;
     }
     const CacheSnapshot snapshot = CacheDeviceSnapshot(fixture.test.device);
-    FuzzExpect(snapshot.cachedBlocks <= slots && snapshot.pinnedBlocks <= snapshot.cachedBlocks,
+    FuzzExpect(snapshot.cachedBlocks <= kSlots && snapshot.pinnedBlocks <= snapshot.cachedBlocks,
                "no more is pinned than cached, nor cached than there is room");
 }
 
@@ -106,3 +108,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
+
+} // namespace vesk

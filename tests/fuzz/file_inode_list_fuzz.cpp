@@ -8,6 +8,8 @@
 #include <cstring>
 #include <vector>
 
+namespace vesk {
+
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     LogToSyslog = 0;
     LogLevel = 0;
@@ -39,3 +41,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
+
+} // namespace vesk

@@ -7,6 +7,8 @@
 #include <fstream>
 #include <iterator>
 
+namespace vesk {
+
 namespace {
 
 struct Folder {
@@ -62,3 +64,5 @@ void FuzzExpect(bool holds, const char *what) {
         abort();
     }
 }
+
+} // namespace vesk

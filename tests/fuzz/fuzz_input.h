@@ -1,11 +1,12 @@
 // What the fuzzing targets share: reading an input piece by piece, a folder in memory for the files
 // that the code under test wants, and the way in which a target says that something must not be.
-#ifndef TESTS_FUZZ_FUZZ_INPUT_H
-#define TESTS_FUZZ_FUZZ_INPUT_H
+#pragma once
 
 #include <cstddef>
 #include <cstdint>
 #include <string>
+
+namespace vesk {
 
 // Every target defines this; always 0.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size);
@@ -34,4 +35,4 @@ std::string FuzzRead(const std::string &path);
 // Ends the process with a message unless `holds`.
 void FuzzExpect(bool holds, const char *what);
 
-#endif
+} // namespace vesk

@@ -7,6 +7,8 @@
 
 #include <stdexcept>
 
+namespace vesk {
+
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     LogToSyslog = 0;
     LogLevel = 0;
@@ -22,3 +24,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
+
+} // namespace vesk

@@ -12,6 +12,8 @@
 #include <getopt.h>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 bool EndsTheProcess(const std::string &word) {
@@ -57,3 +59,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     FuzzExpect(ToolCommandToString(parameters.command) != nullptr, "every command has a name");
     return 0;
 }
+
+} // namespace vesk

@@ -18,6 +18,8 @@
 #include <json/value.h>
 #include <pthread.h>
 
+namespace vesk {
+
 namespace {
 
 bool Prepare() {
@@ -52,13 +54,13 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     std::filesystem::remove(path);
     ServiceStateInitialize();
     SetServiceThreads(2); // this one's end must not look like the service's
-    const int queue = MsgQueueGet(messageKeyFile);
+    const int queue = MsgQueueGet(kMessageKeyFile);
     FuzzInput input(data, size);
     for (int messages = 0; messages < 8 && !input.IsEmpty(); ++messages) {
-        PutMessage(queue, requestMessageType,
-                   input.Text(input.Number(2) % (requestMessageBytes + 1)));
+        PutMessage(queue, kRequestMessageType,
+                   input.Text(input.Number(2) % (kRequestMessageBytes + 1)));
     }
-    PutMessage(queue, requestMessageType, End());
+    PutMessage(queue, kRequestMessageType, End());
     pthread_t thread{};
     FuzzExpect(pthread_create(&thread, nullptr, Receive, const_cast<char *>(path.c_str())) == 0,
                "a thread can be made");
@@ -68,3 +70,5 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
                "the document can be used");
     return 0;
 }
+
+} // namespace vesk

@@ -9,6 +9,8 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+namespace vesk {
+
 std::string FirstOf(const std::vector<std::string> &texts) {
     return texts.empty() ? "(none)" : texts.front();
 }
@@ -76,3 +78,5 @@ int CapturedLog::Count(const std::string &message) {
     const std::vector<std::string> messages = Messages();
     return static_cast<int>(std::count(messages.begin(), messages.end(), message));
 }
+
+} // namespace vesk

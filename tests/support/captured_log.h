@@ -2,13 +2,14 @@
 //
 // Messages are sent to standard output, as with --stdout, and standard output is caught whole, so
 // that a test sees the exact final form. Level 1 unless said otherwise.
-#ifndef TESTS_SUPPORT_CAPTURED_LOG_H
-#define TESTS_SUPPORT_CAPTURED_LOG_H
+#pragma once
 
 #include "base/scoped_fd.h"
 
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // The first and the last of some texts; "(none)" of none.
 std::string FirstOf(const std::vector<std::string> &texts);
@@ -38,4 +39,4 @@ private:
     ScopedFd file_;
 };
 
-#endif
+} // namespace vesk

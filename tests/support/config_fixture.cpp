@@ -13,14 +13,16 @@
 #include <sys/stat.h>
 #include <thread>
 
+namespace vesk {
+
 namespace {
 
 // A private /tmp in memory, where making a file durable costs nothing.
-const bool privateMounts = UsePrivateMounts();
+const bool kPrivateMounts = UsePrivateMounts();
 
 } // namespace
 
-const char exampleDocument[] = R"({
+const char kExampleDocument[] = R"({
    "nextRequestNum" : 3,
    "requestQueue" : [ "1", "2" ],
    "requests" : {
@@ -101,3 +103,5 @@ std::string ConfigTest::CreateFile(const std::string &relativePath) const {
     EXPECT_EQ(stat(path.c_str(), &status), 0);
     return std::to_string(static_cast<uint32_t>(status.st_ino));
 }
+
+} // namespace vesk

@@ -1,7 +1,6 @@
 // What the tests of the configuration share: one private configuration file, the service state as
 // the service starts with it, and small makers of records and documents.
-#ifndef TESTS_SUPPORT_CONFIG_FIXTURE_H
-#define TESTS_SUPPORT_CONFIG_FIXTURE_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 #include "tests/support/fake_appliance.h"
@@ -17,6 +16,8 @@
 #include <gtest/gtest.h>
 #include <json/value.h>
 #include <string>
+
+namespace vesk {
 
 // The document that a text holds; a text that holds none fails the test.
 Json::Value ParseDocument(const std::string &text);
@@ -48,6 +49,6 @@ protected:
 };
 
 // Two pins on /volume1 (0 is done, 1 is queued) and a reload request.
-extern const char exampleDocument[];
+extern const char kExampleDocument[];
 
-#endif
+} // namespace vesk

@@ -7,6 +7,8 @@
 #include <cstdlib>
 #include <cstring>
 
+namespace vesk {
+
 std::vector<FakeSpace> FakeAppliance::spaces;
 std::vector<FakeCache> FakeAppliance::caches;
 int FakeAppliance::enumResult = 0;
@@ -80,6 +82,10 @@ public:
 };
 
 } // namespace
+
+} // namespace vesk
+
+using namespace vesk;
 
 FileMappingTable::~FileMappingTable() = default;
 FileSystemDevice::~FileSystemDevice() = default;

@@ -2,14 +2,15 @@
 //
 // The test program defines the libraries' functions itself, so that they answer in place of the
 // shared libraries. Reset() in SetUp; every field is then as declared here.
-#ifndef TESTS_SUPPORT_FAKE_APPLIANCE_H
-#define TESTS_SUPPORT_FAKE_APPLIANCE_H
+#pragma once
 
 #include "vesk/storage_core.h"
 
 #include <functional>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 struct FakeSpace {
     std::string devicePath;
@@ -61,4 +62,4 @@ void FakeApplianceOneVolume(const std::string &cachePath,
 FileMappingEntry FakeExtent(uint64_t fileStart, uint64_t count, uint64_t deviceStart,
                             uint32_t flag = 0);
 
-#endif
+} // namespace vesk

@@ -16,6 +16,8 @@
 #include <memory>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 std::string Number(uint64_t value) {
@@ -118,7 +120,7 @@ int FakeCacheDevice::Answer(unsigned long request, void *argument) {
         return 0;
     }
     switch (request) {
-    case pinIoctlSetBitmap: {
+    case kPinIoctlSetBitmap: {
         const auto *bitmap = static_cast<const PinBitmap *>(argument);
         const std::string content(reinterpret_cast<const char *>(bitmap->data), bitmap->size);
         events.push_back("bitmap " + Hex(content));
@@ -127,17 +129,17 @@ int FakeCacheDevice::Answer(unsigned long request, void *argument) {
         }
         break;
     }
-    case pinIoctlQueryBitmapSet:
+    case kPinIoctlQueryBitmapSet:
         events.emplace_back("query");
         if (onQuery) {
             onQuery();
         }
         *static_cast<int *>(argument) = bitmapSet;
         break;
-    case pinIoctlUnpinRanges:
+    case kPinIoctlUnpinRanges:
         events.push_back(RangesText(*static_cast<const UnpinList *>(argument)));
         break;
-    case pinIoctlUnpinAll: events.emplace_back("unpin all"); break;
+    case kPinIoctlUnpinAll: events.emplace_back("unpin all"); break;
     default: events.push_back("request " + Number(request)); break;
     }
     if (request == failingRequest) {
@@ -158,3 +160,5 @@ void FakeCacheDevice::NoteRead(int fd, long long offset, size_t bytes) {
         onRead();
     }
 }
+
+} // namespace vesk

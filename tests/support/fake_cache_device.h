@@ -2,13 +2,14 @@
 // driver's requests answered here. What happens to it is noted in order.
 //
 // One at a time: it takes FakeLibc's onIoctl and onRead for as long as it lives.
-#ifndef TESTS_SUPPORT_FAKE_CACHE_DEVICE_H
-#define TESTS_SUPPORT_FAKE_CACHE_DEVICE_H
+#pragma once
 
 #include <cstdint>
 #include <functional>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // Bytes as two hexadecimal digits each.
 std::string Hex(const std::string &bytes);
@@ -46,4 +47,4 @@ private:
     uint64_t bytes_;
 };
 
-#endif
+} // namespace vesk

@@ -22,6 +22,8 @@
 #include <filesystem>
 #include <utility>
 
+namespace vesk {
+
 namespace {
 
 constexpr unsigned kQueryAllUnpinned = 0x8004FED2;
@@ -113,3 +115,5 @@ FakeDriver::~FakeDriver() {
     int status = 0;
     EXPECT_EQ(waitpid(server_, &status, 0), server_);
 }
+
+} // namespace vesk

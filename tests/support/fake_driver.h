@@ -1,12 +1,13 @@
 // A file that answers a cache driver's pin request, or does not, for tests of those who ask it.
 //
 // Thread rule: to be used by the test's main thread; the answers come from a process of its own.
-#ifndef TESTS_SUPPORT_FAKE_DRIVER_H
-#define TESTS_SUPPORT_FAKE_DRIVER_H
+#pragma once
 
 #include <sys/types.h>
 
 #include <string>
+
+namespace vesk {
 
 class FakeDriver {
 public:
@@ -25,4 +26,4 @@ private:
     pid_t server_ = -1; // process; negative: none
 };
 
-#endif
+} // namespace vesk

@@ -14,6 +14,8 @@
 #include <sys/time.h>
 #include <sys/types.h>
 
+namespace vesk {
+
 int FakeLibc::sleeps = 0;
 int FakeLibc::alarmFactor = 1;
 int FakeLibc::pauseFactor = 1;
@@ -138,6 +140,10 @@ int FakeLibc::Calls(const std::string &function) {
 
 using sighandler = void (*)(int);
 struct msqid_ds;
+
+} // namespace vesk
+
+using namespace vesk;
 
 extern "C" {
 

@@ -3,14 +3,15 @@
 //
 // The test program defines the functions itself, so the product's code runs unchanged. Everything
 // is as in production until a test asks for something else; Reset() in SetUp and TearDown.
-#ifndef TESTS_SUPPORT_FAKE_LIBC_H
-#define TESTS_SUPPORT_FAKE_LIBC_H
+#pragma once
 
 #include <cstddef>
 #include <functional>
 #include <string>
 
 struct stat;
+
+namespace vesk {
 
 struct FakeLibc {
     static void Reset();
@@ -52,4 +53,4 @@ struct FakeLibc {
     static std::function<void(int, long long, size_t)> onRead;
 };
 
-#endif
+} // namespace vesk

@@ -2,8 +2,7 @@
 // and at the end nothing may be left: no record of the appliance's libraries, no open descriptor.
 //
 // Messages go to standard output, never to the machine's log; hold a CapturedLog to read them.
-#ifndef TESTS_SUPPORT_LEAK_CHECKED_TEST_H
-#define TESTS_SUPPORT_LEAK_CHECKED_TEST_H
+#pragma once
 
 #include "tests/support/fake_appliance.h"
 #include "tests/support/fake_libc.h"
@@ -13,6 +12,8 @@
 #include <filesystem>
 #include <gtest/gtest.h>
 #include <iterator>
+
+namespace vesk {
 
 inline long CountOpenDescriptors() {
     using Folder = std::filesystem::directory_iterator;
@@ -41,4 +42,4 @@ private:
     long descriptors_ = 0;
 };
 
-#endif
+} // namespace vesk

@@ -1,6 +1,5 @@
 // The messages that one function of the tool logged, at level 2 and above in their long form.
-#ifndef TESTS_SUPPORT_MESSAGES_OF_H
-#define TESTS_SUPPORT_MESSAGES_OF_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 
@@ -8,6 +7,8 @@
 #include <iterator>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // In order, as CapturedLog::Messages() gives them.
 inline std::vector<std::string> MessagesOf(CapturedLog &log, const std::string &function) {
@@ -21,4 +22,4 @@ inline std::vector<std::string> MessagesOf(CapturedLog &log, const std::string &
 
 using Messages = std::vector<std::string>;
 
-#endif
+} // namespace vesk

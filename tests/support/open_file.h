@@ -1,10 +1,11 @@
 // What a test can learn about a file that the code under test holds open at the moment.
-#ifndef TESTS_SUPPORT_OPEN_FILE_H
-#define TESTS_SUPPORT_OPEN_FILE_H
+#pragma once
 
 #include <fcntl.h>
 #include <filesystem>
 #include <string>
+
+namespace vesk {
 
 // The status flags (fcntl F_GETFL) of a descriptor of this process on `path`, or -1 where it holds
 // none.
@@ -18,4 +19,4 @@ inline int OpenFileFlags(const std::string &path) {
     return -1;
 }
 
-#endif
+} // namespace vesk

@@ -1,9 +1,10 @@
 // Takes root's power over file modes away for the length of a scope.
-#ifndef TESTS_SUPPORT_ORDINARY_USER_H
-#define TESTS_SUPPORT_ORDINARY_USER_H
+#pragma once
 
 #include <gtest/gtest.h>
 #include <unistd.h>
+
+namespace vesk {
 
 class OrdinaryUser {
 public:
@@ -21,4 +22,4 @@ public:
     OrdinaryUser &operator=(const OrdinaryUser &) = delete;
 };
 
-#endif
+} // namespace vesk

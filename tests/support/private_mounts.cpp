@@ -10,6 +10,8 @@
 #include <unistd.h>
 #include <utility>
 
+namespace vesk {
+
 namespace {
 
 std::string missing = "the private view of the mounts is not set up";
@@ -73,3 +75,5 @@ ScopedMount::~ScopedMount() {
         umount2(target_.c_str(), MNT_DETACH);
     }
 }
+
+} // namespace vesk

@@ -3,11 +3,12 @@
 //
 // One file of the program calls UsePrivateMounts() from a static initialiser; a test that needs the
 // private view begins with SKIP_WITHOUT_PRIVATE_MOUNTS().
-#ifndef TESTS_SUPPORT_PRIVATE_MOUNTS_H
-#define TESTS_SUPPORT_PRIVATE_MOUNTS_H
+#pragma once
 
 #include <gtest/gtest.h>
 #include <string>
+
+namespace vesk {
 
 // Sets the private view up before the program's first test. Always true.
 bool UsePrivateMounts();
@@ -44,4 +45,4 @@ private:
     bool mounted_;
 };
 
-#endif
+} // namespace vesk

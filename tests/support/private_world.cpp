@@ -12,6 +12,8 @@
 #include <sys/msg.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 std::string missing = "the private world is not set up";
@@ -27,7 +29,7 @@ bool LargeQueuesAllowed() {
     if (queueId < 0 || msgctl(queueId, IPC_STAT, &limits) < 0) {
         return false;
     }
-    limits.msg_qbytes = messageQueueBytes;
+    limits.msg_qbytes = kMessageQueueBytes;
     const bool allowed = msgctl(queueId, IPC_SET, &limits) == 0;
     return msgctl(queueId, IPC_RMID, nullptr) == 0 && allowed;
 }
@@ -47,7 +49,7 @@ std::string Enter() {
     }
     // Raising the limit of these queues alone needs no further right; where it is not to be had,
     // the right to exceed it may be. Twice the tool's limit, so that its own setting shows.
-    WriteWhole("/proc/sys/kernel/msgmnb", std::to_string(2 * messageQueueBytes));
+    WriteWhole("/proc/sys/kernel/msgmnb", std::to_string(2 * kMessageQueueBytes));
     return LargeQueuesAllowed() ? "" : Because("no message queue of 1024 requests");
 }
 
@@ -92,7 +94,7 @@ void EmptyPrivateWorld() {
     for (const int queueId : QueueIds()) {
         msgctl(queueId, IPC_RMID, nullptr);
     }
-    unlink(messageKeyFile);
+    unlink(kMessageKeyFile);
 }
 
 int CountQueues() {
@@ -130,3 +132,5 @@ std::string RecordBytes(int type, const std::string &mountPath, const std::strin
     bytes.resize(4 + 512 + 1024, '\0');
     return bytes;
 }
+
+} // namespace vesk

@@ -3,14 +3,15 @@
 //
 // One file of the program calls UsePrivateWorld() from a static initialiser; a test that needs it
 // begins with SKIP_WITHOUT_PRIVATE_WORLD().
-#ifndef TESTS_SUPPORT_PRIVATE_WORLD_H
-#define TESTS_SUPPORT_PRIVATE_WORLD_H
+#pragma once
 
 #include "request/message.h"
 
 #include <gtest/gtest.h>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // Sets it up before the program's first test. Always true.
 bool UsePrivateWorld();
@@ -49,4 +50,4 @@ bool PutMessage(int queueId, long type, const std::string &text);
 // The text of a message: a request record byte for byte.
 std::string RecordBytes(int type, const std::string &mountPath, const std::string &data = "");
 
-#endif
+} // namespace vesk

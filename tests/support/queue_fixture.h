@@ -1,6 +1,5 @@
 // What the tests of the message queue share: an empty private world and a key file of their own.
-#ifndef TESTS_SUPPORT_QUEUE_FIXTURE_H
-#define TESTS_SUPPORT_QUEUE_FIXTURE_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 #include "tests/support/fake_libc.h"
@@ -8,6 +7,8 @@
 #include "tests/support/messages_of.h"
 #include "tests/support/private_world.h"
 #include "tests/support/temp_dir.h"
+
+namespace vesk {
 
 class QueueTest : public LeakCheckedTest {
 protected:
@@ -25,4 +26,4 @@ protected:
     const std::string keyFile_ = folder_.Path("key");
 };
 
-#endif
+} // namespace vesk

@@ -5,6 +5,8 @@
 #include <cstdarg>
 #include <cstdio>
 
+namespace vesk {
+
 std::vector<SyslogRecord> &SyslogRecords() {
     static std::vector<SyslogRecord> records;
     return records;
@@ -40,3 +42,5 @@ void __syslog_chk(int priority, int /*flag*/, const char *format, ...) {
     va_end(arguments);
 }
 }
+
+} // namespace vesk

@@ -1,10 +1,11 @@
 // What the program under test sends to the system log: this test program defines the C library's
 // syslog functions itself, so nothing reaches the machine's log.
-#ifndef TESTS_SUPPORT_SYSLOG_CAPTURE_H
-#define TESTS_SUPPORT_SYSLOG_CAPTURE_H
+#pragma once
 
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 struct SyslogRecord {
     int priority;
@@ -14,4 +15,4 @@ struct SyslogRecord {
 // Everything since the last clear(), oldest first.
 std::vector<SyslogRecord> &SyslogRecords();
 
-#endif
+} // namespace vesk

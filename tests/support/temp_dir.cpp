@@ -5,6 +5,8 @@
 #include <fstream>
 #include <sstream>
 
+namespace vesk {
+
 TempDir::TempDir() : TempDir(std::filesystem::temp_directory_path().string()) {}
 
 TempDir::TempDir(const std::string &parent) : path_(parent + "/vesk-test-XXXXXX") {
@@ -32,3 +34,5 @@ std::string ReadWhole(const std::string &path) {
     content << std::ifstream(path, std::ios::binary).rdbuf();
     return content.str();
 }
+
+} // namespace vesk

@@ -1,8 +1,9 @@
 // A private folder for one test, removed with everything in it.
-#ifndef TESTS_SUPPORT_TEMP_DIR_H
-#define TESTS_SUPPORT_TEMP_DIR_H
+#pragma once
 
 #include <string>
+
+namespace vesk {
 
 class TempDir {
 public:
@@ -25,4 +26,4 @@ private:
 void WriteWhole(const std::string &path, const std::string &content);
 std::string ReadWhole(const std::string &path);
 
-#endif
+} // namespace vesk

@@ -10,6 +10,8 @@
 #include <stdexcept>
 #include <unistd.h>
 
+namespace vesk {
+
 TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
     : backingPath(folder.Path("backing.img")), ssdPath(folder.Path("ssd.img")) {
     WriteWhole(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
@@ -96,3 +98,5 @@ bool TestHasCallerMemory() {
     const Caller self = {getpid(), sizeof(void *) == 4};
     return CallerRead(self, reinterpret_cast<uintptr_t>(&there), &here, 1) == 0 && here == there;
 }
+
+} // namespace vesk

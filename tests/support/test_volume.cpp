@@ -25,6 +25,8 @@
 #include <iterator>
 #include <sstream>
 
+namespace vesk {
+
 namespace {
 
 constexpr int kNoSuchCommand = 127;
@@ -232,3 +234,5 @@ std::vector<char> TestPattern(uint64_t offset, uint64_t length) {
 }
 
 TestFolder::TestFolder() : TempDir(PrivateWorldEnter().empty() ? kWorldPath : testing::TempDir()) {}
+
+} // namespace vesk

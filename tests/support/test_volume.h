@@ -4,8 +4,7 @@
 // away, loop devices included, when the process ends in whatever way.
 //
 // Thread rule: to be used by the test's main thread.
-#ifndef TESTS_SUPPORT_TEST_VOLUME_H
-#define TESTS_SUPPORT_TEST_VOLUME_H
+#pragma once
 
 #include "base/scoped_fd.h"
 #include "tests/support/temp_dir.h"
@@ -16,6 +15,8 @@
 #include <functional>
 #include <string>
 #include <vector>
+
+namespace vesk {
 
 // Where private filesystems are mounted.
 constexpr char kWorldPath[] = "/mnt";
@@ -96,4 +97,4 @@ public:
     TestFolder();
 };
 
-#endif
+} // namespace vesk

@@ -1,11 +1,12 @@
 // What the kernel tells about a thread.
-#ifndef TESTS_SUPPORT_THREAD_STATE_H
-#define TESTS_SUPPORT_THREAD_STATE_H
+#pragma once
 
 #include <fstream>
 #include <iterator>
 #include <string>
 #include <sys/types.h>
+
+namespace vesk {
 
 // Whether this thread of this process waits for something: false while it runs, while it only waits
 // for a processor, and where there is none.
@@ -16,4 +17,4 @@ inline bool ThreadSleeps(pid_t process, pid_t thread) {
     return status.rfind(") S") != std::string::npos;
 }
 
-#endif
+} // namespace vesk

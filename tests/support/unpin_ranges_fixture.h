@@ -1,6 +1,5 @@
 // What the tests of unpinning share: the lists of ranges that the driver is sent, byte for byte.
-#ifndef TESTS_SUPPORT_UNPIN_RANGES_FIXTURE_H
-#define TESTS_SUPPORT_UNPIN_RANGES_FIXTURE_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
@@ -12,7 +11,10 @@
 #include <string>
 #include <vector>
 
-inline const char device[] = "/dev/null"; // can be opened; what it is asked is answered by the test
+namespace vesk {
+
+inline const char kDevice[] =
+    "/dev/null"; // can be opened; what it is asked is answered by the test
 
 // Range i of a list: no field of it is zero and no two are alike.
 inline UnpinInfo Range(uint64_t i) {
@@ -55,4 +57,4 @@ protected:
     int refused = 0; // the number of the request that the driver refuses; 0: none
 };
 
-#endif
+} // namespace vesk

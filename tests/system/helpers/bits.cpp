@@ -7,6 +7,8 @@
 #include <iterator>
 #include <string>
 
+using namespace vesk;
+
 int main(int argc, char *argv[]) {
     std::ifstream file(argc == 2 ? argv[1] : "", std::ios::binary);
     if (!file.is_open()) {

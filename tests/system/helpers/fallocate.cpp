@@ -11,6 +11,8 @@
 #include <cstring>
 #include <fcntl.h>
 
+using namespace vesk;
+
 int main(int argc, char *argv[]) {
     if (argc != 7) {
         fprintf(stderr, "system_fallocate: six arguments expected\n");

@@ -8,6 +8,8 @@
 #include <sstream>
 #include <unistd.h>
 
+using namespace vesk;
+
 namespace {
 
 std::string ScriptPath() {

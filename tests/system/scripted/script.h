@@ -16,8 +16,7 @@
 // Every call is written as a line to the file VESK_SCRIPT.calls.
 //
 // Thread rule: no state; the calls' file is appended to with single writes.
-#ifndef TESTS_SYSTEM_SCRIPTED_SCRIPT_H
-#define TESTS_SYSTEM_SCRIPTED_SCRIPT_H
+#pragma once
 
 #include <string>
 #include <vector>
@@ -38,5 +37,3 @@ std::string ScriptText(const ScriptLine &line, size_t index);
 
 // Records a call.
 void ScriptCall(const std::string &text);
-
-#endif

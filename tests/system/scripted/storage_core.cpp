@@ -9,6 +9,8 @@
 #include <cstring>
 #include <memory>
 
+using namespace vesk;
+
 namespace {
 
 std::atomic<unsigned> lookups{0}; // calls of GetMappingByInode so far, in this process

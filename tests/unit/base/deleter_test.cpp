@@ -6,6 +6,8 @@
 
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
 int released = 0;
@@ -32,3 +34,5 @@ TEST(DeleterTest, CostsNoMemory) {
     const MallocText text(strdup("freed; the address sanitizer tells otherwise"));
     EXPECT_NE(text, nullptr);
 }
+
+} // namespace vesk

@@ -1,11 +1,12 @@
 // Log calls of every class, each in a function that readers of the log would look for. The line of
 // the call is handed back.
-#ifndef TESTS_UNIT_BASE_LOG_CALLS_H
-#define TESTS_UNIT_BASE_LOG_CALLS_H
+#pragma once
 
 #include "base/log.h"
 
 #include <string>
+
+namespace vesk {
 
 inline std::string Line(int line) {
     return std::to_string(line);
@@ -28,4 +29,4 @@ inline int ReportDebug() {
     return __LINE__ - 1;
 }
 
-#endif
+} // namespace vesk

@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 std::vector<std::string> taken; // "class function line text"
@@ -88,3 +90,5 @@ TEST_F(LogSinkTest, NullGoesBackToStandardOutput) {
     EXPECT_EQ(taken, Taken{});
     EXPECT_EQ(log.Text(), "tool: Invalid input 7\n");
 }
+
+} // namespace vesk

@@ -8,6 +8,8 @@
 #include <cerrno>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 class LogToSystemLog : public ::testing::Test {
@@ -113,3 +115,5 @@ TEST_F(LogToSystemLog, LineFeedAtTheEndIsKept) {
     LogError("Can't open bitmap file (%s) \n", "f");
     EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + line + " Can't open bitmap file (f) \n");
 }
+
+} // namespace vesk

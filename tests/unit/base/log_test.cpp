@@ -7,21 +7,23 @@
 #include <gtest/gtest.h>
 #include <string>
 
+namespace vesk {
+
 namespace {
 
 // Taken before any test runs.
-const int initialLogToSyslog = LogToSyslog;
-const int initialLogLevel = LogLevel;
-const char *const initialProgramName = ProgramName;
+const int kInitialLogToSyslog = LogToSyslog;
+const int kInitialLogLevel = LogLevel;
+const char *const kInitialProgramName = ProgramName;
 
 class LogToStdout : public ::testing::Test {};
 
 } // namespace
 
 TEST(LogSettings, BeginWithTheSystemLogAtLevel1AndNoProgramName) {
-    EXPECT_EQ(initialLogToSyslog, 1);
-    EXPECT_EQ(initialLogLevel, 1);
-    EXPECT_EQ(initialProgramName, nullptr);
+    EXPECT_EQ(kInitialLogToSyslog, 1);
+    EXPECT_EQ(kInitialLogLevel, 1);
+    EXPECT_EQ(kInitialProgramName, nullptr);
 }
 
 TEST_F(LogToStdout, ErrorAtLevel1HasTheProgramNameAndTheText) {
@@ -173,3 +175,5 @@ TEST(GetTimeString, RepeatsTheWholeSubSecondPartInMicroseconds) {
 TEST(GetTimeString, OverwritesOneBuffer) {
     EXPECT_EQ(GetTimeString(), GetTimeString());
 }
+
+} // namespace vesk

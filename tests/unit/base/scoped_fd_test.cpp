@@ -6,6 +6,8 @@
 #include <gtest/gtest.h>
 #include <utility>
 
+namespace vesk {
+
 using ScopedFdTest = LeakCheckedTest;
 
 TEST_F(ScopedFdTest, ClosesItsDescriptorWithItsScope) {
@@ -46,3 +48,5 @@ TEST_F(ScopedFdTest, ClosesWhatItHeldWhenItIsGivenAnother) {
     EXPECT_FALSE(file.IsOpen());
     EXPECT_EQ(fcntl(number, F_GETFD), -1);
 }
+
+} // namespace vesk

@@ -6,12 +6,14 @@
 #include <random>
 #include <string>
 
+namespace vesk {
+
 namespace {
 
 using Bytes = std::vector<unsigned char>;
 
-const size_t stretchBytes = 4096; // what one step looks at, at the most
-const uint64_t stretchBits = stretchBytes * 8;
+const size_t kStretchBytes = 4096; // what one step looks at, at the most
+const uint64_t kStretchBits = kStretchBytes * 8;
 
 bool NaiveIsSet(const Bytes &bytes, uint64_t bit) {
     return bit / 8 < bytes.size() && (bytes[static_cast<size_t>(bit / 8)] & 1U << bit % 8) != 0;
@@ -79,7 +81,7 @@ void ExpectStepsFit(const Bytes &bytes) {
             break;
         }
         ASSERT_GT(scan.next, before);
-        ASSERT_LE(scan.next - before, stretchBits);
+        ASSERT_LE(scan.next - before, kStretchBits);
         for (uint64_t bit = before; bit < scan.next; ++bit) {
             ASSERT_EQ(NaiveIsSet(bytes, bit), NaiveIsSet(bytes, before)) << "not a stretch";
         }
@@ -115,7 +117,7 @@ TEST(BitRunsTest, FindsRuns) {
     EXPECT_EQ(RunsOf({0x80, 0x01}), "7+2");
     EXPECT_EQ(RunsOf({0xC0, 0xFF, 0x03, 0x00, 0x10}), "6+12 36+1");
     EXPECT_EQ(RunsOf({0x55}), "0+1 2+1 4+1 6+1");
-    EXPECT_EQ(RunsOf(Bytes(3 * stretchBytes + 5, 0xFF)), "0+" + std::to_string(98344));
+    EXPECT_EQ(RunsOf(Bytes(3 * kStretchBytes + 5, 0xFF)), "0+" + std::to_string(98344));
 }
 
 TEST(BitRunsTest, AgreesWithTheSingleBits) {
@@ -131,20 +133,20 @@ TEST(BitRunsTest, AgreesWithTheSingleBits) {
 
 TEST(BitRunsTest, StepsAreShortStretchesOfEqualBits) {
     std::mt19937 random(2);
-    for (const size_t size : {size_t{0}, size_t{1}, size_t{7}, stretchBytes - 1, stretchBytes,
-                              stretchBytes + 1, 4 * stretchBytes + 3}) {
+    for (const size_t size : {size_t{0}, size_t{1}, size_t{7}, kStretchBytes - 1, kStretchBytes,
+                              kStretchBytes + 1, 4 * kStretchBytes + 3}) {
         ExpectStepsFit(Bytes(size, 0x00));
         ExpectStepsFit(Bytes(size, 0xFF));
         ExpectStepsFit(Bytes(size, 0x18));
         for (int round = 0; round < 10; ++round) {
-            ExpectStepsFit(RandomBytes(random, size, 2 * stretchBytes));
+            ExpectStepsFit(RandomBytes(random, size, 2 * kStretchBytes));
             ExpectStepsFit(RandomBytes(random, size, 9));
         }
     }
 }
 
 TEST(BitRunsTest, AStepTakesWholeStretchesOfBytes) {
-    const Bytes bytes(8 * stretchBytes, 0xFF);
+    const Bytes bytes(8 * kStretchBytes, 0xFF);
     BitScan scan{bytes.data(), bytes.size()};
     BitRun run{0, 0};
     int steps = 0;
@@ -154,3 +156,5 @@ TEST(BitRunsTest, AStepTakesWholeStretchesOfBytes) {
     EXPECT_EQ(steps, 8);
     EXPECT_EQ(run.count, bytes.size() * 8);
 }
+
+} // namespace vesk

@@ -10,9 +10,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const bool privateMounts = UsePrivateMounts();
+const bool kPrivateMounts = UsePrivateMounts();
 
 using Messages = std::vector<std::string>;
 
@@ -257,3 +259,5 @@ TEST_F(BitmapWriteToFileTest, FileThatCannotBeOpenedIsAnError) {
         (Messages{"BitmapWriteToFile() [N]: Bytes to write = 1",
                   "BitmapWriteToFile() [N] : ***** Can't open bitmap file (/no/such/file) ", ""}));
 }
+
+} // namespace vesk

@@ -5,11 +5,13 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 using Messages = std::vector<std::string>;
 
-const std::string file = "/volume1/photo/a.jpg";
+const std::string kFile = "/volume1/photo/a.jpg";
 
 class FileMarkingTest : public LeakCheckedTest {
 protected:
@@ -24,9 +26,9 @@ protected:
         AnswerWith(
             0, {FakeExtent(0, 128, 0), FakeExtent(128, 10, 1150, 1), FakeExtent(138, 256, 384)});
     }
-    int Add() { return BitmapAddFile(&bitmap, "/volume1", file, 4711, &table); }
+    int Add() { return BitmapAddFile(&bitmap, "/volume1", kFile, 4711, &table); }
     int Unset() {
-        return UnsetBitmapAndAppendUnpinInfos(nullptr, &bitmap, "/volume1", file, 4711, &infos);
+        return UnsetBitmapAndAppendUnpinInfos(nullptr, &bitmap, "/volume1", kFile, 4711, &infos);
     }
     void ExpectBytes(unsigned char first, unsigned char second) {
         EXPECT_EQ(bytes[0], first);
@@ -193,3 +195,5 @@ TEST_F(UnsetBitmapTest, FailureHasTheErrorMarker) {
     EXPECT_EQ(LastOf(log.Messages()), "UnsetBitmapAndAppendUnpinInfos() [N] : ***** Get mapping "
                                       "table of file (/volume1/photo/a.jpg) failed");
 }
+
+} // namespace vesk

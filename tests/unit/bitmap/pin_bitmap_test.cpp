@@ -7,12 +7,14 @@
 #include <gtest/gtest.h>
 #include <random>
 
+namespace vesk {
+
 namespace {
 
 using Bytes = std::vector<unsigned char>;
 using Messages = std::vector<std::string>;
 
-const uint64_t mostSectors = UINT64_MAX;
+const uint64_t kMostSectors = UINT64_MAX;
 
 // The bitmap's bytes after the operation, which must keep to them.
 Bytes After(const Bytes &before, uint64_t startSector, uint64_t numSectors, int op) {
@@ -116,25 +118,25 @@ TEST_F(PinBitmapTest, NoSectorsFromSector0WrapToEveryBlock) {
 TEST_F(PinBitmapTest, BitsPastTheEndAreIgnoredAndThoseBeforeItApplied) {
     EXPECT_EQ(Set({0, 0}, 15 * 128, 100 * 128), (Bytes{0, 0x80}));
     EXPECT_EQ(Set({0, 0}, 16 * 128, 1), (Bytes{0, 0}));
-    EXPECT_EQ(Set({0, 0}, mostSectors, 1), (Bytes{0, 0}));
-    EXPECT_EQ(Cleared({0xFF, 0xFF}, 15 * 128, mostSectors - 15 * 128), (Bytes{0xFF, 0x7F}));
+    EXPECT_EQ(Set({0, 0}, kMostSectors, 1), (Bytes{0, 0}));
+    EXPECT_EQ(Cleared({0xFF, 0xFF}, 15 * 128, kMostSectors - 15 * 128), (Bytes{0xFF, 0x7F}));
 }
 
 TEST_F(PinBitmapTest, HugeCountsReturnAtOnce) {
     const Bytes large(1 << 20, 0);
-    EXPECT_EQ(Set(large, 0, mostSectors), Bytes(1 << 20, 0xFF));
-    EXPECT_EQ(Cleared(Bytes(1 << 20, 0xFF), 0, mostSectors), large);
+    EXPECT_EQ(Set(large, 0, kMostSectors), Bytes(1 << 20, 0xFF));
+    EXPECT_EQ(Cleared(Bytes(1 << 20, 0xFF), 0, kMostSectors), large);
     EXPECT_EQ(Set({0}, 0, 1ULL << 63), Bytes{0xFF});
 }
 
 TEST_F(PinBitmapTest, RangeWhoseEndWrapsTouchesNothing) {
-    EXPECT_EQ(Set({0, 0}, 256, mostSectors), (Bytes{0, 0}));
-    EXPECT_EQ(Set({0, 0}, mostSectors - 5, 300), (Bytes{0, 0}));
+    EXPECT_EQ(Set({0, 0}, 256, kMostSectors), (Bytes{0, 0}));
+    EXPECT_EQ(Set({0, 0}, kMostSectors - 5, 300), (Bytes{0, 0}));
 }
 
 TEST_F(PinBitmapTest, EmptyBitmapIsLeftAlone) {
     PinBitmap empty = {nullptr, 0};
-    EXPECT_EQ(BitmapSetRange(&empty, 0, mostSectors), 0);
+    EXPECT_EQ(BitmapSetRange(&empty, 0, kMostSectors), 0);
     EXPECT_EQ(BitmapUnsetRange(&empty, 0, 0), 0);
 }
 
@@ -158,8 +160,8 @@ TEST_F(PinBitmapTest, AgreesWithTheModelOnRandomRanges) {
         const uint64_t sectors = before.size() * 1024 + 1;
         // Mostly near the bitmap, at times anywhere, at times close to the 64-bit wrap.
         const uint64_t starts[] = {below(sectors), below(2 * sectors), random(),
-                                   mostSectors - below(1024)};
-        const uint64_t counts[] = {below(300), below(sectors), random(), mostSectors - below(2048),
+                                   kMostSectors - below(1024)};
+        const uint64_t counts[] = {below(300), below(sectors), random(), kMostSectors - below(2048),
                                    0};
         const uint64_t start = starts[below(4)];
         const uint64_t count = counts[below(5)];
@@ -175,7 +177,7 @@ TEST_F(PinBitmapTest, RangeIsToldAtLevel3) {
     Set({0}, 128, 256);
     EXPECT_EQ(silent.Text(), "");
     CapturedLog log(3);
-    Set({0}, mostSectors, 256);
+    Set({0}, kMostSectors, 256);
     EXPECT_EQ(log.Messages(),
               (Messages{"BitmapOperation() [N]: Disk start sector=18446744073709551615 num "
                         "sectors=256",
@@ -199,3 +201,5 @@ TEST_F(PinBitmapTest, FreeOfNullBytesIsAnErrorAndReleasesTheRecord) {
     BitmapFree(NewBitmap(nullptr, 16));
     EXPECT_EQ(log.Messages(), Messages{"BitmapFree() [N] : ***** Warning: data is NULL for free"});
 }
+
+} // namespace vesk

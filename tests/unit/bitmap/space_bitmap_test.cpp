@@ -11,6 +11,8 @@
 #include <linux/fs.h>
 #include <sys/stat.h>
 
+namespace vesk {
+
 namespace {
 
 using Messages = std::vector<std::string>;
@@ -320,3 +322,5 @@ TEST_F(SpaceBitmapTest, BitmapIsWrittenUnlessThereIsNoPathAndSent) {
     EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Write bitmap failed");
     EXPECT_EQ(sent, 3);
 }
+
+} // namespace vesk

@@ -7,6 +7,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 // Runs `daemon` in the background of a process of its own; the exit status of that process.
@@ -61,3 +63,5 @@ TEST(BackgroundTest, WithoutAParentNothingHappens) {
     BackgroundReady(background);
     EXPECT_FALSE(background.ready.IsOpen());
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 uint32_t Load(BlockCache &cache, uint64_t block) {
@@ -173,3 +175,5 @@ TEST_F(BlockCacheTest, PinnedRunsAreMergedAndAscending) {
     EXPECT_EQ(runs[2].first, 8U);
     EXPECT_EQ(runs[2].count, 2U);
 }
+
+} // namespace vesk

@@ -9,6 +9,8 @@
 #include <thread>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 // Waits, within reason, until `count` ranges are held or awaited.
@@ -98,3 +100,5 @@ TEST(BlockRangeLockTest, OneHolderPerBlockAtATime) {
     }
     EXPECT_EQ(clashes, 0);
 }
+
+} // namespace vesk

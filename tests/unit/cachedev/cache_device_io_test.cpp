@@ -21,6 +21,8 @@
 #include <thread>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 using Blocks = std::vector<uint64_t>;
@@ -305,3 +307,5 @@ TEST(CacheDeviceRandomTest, AgreesWithAPlainFile) {
         EXPECT_EQ(snapshot.counters.misses, snapshot.counters.backingReads);
     }
 }
+
+} // namespace vesk

@@ -7,6 +7,8 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 namespace {
 
 using Blocks = std::vector<uint64_t>;
@@ -179,3 +181,5 @@ TEST(CacheDeviceTailTest, ATinyDeviceHasAnEmptyBitmap) {
     EXPECT_EQ(TestRead(test.device, 0, 1000), TestBytes(0, 512));
     EXPECT_TRUE(CacheDeviceIsAllUnpinned(test.device));
 }
+
+} // namespace vesk

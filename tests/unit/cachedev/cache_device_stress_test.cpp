@@ -14,6 +14,8 @@
 #include <thread>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 constexpr size_t kBytes = kBlockBytes;
@@ -186,3 +188,5 @@ TEST(CacheDeviceStressTest, NobodySeesTornOrStaleData) {
     EXPECT_GT(snapshot.requests.refused, 0U);
     EXPECT_GT(snapshot.requests.setBitmap, 0U);
 }
+
+} // namespace vesk

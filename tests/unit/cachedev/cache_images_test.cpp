@@ -8,6 +8,8 @@
 #include <cerrno>
 #include <filesystem>
 
+namespace vesk {
+
 namespace {
 
 struct CacheImagesTest : testing::Test {
@@ -135,3 +137,5 @@ TEST_F(CacheImagesTest, SyncsSucceed) {
     EXPECT_EQ(CacheImagesSyncBacking(images), 0);
     EXPECT_EQ(CacheImagesSyncAll(images), 0);
 }
+
+} // namespace vesk

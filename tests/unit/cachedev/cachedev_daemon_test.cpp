@@ -18,6 +18,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 bool IsFolderEmpty() {
@@ -307,3 +309,5 @@ TEST(CachedevDaemonTest, OrderedFaults) {
         EXPECT_EQ(DaemonStop(), 0);
     });
 }
+
+} // namespace vesk

@@ -6,6 +6,8 @@
 #include <climits>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 struct OptionsTest : testing::Test {
@@ -129,3 +131,5 @@ TEST_F(OptionsTest, WhatIsUnknownIsNamed) {
     EXPECT_FALSE(ParseMore({"stray"}));
     EXPECT_EQ(error, "unexpected argument stray");
 }
+
+} // namespace vesk

@@ -12,6 +12,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 const Caller kSelf = {getpid(), sizeof(void *) == 4};
@@ -117,3 +119,5 @@ TEST(DescriptorDecodeTest, The32BitForm) {
     EXPECT_EQ(descriptor.address, 0xF1234567U);
     EXPECT_EQ(descriptor.length, length);
 }
+
+} // namespace vesk

@@ -6,6 +6,8 @@
 
 #include <stdexcept>
 
+namespace vesk {
+
 TEST(OpenStatesTest, AnOpenFileKeepsShowingItsMoment) {
     TestDevice test(4 * kBlockBytes, 2);
     OpenStates states;
@@ -42,3 +44,5 @@ TEST(OpenStatesTest, ShowsALengthWithoutMakingATextEachTime) {
     TestTouch(test.device, {0, 1});
     EXPECT_EQ(OpenStatesBytes(states, test.device), first);
 }
+
+} // namespace vesk

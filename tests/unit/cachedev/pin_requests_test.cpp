@@ -9,6 +9,8 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 using Blocks = std::vector<uint64_t>;
@@ -244,3 +246,5 @@ TEST_F(PinRequestsTest, CountsByKind) {
     EXPECT_EQ(counts.getSize, 1U);
     EXPECT_EQ(counts.refused, 0U);
 }
+
+} // namespace vesk

@@ -13,6 +13,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 constexpr int kFailed = 1;
@@ -85,3 +87,5 @@ void RunInPrivateWorld(const std::function<void()> &body) {
     }
     EXPECT_EQ(status, 0) << "failed in its private world, see above";
 }
+
+} // namespace vesk

@@ -4,6 +4,8 @@
 
 #include <functional>
 
+namespace vesk {
+
 // Runs `body` in a child process that is the first process of a new PID namespace. Its test
 // failures become one failure of the calling test, which is skipped when such a world cannot be
 // made (no root, no /dev/fuse, no namespaces) or when the body skips.
@@ -11,3 +13,5 @@ void RunInPrivateWorld(const std::function<void()> &body);
 
 // Ends the body of the running world as skipped, with the reason on standard output.
 [[noreturn]] void SkipWorld(const char *reason);
+
+} // namespace vesk

@@ -8,6 +8,8 @@
 #include <json/json.h>
 #include <sstream>
 
+namespace vesk {
+
 namespace {
 
 Json::Value Parse(const std::string &text) {
@@ -95,3 +97,5 @@ TEST(StateJsonTest, BigNumbersAreExact) {
     EXPECT_EQ(Text(state["slotBlocks"]), "[8589934595,-1]");
     EXPECT_EQ(state["lastUnpin"][0][0].asUInt64(), UINT64_MAX - 1);
 }
+
+} // namespace vesk

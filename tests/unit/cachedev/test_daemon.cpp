@@ -18,6 +18,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 constexpr const char *kOutput = "/run/output";
@@ -165,3 +167,5 @@ std::string TestReadAt(int fd, uint64_t offset, uint64_t size) {
     return got < 0 ? "error " + std::to_string(errno)
                    : std::string(buffer.get(), static_cast<size_t>(got));
 }
+
+} // namespace vesk

@@ -11,6 +11,8 @@
 #include <sys/types.h>
 #include <vector>
 
+namespace vesk {
+
 constexpr const char *kDaemonFolder = "/run/vesk";
 constexpr const char *kDaemonDevice = "/run/vesk/cachedev_0";
 constexpr const char *kDaemonState = "/run/vesk/cachedev_0.json";
@@ -59,3 +61,5 @@ int DaemonQuery(unsigned long number);
 
 // Reads with an aligned buffer; "error N" when that fails.
 std::string TestReadAt(int fd, uint64_t offset, uint64_t size);
+
+} // namespace vesk

@@ -17,6 +17,8 @@
 
 #include <cstdio>
 
+namespace vesk {
+
 int FakeCommands::result = 0;
 uint64_t FakeCommands::bitmapSize = 0;
 
@@ -84,3 +86,5 @@ int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
     *size = FakeCommands::bitmapSize;
     return Answer("GetBitmapSizeByte", mountPath);
 }
+
+} // namespace vesk

@@ -5,6 +5,8 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 // What CheckFilesExist says at level 1; empty: it found every file.
@@ -79,3 +81,5 @@ TEST_F(CheckFilesExistTest, LogsInItsOwnName) {
               std::vector<std::string>{"CheckFilesExist() [N] : ***** File (path /no/such) doesn't "
                                        "exist"});
 }
+
+} // namespace vesk

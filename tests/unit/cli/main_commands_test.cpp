@@ -1,6 +1,8 @@
 // What each command runs, logs and ends with.
 #include "tests/unit/cli/main_fixture.h"
 
+namespace vesk {
+
 namespace {
 
 struct CommandCase {
@@ -13,33 +15,33 @@ struct CommandCase {
 
 class MainCommandTest : public MainTest, public ::testing::WithParamInterface<CommandCase> {};
 
-const CommandCase commandCases[] = {
-    {"pinFilesOk", Arguments{"--pin-files", "/;/dev"} + mount, 0,
+const CommandCase kCommandCases[] = {
+    {"pinFilesOk", Arguments{"--pin-files", "/;/dev"} + kMount, 0,
      "tool: Send pin file request, files = /;/dev\n"
      "[PinFilesRequest /volume1 /;/dev]\n"
      "tool: Send pin file request OK\n",
      0},
-    {"pinFilesFailed", Arguments{"--pin-files", "/;/dev"} + mount, -1,
+    {"pinFilesFailed", Arguments{"--pin-files", "/;/dev"} + kMount, -1,
      "tool: Send pin file request, files = /;/dev\n"
      "[PinFilesRequest /volume1 /;/dev]\n"
      "tool: Pin files failed\n",
      255},
-    {"unpinFilesOk", Arguments{"--unpin-files", "/"} + mount, 0,
+    {"unpinFilesOk", Arguments{"--unpin-files", "/"} + kMount, 0,
      "tool: Send unpin file request, files = /\n"
      "[UnpinFilesRequest /volume1 /]\n"
      "tool: Send unpin files request OK\n",
      0},
-    {"unpinFilesFailed", Arguments{"--unpin-files", "/"} + mount, -1,
+    {"unpinFilesFailed", Arguments{"--unpin-files", "/"} + kMount, -1,
      "tool: Send unpin file request, files = /\n"
      "[UnpinFilesRequest /volume1 /]\n"
      "tool: Unpin files failed\n",
      255},
-    {"sendBitmapOk", Arguments{"--send-bitmap"} + mount, 0,
+    {"sendBitmapOk", Arguments{"--send-bitmap"} + kMount, 0,
      "tool: Start to send bitmap for volume (/volume1)\n"
      "[SendBitmap /volume1]\n"
      "tool: Send bitmap OK\n",
      0},
-    {"sendBitmapFailed", Arguments{"--send-bitmap"} + mount, -1,
+    {"sendBitmapFailed", Arguments{"--send-bitmap"} + kMount, -1,
      "tool: Start to send bitmap for volume (/volume1)\n"
      "[SendBitmap /volume1]\n"
      "tool: Send bitmap to space (/volume1) failed\n",
@@ -57,58 +59,58 @@ const CommandCase commandCases[] = {
      "[StartService c]\n"
      "tool: Can't start service\n",
      255},
-    {"handleMountOkIsSilent", Arguments{"--handle-mount", "--config-path", "c"} + mount, 0,
+    {"handleMountOkIsSilent", Arguments{"--handle-mount", "--config-path", "c"} + kMount, 0,
      "[HandleSpaceMount c /volume1]\n", 0},
     {"handleMountOkSpeaksWithVerbose",
-     Arguments{"--verbose", "--handle-mount", "--config-path", "c"} + mount, 0,
+     Arguments{"--verbose", "--handle-mount", "--config-path", "c"} + kMount, 0,
      "tool: Verbose mode is enable\n"
      "tool: main() [N] : +++++\n"
      "[HandleSpaceMount c /volume1]\n"
      "tool: main() [N]: Handle space (/volume1) mount OK\n"
      "tool: main() [N] : -----\n",
      0},
-    {"handleMountFailed", Arguments{"--handle-mount", "--config-path", "c"} + mount, -1,
+    {"handleMountFailed", Arguments{"--handle-mount", "--config-path", "c"} + kMount, -1,
      "[HandleSpaceMount c /volume1]\n"
      "tool: Handle space (/volume1) mount failed\n",
      255},
-    {"handleUmountOkIsSilent", Arguments{"--handle-umount"} + mount, 0,
+    {"handleUmountOkIsSilent", Arguments{"--handle-umount"} + kMount, 0,
      "[HandleSpaceUmount /volume1]\n", 0},
-    {"handleUmountOkSpeaksWithVerbose", Arguments{"--verbose", "--handle-umount"} + mount, 0,
+    {"handleUmountOkSpeaksWithVerbose", Arguments{"--verbose", "--handle-umount"} + kMount, 0,
      "tool: Verbose mode is enable\n"
      "tool: main() [N] : +++++\n"
      "[HandleSpaceUmount /volume1]\n"
      "tool: main() [N]: Handle space (/volume1) umount OK\n"
      "tool: main() [N] : -----\n",
      0},
-    {"handleUmountFailed", Arguments{"--handle-umount"} + mount, -1,
+    {"handleUmountFailed", Arguments{"--handle-umount"} + kMount, -1,
      "[HandleSpaceUmount /volume1]\n"
      "tool: Handle space (/volume1) umount failed\n",
      255},
-    {"checkBitmapSet", Arguments{"--check-bitmap"} + mount, 1, "[CheckBitmapSet /volume1]\nYes\n",
+    {"checkBitmapSet", Arguments{"--check-bitmap"} + kMount, 1, "[CheckBitmapSet /volume1]\nYes\n",
      0},
-    {"checkBitmapNotSet", Arguments{"--check-bitmap"} + mount, 0, "[CheckBitmapSet /volume1]\nNo\n",
-     0},
-    {"addPendingOk", Arguments{"--add-pending"} + mount, 0,
+    {"checkBitmapNotSet", Arguments{"--check-bitmap"} + kMount, 0,
+     "[CheckBitmapSet /volume1]\nNo\n", 0},
+    {"addPendingOk", Arguments{"--add-pending"} + kMount, 0,
      "[AddPendingSpaceRequest /volume1]\n"
      "tool: Set pending space OK\n",
      0},
-    {"addPendingFailed", Arguments{"--add-pending"} + mount, -1,
+    {"addPendingFailed", Arguments{"--add-pending"} + kMount, -1,
      "[AddPendingSpaceRequest /volume1]\n"
      "tool: Can't sent pending space\n",
      255},
-    {"removePendingOk", Arguments{"--remove-pending"} + mount, 0,
+    {"removePendingOk", Arguments{"--remove-pending"} + kMount, 0,
      "[RemovePendingSpaceRequest /volume1]\n"
      "tool: Set pending space OK\n",
      0},
-    {"removePendingFailed", Arguments{"--remove-pending"} + mount, -1,
+    {"removePendingFailed", Arguments{"--remove-pending"} + kMount, -1,
      "[RemovePendingSpaceRequest /volume1]\n"
      "tool: Can't sent pending space\n",
      255},
-    {"deleteBitmapOk", Arguments{"--delete-bitmap"} + mount, 0,
+    {"deleteBitmapOk", Arguments{"--delete-bitmap"} + kMount, 0,
      "[DeleteBitmap /volume1]\n"
      "tool: Delete bitmap on volume (/volume1) OK\n",
      0},
-    {"deleteBitmapFailed", Arguments{"--delete-bitmap"} + mount, -1,
+    {"deleteBitmapFailed", Arguments{"--delete-bitmap"} + kMount, -1,
      "[DeleteBitmap /volume1]\n"
      "tool: Delete bitmap on volume (/volume1) failed\n",
      255},
@@ -132,19 +134,19 @@ const CommandCase commandCases[] = {
      3,
      "[CheckFileIsPin c /]\n",
      0},
-    {"reloadOk", Arguments{"--reload-blocks"} + mount, 0,
+    {"reloadOk", Arguments{"--reload-blocks"} + kMount, 0,
      "tool: Start to send reload block request\n"
      "[ReloadPinBlocksRequest /volume1]\n"
      "tool: Send reload block request OK\n",
      0},
-    {"reloadFailed", Arguments{"--reload-blocks"} + mount, -1,
+    {"reloadFailed", Arguments{"--reload-blocks"} + kMount, -1,
      "tool: Start to send reload block request\n"
      "[ReloadPinBlocksRequest /volume1]\n"
      "tool: Reload blocks on volume (/volume1) failed\n",
      255},
-    {"unpinAllOkLogsForItself", Arguments{"--unpin-all"} + mount, 0, "[UnpinAllBlocks /volume1]\n",
+    {"unpinAllOkLogsForItself", Arguments{"--unpin-all"} + kMount, 0, "[UnpinAllBlocks /volume1]\n",
      0},
-    {"unpinAllFailedLogsForItself", Arguments{"--unpin-all"} + mount, -1,
+    {"unpinAllFailedLogsForItself", Arguments{"--unpin-all"} + kMount, -1,
      "[UnpinAllBlocks /volume1]\n", 255},
     {"setBitmapOk", Range("--set-bitmap"), 0,
      "[SetBitmap /volume1 128 18446744073709551]\n"
@@ -166,7 +168,7 @@ const CommandCase commandCases[] = {
      "tool: Unset bitmap on volume (/volume1) failed "
      "(Start sector = 128 Num of sector = 18446744073709551)\n",
      255},
-    {"getBitmapSizeFailed", Arguments{"--get-bitmap-size-byte"} + mount, -1,
+    {"getBitmapSizeFailed", Arguments{"--get-bitmap-size-byte"} + kMount, -1,
      "[GetBitmapSizeByte /volume1]\n"
      "tool: Get bitmap size for volume (/volume1) failed\n",
      255},
@@ -185,4 +187,6 @@ TEST_P(MainCommandTest, RunsItsOperation) {
     EXPECT_EQ(run.systemLog, "");
 }
 
-INSTANTIATE_TEST_SUITE_P(All, MainCommandTest, ::testing::ValuesIn(commandCases), CaseName);
+INSTANTIATE_TEST_SUITE_P(All, MainCommandTest, ::testing::ValuesIn(kCommandCases), CaseName);
+
+} // namespace vesk

@@ -1,7 +1,6 @@
 // Running the tool's main in a test: a process of its own for every run, with the operations behind
 // the commands replaced (fake_commands.h).
-#ifndef TESTS_CLI_MAIN_FIXTURE_H
-#define TESTS_CLI_MAIN_FIXTURE_H
+#pragma once
 
 #include "base/log.h"
 #include "tests/support/leak_checked_test.h"
@@ -17,13 +16,15 @@
 #include <unistd.h>
 #include <vector>
 
+namespace vesk {
+
 extern "C" int ToolMain(int argc, char *argv[]); // the tool's main
 
-const Arguments mount = {"--mount-path", "/volume1"};
+const Arguments kMount = {"--mount-path", "/volume1"};
 
 inline Arguments Range(const char *command) {
     return Arguments{command, "--start-sector", "128", "--num-sectors", "18446744073709551"} +
-           mount;
+           kMount;
 }
 
 struct Outcome {
@@ -115,4 +116,4 @@ protected:
     }
 };
 
-#endif
+} // namespace vesk

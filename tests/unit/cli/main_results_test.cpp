@@ -2,20 +2,22 @@
 // appliance answer as the test says.
 #include "tests/unit/cli/main_fixture.h"
 
+namespace vesk {
+
 TEST_F(MainTest, BitmapSizeIsANumberAndALineFeed) {
     FakeCommands::bitmapSize = 18446744073709551615ULL;
-    const Outcome run = Tool(Arguments{"--get-bitmap-size-byte"} + mount);
+    const Outcome run = Tool(Arguments{"--get-bitmap-size-byte"} + kMount);
     EXPECT_EQ(run.output, "[GetBitmapSizeByte /volume1]\n18446744073709551615\n");
     EXPECT_EQ(run.status, 0);
 }
 
 TEST_F(MainTest, SupportPinPrintsYesOrNoAndSucceeds) {
     FakeApplianceOneVolume("/dev/mapper/cachedev_0");
-    Outcome run = ToolWith(0, Arguments{"--support-pin"} + mount);
+    Outcome run = ToolWith(0, Arguments{"--support-pin"} + kMount);
     EXPECT_EQ(run.output, "Yes\n");
     EXPECT_EQ(run.status, 0);
     FakeAppliance::caches[0].supportPin = 0;
-    run = ToolWith(0, Arguments{"--support-pin"} + mount);
+    run = ToolWith(0, Arguments{"--support-pin"} + kMount);
     EXPECT_EQ(run.output, "No\n");
     EXPECT_EQ(run.status, 0);
 }
@@ -30,13 +32,13 @@ TEST_F(MainTest, SupportPinOnAPathThatIsNoVolumePrintsNoAndSucceeds) {
 
 TEST_F(MainTest, GetUuidPrintsItAndSucceeds) {
     FakeApplianceOneVolume("/dev/mapper/cachedev_0");
-    const Outcome run = ToolWith(0, Arguments{"--get-uuid"} + mount);
+    const Outcome run = ToolWith(0, Arguments{"--get-uuid"} + kMount);
     EXPECT_EQ(run.output, "uuid-1\n");
     EXPECT_EQ(run.status, 0);
 }
 
 TEST_F(MainTest, GetUuidOfNoVolumePrintsNothingAndSucceeds) {
-    const Outcome run = ToolWith(0, Arguments{"--get-uuid"} + mount);
+    const Outcome run = ToolWith(0, Arguments{"--get-uuid"} + kMount);
     EXPECT_EQ(run.output, "");
     EXPECT_EQ(run.status, 0);
 }
@@ -76,3 +78,5 @@ TEST_F(MainTest, UnpinRangeReportsTheRange) {
     ASSERT_GE(run.output.size(), last.size());
     EXPECT_EQ(run.output.substr(run.output.size() - last.size()), last);
 }
+
+} // namespace vesk

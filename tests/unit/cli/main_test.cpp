@@ -4,6 +4,8 @@
 #include "cli/usage.h"
 #include "tests/support/captured_log.h"
 
+namespace vesk {
+
 namespace {
 
 std::string UsageText() {
@@ -93,3 +95,5 @@ TEST_F(MainTest, ResultsGoToStandardOutputAlsoWhenMessagesGoToTheSystemLog) {
     EXPECT_EQ(run.output, "[CheckBitmapSet /volume1]\nYes\n");
     EXPECT_EQ(run.systemLog, "");
 }
+
+} // namespace vesk

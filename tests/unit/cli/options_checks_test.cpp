@@ -7,6 +7,8 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 class CheckParameterTest : public LeakCheckedTest {
@@ -74,11 +76,11 @@ TEST(ToolCommandToString, NamesTheCommandsInOrder) {
 }
 
 TEST(ToolCommandToString, IsShiftedByOneFromIsAllUnpinOn) {
-    EXPECT_STREQ(ToolCommandToString(commandIsAllUnpin), "setBitmap");
-    EXPECT_STREQ(ToolCommandToString(commandSetBitmap), "unsetBitmap");
-    EXPECT_STREQ(ToolCommandToString(commandUnsetBitmap), "unpinRange");
-    EXPECT_STREQ(ToolCommandToString(commandUnpinRange), "get-bitmap-size-byte");
-    EXPECT_STREQ(ToolCommandToString(commandGetBitmapSizeByte), "pin-files");
+    EXPECT_STREQ(ToolCommandToString(kCommandIsAllUnpin), "setBitmap");
+    EXPECT_STREQ(ToolCommandToString(kCommandSetBitmap), "unsetBitmap");
+    EXPECT_STREQ(ToolCommandToString(kCommandUnsetBitmap), "unpinRange");
+    EXPECT_STREQ(ToolCommandToString(kCommandUnpinRange), "get-bitmap-size-byte");
+    EXPECT_STREQ(ToolCommandToString(kCommandGetBitmapSizeByte), "pin-files");
 }
 
 TEST(StripTrailingSlash, TakesOneSlashOffTheEnd) {
@@ -94,3 +96,5 @@ TEST(StripTrailingSlash, LeavesEverythingElseAlone) {
     EXPECT_EQ(Stripped(""), "");
     StripTrailingSlash(nullptr);
 }
+
+} // namespace vesk

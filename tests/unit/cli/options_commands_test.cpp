@@ -6,12 +6,14 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
-const Arguments mount = {"--mount-path", "/volume1"};
-const Arguments config = {"--config-path", "/etc/pin.json"};
-const Arguments start = {"--start-sector", "128"};
-const Arguments count = {"--num-sectors", "256"};
+const Arguments kMount = {"--mount-path", "/volume1"};
+const Arguments kConfig = {"--config-path", "/etc/pin.json"};
+const Arguments kStart = {"--start-sector", "128"};
+const Arguments kCount = {"--num-sectors", "256"};
 
 struct CommandCase {
     const char *name;
@@ -21,45 +23,45 @@ struct CommandCase {
 
 class CommandOptionTest : public OptionsTest, public ::testing::WithParamInterface<CommandCase> {};
 
-const CommandCase commandCases[] = {
-    {"pinFiles", Arguments{"--pin-files", "/"} + mount, commandPinFiles},
-    {"unpinFiles", Arguments{"--unpin-files", "/;/dev"} + mount, commandUnpinFiles},
-    {"sendBitmap", Arguments{"--send-bitmap"} + mount, commandSendBitmap},
-    {"startService", Arguments{"--start-service"} + config, commandStartService},
-    {"handleMount", Arguments{"--handle-mount"} + mount + config, commandHandleMount},
-    {"handleUmount", Arguments{"--handle-umount"} + mount, commandHandleUmount},
-    {"supportPin", Arguments{"--support-pin"} + mount, commandSupportPin},
-    {"checkBitmap", Arguments{"--check-bitmap"} + mount, commandCheckBitmap},
-    {"addPending", Arguments{"--add-pending"} + mount, commandAddPendingSpace},
-    {"removePending", Arguments{"--remove-pending"} + mount, commandRemovePendingSpace},
-    {"getUuid", Arguments{"--get-uuid"} + mount, commandGetUUID},
-    {"deleteBitmap", Arguments{"--delete-bitmap"} + mount, commandDeleteBitmap},
-    {"checkPin", Arguments{"--check-pin", "/"} + config, commandCheckPin},
-    {"reloadBlocks", Arguments{"--reload-blocks"} + mount, commandReloadPinBlocks},
-    {"unpinAllByMountPath", Arguments{"--unpin-all"} + mount, commandUnpinAllBlocks},
-    {"unpinAllByCachePath", {"--unpin-all", "--cache-path", "/no/such"}, commandUnpinAllBlocks},
-    {"isAllUnpin", {"--is-all-unpin", "/"}, commandIsAllUnpin},
-    {"setBitmap", Arguments{"--set-bitmap"} + mount + start + count, commandSetBitmap},
-    {"unsetBitmap", Arguments{"--unset-bitmap"} + mount + start + count, commandUnsetBitmap},
-    {"unpinRange", Arguments{"--unpin-range"} + mount + start + count, commandUnpinRange},
-    {"getBitmapSize", Arguments{"--get-bitmap-size-byte"} + mount, commandGetBitmapSizeByte},
-    {"none", {}, commandInvalid},
+const CommandCase kCommandCases[] = {
+    {"pinFiles", Arguments{"--pin-files", "/"} + kMount, kCommandPinFiles},
+    {"unpinFiles", Arguments{"--unpin-files", "/;/dev"} + kMount, kCommandUnpinFiles},
+    {"sendBitmap", Arguments{"--send-bitmap"} + kMount, kCommandSendBitmap},
+    {"startService", Arguments{"--start-service"} + kConfig, kCommandStartService},
+    {"handleMount", Arguments{"--handle-mount"} + kMount + kConfig, kCommandHandleMount},
+    {"handleUmount", Arguments{"--handle-umount"} + kMount, kCommandHandleUmount},
+    {"supportPin", Arguments{"--support-pin"} + kMount, kCommandSupportPin},
+    {"checkBitmap", Arguments{"--check-bitmap"} + kMount, kCommandCheckBitmap},
+    {"addPending", Arguments{"--add-pending"} + kMount, kCommandAddPendingSpace},
+    {"removePending", Arguments{"--remove-pending"} + kMount, kCommandRemovePendingSpace},
+    {"getUuid", Arguments{"--get-uuid"} + kMount, kCommandGetUUID},
+    {"deleteBitmap", Arguments{"--delete-bitmap"} + kMount, kCommandDeleteBitmap},
+    {"checkPin", Arguments{"--check-pin", "/"} + kConfig, kCommandCheckPin},
+    {"reloadBlocks", Arguments{"--reload-blocks"} + kMount, kCommandReloadPinBlocks},
+    {"unpinAllByMountPath", Arguments{"--unpin-all"} + kMount, kCommandUnpinAllBlocks},
+    {"unpinAllByCachePath", {"--unpin-all", "--cache-path", "/no/such"}, kCommandUnpinAllBlocks},
+    {"isAllUnpin", {"--is-all-unpin", "/"}, kCommandIsAllUnpin},
+    {"setBitmap", Arguments{"--set-bitmap"} + kMount + kStart + kCount, kCommandSetBitmap},
+    {"unsetBitmap", Arguments{"--unset-bitmap"} + kMount + kStart + kCount, kCommandUnsetBitmap},
+    {"unpinRange", Arguments{"--unpin-range"} + kMount + kStart + kCount, kCommandUnpinRange},
+    {"getBitmapSize", Arguments{"--get-bitmap-size-byte"} + kMount, kCommandGetBitmapSizeByte},
+    {"none", {}, kCommandInvalid},
     // Short options that getopt_long knows, with or without a blank before the argument.
-    {"shortPinFiles", {"-a", "/", "-j/volume1"}, commandPinFiles},
-    {"shortUnpinFiles", {"-b/", "-j", "/volume1"}, commandUnpinFiles},
-    {"shortStartService", {"-cf", "c"}, commandStartService},
-    {"shortSendBitmap", {"-ij/volume1"}, commandSendBitmap},
-    {"shortSupportPin", {"-kj/volume1"}, commandSupportPin},
-    {"shortCheckBitmap", {"-mj/volume1"}, commandCheckBitmap},
-    {"shortAddPending", {"-nj/volume1"}, commandAddPendingSpace},
-    {"shortRemovePending", {"-oj/volume1"}, commandRemovePendingSpace},
-    {"shortHandleMount", {"-pj/volume1", "-fc"}, commandHandleMount},
-    {"shortHandleUmount", {"-qj/volume1"}, commandHandleUmount},
-    {"shortDeleteBitmap", {"-sj/volume1"}, commandDeleteBitmap},
-    {"shortCheckPin", {"-t/", "-fc"}, commandCheckPin},
-    {"shortReloadBlocks", {"-uj/volume1"}, commandReloadPinBlocks},
-    {"shortUnpinAll", {"-vj/volume1"}, commandUnpinAllBlocks},
-    {"shortIsAllUnpin", {"-w/"}, commandIsAllUnpin},
+    {"shortPinFiles", {"-a", "/", "-j/volume1"}, kCommandPinFiles},
+    {"shortUnpinFiles", {"-b/", "-j", "/volume1"}, kCommandUnpinFiles},
+    {"shortStartService", {"-cf", "c"}, kCommandStartService},
+    {"shortSendBitmap", {"-ij/volume1"}, kCommandSendBitmap},
+    {"shortSupportPin", {"-kj/volume1"}, kCommandSupportPin},
+    {"shortCheckBitmap", {"-mj/volume1"}, kCommandCheckBitmap},
+    {"shortAddPending", {"-nj/volume1"}, kCommandAddPendingSpace},
+    {"shortRemovePending", {"-oj/volume1"}, kCommandRemovePendingSpace},
+    {"shortHandleMount", {"-pj/volume1", "-fc"}, kCommandHandleMount},
+    {"shortHandleUmount", {"-qj/volume1"}, kCommandHandleUmount},
+    {"shortDeleteBitmap", {"-sj/volume1"}, kCommandDeleteBitmap},
+    {"shortCheckPin", {"-t/", "-fc"}, kCommandCheckPin},
+    {"shortReloadBlocks", {"-uj/volume1"}, kCommandReloadPinBlocks},
+    {"shortUnpinAll", {"-vj/volume1"}, kCommandUnpinAllBlocks},
+    {"shortIsAllUnpin", {"-w/"}, kCommandIsAllUnpin},
 };
 
 // A command option with one of the things it needs left out.
@@ -72,41 +74,41 @@ struct MissingCase {
 class MissingParameterTest : public OptionsTest,
                              public ::testing::WithParamInterface<MissingCase> {};
 
-const char noMount[] = "tool: Mount path must be set\ntool: Check parameter failed\n";
-const char noConfig[] = "tool: Config path must be set\ntool: Check parameter failed\n";
-const char noStart[] = "tool: Start sector is not set\ntool: Check parameter failed\n";
-const char noCount[] = "tool: Num of sectors is not set\ntool: Check parameter failed\n";
+const char kNoMount[] = "tool: Mount path must be set\ntool: Check parameter failed\n";
+const char kNoConfig[] = "tool: Config path must be set\ntool: Check parameter failed\n";
+const char kNoStart[] = "tool: Start sector is not set\ntool: Check parameter failed\n";
+const char kNoCount[] = "tool: Num of sectors is not set\ntool: Check parameter failed\n";
 
-const MissingCase missingCases[] = {
-    {"pinFiles", {"--pin-files", "/"}, noMount},
-    {"unpinFiles", {"--unpin-files", "/"}, noMount},
-    {"sendBitmap", {"--send-bitmap"}, noMount},
-    {"startService", {"--start-service"}, noConfig},
-    {"handleMountWithoutConfig", Arguments{"--handle-mount"} + mount, noConfig},
-    {"handleMountWithoutMount", Arguments{"--handle-mount"} + config, noMount},
-    {"handleUmount", {"--handle-umount"}, noMount},
-    {"supportPin", {"--support-pin"}, noMount},
-    {"checkBitmap", {"--check-bitmap"}, noMount},
-    {"addPending", {"--add-pending"}, noMount},
-    {"removePending", {"--remove-pending"}, noMount},
-    {"getUuid", {"--get-uuid"}, noMount},
-    {"deleteBitmap", {"--delete-bitmap"}, noMount},
-    {"checkPin", {"--check-pin", "/"}, noConfig},
-    {"reloadBlocks", {"--reload-blocks"}, noMount},
-    {"setBitmapWithoutMount", Arguments{"--set-bitmap"} + start + count, noMount},
-    {"setBitmapWithoutStart", Arguments{"--set-bitmap"} + mount + count, noStart},
-    {"setBitmapWithoutCount", Arguments{"--set-bitmap"} + mount + start, noCount},
-    {"unsetBitmapWithoutMount", Arguments{"--unset-bitmap"} + start + count, noMount},
-    {"unsetBitmapWithoutStart", Arguments{"--unset-bitmap"} + mount + count, noStart},
-    {"unsetBitmapWithoutCount", Arguments{"--unset-bitmap"} + mount + start, noCount},
-    {"unpinRangeWithoutMount", Arguments{"--unpin-range"} + start + count, noMount},
-    {"unpinRangeWithoutStart", Arguments{"--unpin-range"} + mount + count, noStart},
-    {"unpinRangeWithoutCount", Arguments{"--unpin-range"} + mount + start, noCount},
-    {"getBitmapSize", {"--get-bitmap-size-byte"}, noMount},
-    {"pinFilesThatAreMissing", Arguments{"--pin-files", "/no/such"} + mount,
+const MissingCase kMissingCases[] = {
+    {"pinFiles", {"--pin-files", "/"}, kNoMount},
+    {"unpinFiles", {"--unpin-files", "/"}, kNoMount},
+    {"sendBitmap", {"--send-bitmap"}, kNoMount},
+    {"startService", {"--start-service"}, kNoConfig},
+    {"handleMountWithoutConfig", Arguments{"--handle-mount"} + kMount, kNoConfig},
+    {"handleMountWithoutMount", Arguments{"--handle-mount"} + kConfig, kNoMount},
+    {"handleUmount", {"--handle-umount"}, kNoMount},
+    {"supportPin", {"--support-pin"}, kNoMount},
+    {"checkBitmap", {"--check-bitmap"}, kNoMount},
+    {"addPending", {"--add-pending"}, kNoMount},
+    {"removePending", {"--remove-pending"}, kNoMount},
+    {"getUuid", {"--get-uuid"}, kNoMount},
+    {"deleteBitmap", {"--delete-bitmap"}, kNoMount},
+    {"checkPin", {"--check-pin", "/"}, kNoConfig},
+    {"reloadBlocks", {"--reload-blocks"}, kNoMount},
+    {"setBitmapWithoutMount", Arguments{"--set-bitmap"} + kStart + kCount, kNoMount},
+    {"setBitmapWithoutStart", Arguments{"--set-bitmap"} + kMount + kCount, kNoStart},
+    {"setBitmapWithoutCount", Arguments{"--set-bitmap"} + kMount + kStart, kNoCount},
+    {"unsetBitmapWithoutMount", Arguments{"--unset-bitmap"} + kStart + kCount, kNoMount},
+    {"unsetBitmapWithoutStart", Arguments{"--unset-bitmap"} + kMount + kCount, kNoStart},
+    {"unsetBitmapWithoutCount", Arguments{"--unset-bitmap"} + kMount + kStart, kNoCount},
+    {"unpinRangeWithoutMount", Arguments{"--unpin-range"} + kStart + kCount, kNoMount},
+    {"unpinRangeWithoutStart", Arguments{"--unpin-range"} + kMount + kCount, kNoStart},
+    {"unpinRangeWithoutCount", Arguments{"--unpin-range"} + kMount + kStart, kNoCount},
+    {"getBitmapSize", {"--get-bitmap-size-byte"}, kNoMount},
+    {"pinFilesThatAreMissing", Arguments{"--pin-files", "/no/such"} + kMount,
      "tool: File (path /no/such) doesn't exist\n"
      "tool: Check file paths error\ntool: Check parameter failed\n"},
-    {"unpinFilesThatAreNone", Arguments{"--unpin-files", ";"} + mount,
+    {"unpinFilesThatAreNone", Arguments{"--unpin-files", ";"} + kMount,
      "tool: No availiable files in the file paths (;)\n"
      "tool: Check file paths error\ntool: Check parameter failed\n"},
     {"isAllUnpinOfNoSuchDevice",
@@ -115,9 +117,9 @@ const MissingCase missingCases[] = {
     {"unpinAllWithoutAnyPath",
      {"--unpin-all"},
      "tool: You must use --mount-path or --cache-path option!\n"},
-    {"unpinAllWithBothPaths", Arguments{"--unpin-all", "--cache-path", "/"} + mount,
+    {"unpinAllWithBothPaths", Arguments{"--unpin-all", "--cache-path", "/"} + kMount,
      "tool: Only one of --mount-path or --cache-path can be set!\n"},
-    {"checkPinOfNoSuchFile", Arguments{"--check-pin", "/no/such"} + config,
+    {"checkPinOfNoSuchFile", Arguments{"--check-pin", "/no/such"} + kConfig,
      "tool: File (/no/such) doesn't exist\n"},
     {"spaceUuidWithoutCache",
      {"--space-uuid", "uuid-9"},
@@ -137,7 +139,7 @@ TEST_P(CommandOptionTest, ChoosesTheCommandWithoutAMessage) {
     EXPECT_EQ(log.Text(), "");
 }
 
-INSTANTIATE_TEST_SUITE_P(All, CommandOptionTest, ::testing::ValuesIn(commandCases),
+INSTANTIATE_TEST_SUITE_P(All, CommandOptionTest, ::testing::ValuesIn(kCommandCases),
                          CaseName<CommandCase>);
 
 TEST_P(MissingParameterTest, FailsWithItsMessage) {
@@ -146,5 +148,7 @@ TEST_P(MissingParameterTest, FailsWithItsMessage) {
     EXPECT_EQ(log.Text(), GetParam().message);
 }
 
-INSTANTIATE_TEST_SUITE_P(All, MissingParameterTest, ::testing::ValuesIn(missingCases),
+INSTANTIATE_TEST_SUITE_P(All, MissingParameterTest, ::testing::ValuesIn(kMissingCases),
                          CaseName<MissingCase>);
+
+} // namespace vesk

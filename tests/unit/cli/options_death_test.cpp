@@ -7,6 +7,8 @@
 #include <csignal>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 using OptionsDeathTest = OptionsTest;
@@ -64,3 +66,5 @@ TEST_F(OptionsDeathTest, HelpBehindAFailedCheckIsNotReached) {
     EXPECT_EQ(Parse({"--check-pin", "/no/such", "--help"}), -1);
     EXPECT_EQ(log.Text(), "tool: File (/no/such) doesn't exist\n");
 }
+
+} // namespace vesk

@@ -1,6 +1,5 @@
 // Parsing a command line in a test: the arguments without the program's name.
-#ifndef TESTS_CLI_OPTIONS_FIXTURE_H
-#define TESTS_CLI_OPTIONS_FIXTURE_H
+#pragma once
 
 #include "tests/support/leak_checked_test.h"
 
@@ -9,6 +8,8 @@
 #include <string>
 #include <utility>
 #include <vector>
+
+namespace vesk {
 
 using Arguments = std::vector<std::string>;
 
@@ -43,4 +44,4 @@ private:
     Arguments words_;
 };
 
-#endif
+} // namespace vesk

@@ -6,11 +6,13 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
-const Arguments mount = {"--mount-path", "/volume1"};
-const Arguments start = {"--start-sector", "128"};
-const Arguments count = {"--num-sectors", "256"};
+const Arguments kMount = {"--mount-path", "/volume1"};
+const Arguments kStart = {"--start-sector", "128"};
+const Arguments kCount = {"--num-sectors", "256"};
 
 } // namespace
 
@@ -92,15 +94,15 @@ TEST_F(OptionsTest, SectorsAreDecimal) {
 
 TEST_F(OptionsTest, StartSector0IsSet) {
     CapturedLog log;
-    EXPECT_EQ(Parse(Arguments{"--set-bitmap", "--start-sector", "0"} + mount + count), 0);
+    EXPECT_EQ(Parse(Arguments{"--set-bitmap", "--start-sector", "0"} + kMount + kCount), 0);
     EXPECT_EQ(parameters.startSector, 0U);
 }
 
 TEST_F(OptionsTest, SectorMinus1CountsAsNotSet) {
     CapturedLog log;
-    EXPECT_EQ(Parse(Arguments{"--set-bitmap", "--start-sector", "-1"} + mount + count), -1);
+    EXPECT_EQ(Parse(Arguments{"--set-bitmap", "--start-sector", "-1"} + kMount + kCount), -1);
     EXPECT_TRUE(log.Has("Start sector is not set"));
-    EXPECT_EQ(Parse(Arguments{"--set-bitmap", "--num-sectors", "-1"} + mount + start), -1);
+    EXPECT_EQ(Parse(Arguments{"--set-bitmap", "--num-sectors", "-1"} + kMount + kStart), -1);
     EXPECT_TRUE(log.Has("Num of sectors is not set"));
 }
 
@@ -108,14 +110,14 @@ TEST_F(OptionsTest, LastCommandWinsButAllRequirementsStay) {
     CapturedLog log;
     const Arguments both = {"--pin-files", "a", "--start-service", "--config-path", "c"};
     EXPECT_EQ(Parse(both), -1);
-    EXPECT_EQ(parameters.command, commandStartService);
+    EXPECT_EQ(parameters.command, kCommandStartService);
     EXPECT_EQ(log.Text(), "tool: Mount path must be set\ntool: Check parameter failed\n");
-    EXPECT_EQ(Parse(both + mount), -1);
+    EXPECT_EQ(Parse(both + kMount), -1);
     EXPECT_TRUE(log.Has("File (path a) doesn't exist"));
     EXPECT_EQ(Parse({"--pin-files", "/", "--start-service", "--config-path", "c", "--mount-path",
                      "/volume1"}),
               0);
-    EXPECT_EQ(parameters.command, commandStartService);
+    EXPECT_EQ(parameters.command, kCommandStartService);
 }
 
 TEST_F(OptionsTest, LastValueOfAnOptionWins) {
@@ -126,8 +128,8 @@ TEST_F(OptionsTest, LastValueOfAnOptionWins) {
 
 TEST_F(OptionsTest, UnpinAllConflictIsOnlyCheckedForThatCommand) {
     CapturedLog log;
-    EXPECT_EQ(Parse(Arguments{"--unpin-all", "--cache-path", "/", "--support-pin"} + mount), 0);
-    EXPECT_EQ(parameters.command, commandSupportPin);
+    EXPECT_EQ(Parse(Arguments{"--unpin-all", "--cache-path", "/", "--support-pin"} + kMount), 0);
+    EXPECT_EQ(parameters.command, kCommandSupportPin);
 }
 
 TEST_F(OptionsTest, VerboseAndDebugAreFlagsWithANotice) {
@@ -168,7 +170,7 @@ TEST_F(OptionsTest, StdoutTakesEffectWhereItStands) {
 TEST_F(OptionsTest, PositionalArgumentsAreIgnored) {
     CapturedLog log;
     ASSERT_EQ(Parse({"one", "--support-pin", "two", "--mount-path", "/volume1", "three"}), 0);
-    EXPECT_EQ(parameters.command, commandSupportPin);
+    EXPECT_EQ(parameters.command, kCommandSupportPin);
     EXPECT_STREQ(parameters.mountPath, "/volume1");
     EXPECT_EQ(log.Text(), "");
 }
@@ -176,7 +178,7 @@ TEST_F(OptionsTest, PositionalArgumentsAreIgnored) {
 TEST_F(OptionsTest, OptionsBehindTwoDashesAreIgnored) {
     CapturedLog log;
     ASSERT_EQ(Parse({"--verbose", "--", "--support-pin"}), 0);
-    EXPECT_EQ(parameters.command, commandInvalid);
+    EXPECT_EQ(parameters.command, kCommandInvalid);
 }
 
 TEST_F(OptionsTest, UnknownOptionsAreComplainedAboutOnStandardErrorAndSkipped) {
@@ -187,7 +189,7 @@ TEST_F(OptionsTest, UnknownOptionsAreComplainedAboutOnStandardErrorAndSkipped) {
         ::testing::internal::CaptureStderr();
         EXPECT_EQ(Parse({unknown, "--support-pin", "--mount-path", "/volume1"}), 0);
         EXPECT_NE(::testing::internal::GetCapturedStderr().find("tool: "), std::string::npos);
-        EXPECT_EQ(parameters.command, commandSupportPin);
+        EXPECT_EQ(parameters.command, kCommandSupportPin);
         EXPECT_EQ(log.Text(), "");
     }
 }
@@ -205,7 +207,7 @@ TEST_F(OptionsTest, MissingArgumentIsNoFailureButLeavesTheParameterUnset) {
 TEST_F(OptionsTest, UniqueBeginningOfALongOptionWillDo) {
     CapturedLog log;
     ASSERT_EQ(Parse({"--support", "--mount", "/volume1"}), 0);
-    EXPECT_EQ(parameters.command, commandSupportPin);
+    EXPECT_EQ(parameters.command, kCommandSupportPin);
 }
 
 TEST_F(OptionsTest, FailedCheckEndsTheParseAtOnce) {
@@ -226,3 +228,5 @@ TEST_F(OptionsTest, LongFormNamesTheOperationAndItsFunction) {
                                         "CheckParameter() [N] : ***** Mount path must be set",
                                         "GetOptions() [N] : ***** Check parameter failed"}));
 }
+
+} // namespace vesk

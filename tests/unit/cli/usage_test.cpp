@@ -5,9 +5,11 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
-const char expectedUsage[] =
+const char kExpectedUsage[] =
     "Usage:\n"
     "\tStart service:\n"
     "\t\ttool --start-service --config-path conf_path\n"
@@ -53,7 +55,7 @@ const char expectedUsage[] =
 TEST(Usage, IsThisTextWithTheProgramNameInItsExamples) {
     CapturedLog output;
     Usage();
-    EXPECT_EQ(output.Text(), expectedUsage);
+    EXPECT_EQ(output.Text(), kExpectedUsage);
 }
 
 TEST(Usage, GoesToStandardOutputAlsoWhenMessagesGoToTheSystemLog) {
@@ -61,13 +63,13 @@ TEST(Usage, GoesToStandardOutputAlsoWhenMessagesGoToTheSystemLog) {
     LogToSyslog = 1;
     Usage();
     LogToSyslog = 0;
-    EXPECT_EQ(output.Text(), expectedUsage);
+    EXPECT_EQ(output.Text(), kExpectedUsage);
 }
 
 TEST(Usage, IsTheSameAtEveryLogLevel) {
     CapturedLog output(3);
     Usage();
-    EXPECT_EQ(output.Text(), expectedUsage);
+    EXPECT_EQ(output.Text(), kExpectedUsage);
 }
 
 TEST(Usage, PercentSignsInTheProgramNameAreText) {
@@ -77,3 +79,5 @@ TEST(Usage, PercentSignsInTheProgramNameAreText) {
     EXPECT_NE(output.Text().find("\t\t%s%n --start-service --config-path conf_path\n"),
               std::string::npos);
 }
+
+} // namespace vesk

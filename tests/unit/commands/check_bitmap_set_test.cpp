@@ -2,6 +2,8 @@
 
 #include "tests/unit/commands/commands_fixture.h"
 
+namespace vesk {
+
 class CheckBitmapSetTest : public CommandsTest {};
 
 TEST_F(CheckBitmapSetTest, CheckBitmapAnswersTheDriversState) {
@@ -55,3 +57,5 @@ TEST_F(CheckBitmapSetTest, CheckBitmapThatTheDriverRefusesIs0) {
                   "CheckBitmapSet() [N]: Bitmap set state = 0",
               }));
 }
+
+} // namespace vesk

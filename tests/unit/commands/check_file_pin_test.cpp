@@ -5,6 +5,8 @@
 
 #include <sys/stat.h>
 
+namespace vesk {
+
 class CheckFilePinTest : public CommandsTest {
 protected:
     void SetUp() override {
@@ -116,3 +118,5 @@ TEST_F(CheckFilePinTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
               "CheckFileIsPin() [N] : ***** Can't get inode number of file (" + file_ + ")");
     EXPECT_TRUE(log.Has("FileGetInodeNumber() [N] : ***** Stat file " + file_ + " error"));
 }
+
+} // namespace vesk

@@ -1,6 +1,5 @@
 // What the tests of the client commands share: a volume, and an empty private world for the queue.
-#ifndef TESTS_UNIT_COMMANDS_CLIENT_FIXTURE_H
-#define TESTS_UNIT_COMMANDS_CLIENT_FIXTURE_H
+#pragma once
 
 #include "tests/support/private_world.h"
 #include "tests/unit/commands/commands_fixture.h"
@@ -10,6 +9,8 @@
 #include "request/tool_parameters.h"
 
 #include <filesystem>
+
+namespace vesk {
 
 class ClientRequestsTest : public CommandsTest {
 protected:
@@ -30,14 +31,14 @@ protected:
     }
     // The one message that waits in the tool's queue.
     static RawMessage OnlyMessage() {
-        const int queueId = MsgQueueGet(messageKeyFile);
+        const int queueId = MsgQueueGet(kMessageKeyFile);
         EXPECT_EQ(CountMessages(queueId), 1);
         return TakeMessage(queueId);
     }
     static void ExpectUntouchedQueue() {
         EXPECT_EQ(CountQueues(), 0);
-        EXPECT_FALSE(std::filesystem::exists(messageKeyFile));
+        EXPECT_FALSE(std::filesystem::exists(kMessageKeyFile));
     }
 };
 
-#endif
+} // namespace vesk

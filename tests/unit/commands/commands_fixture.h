@@ -1,6 +1,5 @@
 // What the command tests share: one volume with its cache device and its bitmap file.
-#ifndef TESTS_COMMANDS_COMMANDS_FIXTURE_H
-#define TESTS_COMMANDS_COMMANDS_FIXTURE_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 #include "tests/support/fake_appliance.h"
@@ -13,6 +12,8 @@
 #include <filesystem>
 #include <gtest/gtest.h>
 #include <memory>
+
+namespace vesk {
 
 using Events = std::vector<std::string>;
 
@@ -32,4 +33,4 @@ protected:
     std::unique_ptr<FakeCacheDevice> device_;
 };
 
-#endif
+} // namespace vesk

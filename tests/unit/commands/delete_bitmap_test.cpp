@@ -2,6 +2,8 @@
 
 #include "tests/unit/commands/volume_events_fixture.h"
 
+namespace vesk {
+
 TEST_F(VolumeEventsTest, DeleteBitmapDeletesTheFileAndNothingElse) {
     WriteWhole(bitmapFile_, "ab");
     CapturedLog log(2);
@@ -35,3 +37,5 @@ TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {
     EXPECT_EQ(DeleteBitmap(Volume()), -1);
     EXPECT_EQ(log.Messages(), Messages{"Can't delete bitmap (" + bitmapFile_ + ")"});
 }
+
+} // namespace vesk

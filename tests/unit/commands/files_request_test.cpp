@@ -3,9 +3,11 @@
 
 #include "tests/unit/commands/client_fixture.h"
 
+namespace vesk {
+
 namespace {
 
-const bool privateWorld = UsePrivateWorld();
+const bool kPrivateWorld = UsePrivateWorld();
 
 } // namespace
 
@@ -52,7 +54,7 @@ TEST_F(ClientRequestsTest, AMountPathOf511CharactersIsTerminated) {
 }
 
 TEST_F(ClientRequestsTest, AtLevel2TheQueueIsNamed) {
-    const int queueId = MsgQueueGet(messageKeyFile);
+    const int queueId = MsgQueueGet(kMessageKeyFile);
     const ToolParameters parameters = Parameters("f");
     CapturedLog log(2);
     EXPECT_EQ(PinFilesRequest(&parameters), 0);
@@ -103,8 +105,8 @@ TEST_F(ClientRequestsTest, OtherTypesAreRefusedBeforeTheVolumeIsLookedAt) {
 }
 
 TEST_F(ClientRequestsTest, AKeyThatNamesNoQueueFailsWithItsReason) {
-    MsgQueueGet(messageKeyFile);
-    WriteWhole(messageKeyFile, "7");
+    MsgQueueGet(kMessageKeyFile);
+    WriteWhole(kMessageKeyFile, "7");
     const ToolParameters parameters = Parameters("f");
     CapturedLog log;
     EXPECT_EQ(PinFilesRequest(&parameters), -1);
@@ -115,7 +117,7 @@ TEST_F(ClientRequestsTest, AKeyThatNamesNoQueueFailsWithItsReason) {
 }
 
 TEST_F(ClientRequestsTest, AFullQueueFailsAfterThreeSeconds) {
-    const int queueId = MsgQueueGet(messageKeyFile);
+    const int queueId = MsgQueueGet(kMessageKeyFile);
     for (int i = 0; i < 1024; ++i) {
         ASSERT_TRUE(PutMessage(queueId, 1, std::string(1540, 'x')));
     }
@@ -129,3 +131,5 @@ TEST_F(ClientRequestsTest, AFullQueueFailsAfterThreeSeconds) {
     EXPECT_EQ(FakeLibc::sleeps, 3);
     EXPECT_EQ(CountMessages(queueId), 1024);
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include "tests/unit/commands/commands_fixture.h"
 
+namespace vesk {
+
 class GetBitmapSizeTest : public CommandsTest {};
 
 TEST_F(GetBitmapSizeTest, TheBitmapSizeIsThatOfTheCacheDevice) {
@@ -33,3 +35,5 @@ TEST_F(GetBitmapSizeTest, TheBitmapSizeNeedsTheDevice) {
                                   "Get bitmap size for cache (/missing/device) failed",
                               }));
 }
+
+} // namespace vesk

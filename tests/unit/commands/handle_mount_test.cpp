@@ -7,6 +7,8 @@
 #include <sstream>
 #include <sys/stat.h>
 
+namespace vesk {
+
 namespace {
 
 Json::Value Parse(const std::string &text) {
@@ -122,3 +124,5 @@ TEST_F(HandleMountTest, MountOfAnUnknownVolumeRemovesItsRecords) {
                                   recordsRemoved_,
                               }));
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include "tests/unit/commands/volume_events_fixture.h"
 
+namespace vesk {
+
 TEST_F(VolumeEventsTest, UmountChangesNothing) {
     WriteWhole(bitmapFile_, "ab");
     CapturedLog log;
@@ -22,3 +24,5 @@ TEST_F(VolumeEventsTest, UmountOfAVolumeWithoutPinningIsANotice) {
     EXPECT_EQ(MessagesOf(log, "HandleSpaceUmount"),
               Messages{"HandleSpaceUmount() [N] : Space (" + volume_ + ") doesn't support pin"});
 }
+
+} // namespace vesk

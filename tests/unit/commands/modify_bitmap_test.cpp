@@ -4,6 +4,8 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 class ModifyBitmapTest : public CommandsTest {};
 
 TEST_F(ModifyBitmapTest, SettingARangeWritesTheFileThenSendsTheBitmap) {
@@ -128,3 +130,5 @@ TEST_F(ModifyBitmapTest, ADriverThatRefusesLeavesTheFileChanged) {
               Messages{"ModifyBitmap() [N] : ***** Can't send bitmap to driver"});
     EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "0100");
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include "tests/unit/commands/client_fixture.h"
 
+namespace vesk {
+
 TEST_F(ClientRequestsTest, PendingSpaceRequestsAlwaysFailAfterThreeSeconds) {
     for (const auto &request : {AddPendingSpaceRequest, RemovePendingSpaceRequest}) {
         FakeLibc::sleeps = 0;
@@ -13,7 +15,7 @@ TEST_F(ClientRequestsTest, PendingSpaceRequestsAlwaysFailAfterThreeSeconds) {
                                   }));
         EXPECT_EQ(FakeLibc::sleeps, 3);
     }
-    const int queueId = MsgQueueGet(messageKeyFile); // made, but never sent to
+    const int queueId = MsgQueueGet(kMessageKeyFile); // made, but never sent to
     EXPECT_EQ(CountQueues(), 1);
     EXPECT_EQ(CountMessages(queueId), 0);
 }
@@ -33,8 +35,8 @@ TEST_F(ClientRequestsTest, APendingSpaceRequestShowsTheIdentifierThatItUses) {
 }
 
 TEST_F(ClientRequestsTest, APendingSpaceRequestDoesNotMindAMissingQueue) {
-    MsgQueueGet(messageKeyFile);
-    WriteWhole(messageKeyFile, "7");
+    MsgQueueGet(kMessageKeyFile);
+    WriteWhole(kMessageKeyFile, "7");
     CapturedLog log;
     EXPECT_EQ(AddPendingSpaceRequest(Volume()), -1);
     EXPECT_EQ(log.Messages(), (Messages{
@@ -53,8 +55,10 @@ TEST_F(ClientRequestsTest, OtherPendingSpaceTypesAreRefusedBehindTheVolume) {
     }
     FakeAppliance::caches.clear();
     CapturedLog log;
-    EXPECT_EQ(SetSpaceStateRequest(Volume(), requestAck), -1);
+    EXPECT_EQ(SetSpaceStateRequest(Volume(), kRequestAck), -1);
     EXPECT_EQ(log.Messages(), Messages{"Volume (" + volume_ + ") doesn't support pin"});
     EXPECT_EQ(FakeLibc::sleeps, 0);
     ExpectUntouchedQueue();
 }
+
+} // namespace vesk

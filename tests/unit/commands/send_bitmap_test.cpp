@@ -4,6 +4,8 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 class SendBitmapTest : public CommandsTest {};
 
 TEST_F(SendBitmapTest, SendBitmapSendsTheStoredBitmapAsItIs) {
@@ -133,3 +135,5 @@ TEST_F(SendBitmapTest, SendBitmapThatTheDriverRefusesFails) {
     EXPECT_EQ(MessagesOf(log, "SendBitmap"),
               Messages{"SendBitmap() [N] : ***** Can't send bitmap to driver"});
 }
+
+} // namespace vesk

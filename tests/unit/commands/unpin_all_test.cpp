@@ -4,6 +4,8 @@
 
 #include "request/tool_parameters.h"
 
+namespace vesk {
+
 class UnpinAllTest : public CommandsTest {
 protected:
     static int Unpin(const char *mountPath, const char *cachePath) {
@@ -105,3 +107,5 @@ TEST_F(UnpinAllTest, ANullPathIsAnIncorrectParameter) {
     EXPECT_EQ(log.Messages(),
               Messages{"UnpinAllBlocksByCachePath() [N] : ***** Incorrect parameter"});
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include "tests/support/unpin_ranges_fixture.h"
 
+namespace vesk {
+
 namespace {
 
 using UnpinRangeTest = UnpinRangesTest;
@@ -9,7 +11,7 @@ using UnpinRangeTest = UnpinRangesTest;
 } // namespace
 
 TEST_F(UnpinRangeTest, SendsOneRecordToTheVolumesCache) {
-    FakeApplianceOneVolume(device);
+    FakeApplianceOneVolume(kDevice);
     CapturedLog log;
     EXPECT_EQ(UnpinRange("/volume1", Range(7).startSector, Range(7).numSectors), 0);
     ASSERT_NO_FATAL_FAILURE(ExpectSent({Request(7, 8)}));
@@ -25,7 +27,7 @@ TEST_F(UnpinRangeTest, FailsWhereTheVolumeHasNoCache) {
 }
 
 TEST_F(UnpinRangeTest, FailsWhenTheDriverRefuses) {
-    FakeApplianceOneVolume(device);
+    FakeApplianceOneVolume(kDevice);
     refused = 1;
     CapturedLog log(2);
     EXPECT_EQ(UnpinRange("/volume1", 0, 1), -1);
@@ -41,3 +43,5 @@ TEST_F(UnpinRangeTest, FailureMessageHasTheErrorMarker) {
     EXPECT_EQ(UnpinRange("/volume9", 0, 1), -1);
     EXPECT_TRUE(log.Has("UnpinRange() [N] : ***** Can't get cache path of volume (/volume9)"));
 }
+
+} // namespace vesk

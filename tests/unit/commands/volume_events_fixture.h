@@ -1,10 +1,11 @@
 // What the tests of a volume's coming and going share: a configuration with records of two volumes.
-#ifndef TESTS_UNIT_COMMANDS_VOLUME_EVENTS_FIXTURE_H
-#define TESTS_UNIT_COMMANDS_VOLUME_EVENTS_FIXTURE_H
+#pragma once
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <string>
+
+namespace vesk {
 
 class VolumeEventsTest : public CommandsTest {
 protected:
@@ -22,4 +23,4 @@ protected:
     const std::string recordsRemoved_ = "Remove pin file volume (" + volume_ + ") from config file";
 };
 
-#endif
+} // namespace vesk

@@ -4,11 +4,13 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 class ConfigDocumentTest : public ConfigTest {};
 
 TEST_F(ConfigDocumentTest, DocumentedShapesAreAccepted) {
     const char *const texts[] = {
-        exampleDocument,
+        kExampleDocument,
         "null",
         "{}",
         R"({"nextRequestNum" : null, "requestQueue" : null, "requests" : null, "volumes" : null})",
@@ -68,11 +70,11 @@ TEST_F(ConfigDocumentTest, OtherShapesAreRefused) {
 }
 
 TEST_F(ConfigDocumentTest, ReadingGivesTheWholeTree) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     Json::Value root;
     CapturedLog log;
     EXPECT_EQ(ConfigReadDocument(path_.c_str(), &root), 0);
-    EXPECT_EQ(root, ParseDocument(exampleDocument));
+    EXPECT_EQ(root, ParseDocument(kExampleDocument));
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
@@ -86,7 +88,7 @@ TEST_F(ConfigDocumentTest, ReadingReportsNothingItselfAboutAShape) {
 
 namespace {
 
-const LogPlace caller{"Caller", 1};
+const LogPlace kCaller{"Caller", 1};
 
 const char *AddMember(Json::Value &root) {
     root["new"] = 1;
@@ -105,7 +107,7 @@ TEST_F(ConfigDocumentTest, AnUpdateReadsChangesAndWrites) {
     for (const MissingConfig missing :
          {MissingConfig::Created, MissingConfig::IsAnError, MissingConfig::Skipped}) {
         Store(R"({"old" : 2})");
-        EXPECT_EQ(ConfigUpdate(path_.c_str(), missing, AddMember, caller), 0);
+        EXPECT_EQ(ConfigUpdate(path_.c_str(), missing, AddMember, kCaller), 0);
         ExpectStored(R"({"old" : 2, "new" : 1})");
     }
     EXPECT_EQ(log.Messages(), Messages{});
@@ -113,12 +115,12 @@ TEST_F(ConfigDocumentTest, AnUpdateReadsChangesAndWrites) {
 
 TEST_F(ConfigDocumentTest, AnUpdateOfAMissingFileHasThreeOutcomes) {
     CapturedLog log(2);
-    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Skipped, NotReached, caller), 0);
-    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::IsAnError, NotReached, caller), -1);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Skipped, NotReached, kCaller), 0);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::IsAnError, NotReached, kCaller), -1);
     EXPECT_EQ(log.Messages(),
               (Messages{"Caller() [N]: No config file (" + path_ + "), skip it",
                         "Caller() [N] : ***** Can't find config file (" + path_ + ")"}));
-    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, AddMember, caller), 0);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, AddMember, kCaller), 0);
     ExpectStored(R"({"new" : 1})");
 }
 
@@ -130,7 +132,7 @@ TEST_F(ConfigDocumentTest, OnlyAnUpdateThatCreatesTakesAFailedLookUpForAFile) {
     for (int i = 0; i < 3; ++i) {
         FakeLibc::Fail("stat", EIO);
         CapturedLog log;
-        EXPECT_EQ(ConfigUpdate(path_.c_str(), missing[i], i == 0 ? AddMember : NotReached, caller),
+        EXPECT_EQ(ConfigUpdate(path_.c_str(), missing[i], i == 0 ? AddMember : NotReached, kCaller),
                   i == 1 ? -1 : 0);
         EXPECT_EQ(log.Messages(), expected[i]);
     }
@@ -148,8 +150,8 @@ TEST_F(ConfigDocumentTest, AnUpdateThatFailsOrChangesNothingWritesNothing) {
         root["half"] = 1;
         return "";
     };
-    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, fail, caller), -1);
-    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, leave, caller), 0);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, fail, kCaller), -1);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, leave, kCaller), 0);
     EXPECT_EQ(Stored(), "{}");
     EXPECT_EQ(MessagesOf(log, "Caller"), Messages{"Caller() [N] : ***** Can't be changed"});
 }
@@ -157,7 +159,7 @@ TEST_F(ConfigDocumentTest, AnUpdateThatFailsOrChangesNothingWritesNothing) {
 TEST_F(ConfigDocumentTest, AnUpdateOfADamagedFileKeepsIt) {
     Store("[]");
     CapturedLog log(2);
-    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, NotReached, caller), -1);
+    EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, NotReached, kCaller), -1);
     EXPECT_EQ(MessagesOf(log, "Caller"),
               Messages{"Caller() [N] : ***** Can't read data from config file (" + path_ + ")"});
     EXPECT_EQ(Stored(), "[]");
@@ -166,11 +168,13 @@ TEST_F(ConfigDocumentTest, AnUpdateOfADamagedFileKeepsIt) {
 TEST_F(ConfigDocumentTest, AFailedWriteNamesTheFileUnlessItMayHaveBeenCreated) {
     const std::string path = folder_.Path("no/such/conf.json");
     CapturedLog log(2);
-    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::Created, caller), -1);
-    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::IsAnError, caller), -1);
-    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::Skipped, caller), -1);
+    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::Created, kCaller), -1);
+    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::IsAnError, kCaller), -1);
+    EXPECT_EQ(ConfigWrite({}, path.c_str(), MissingConfig::Skipped, kCaller), -1);
     const std::string named =
         "Caller() [N] : ***** Write json data to config (" + path + ") failed";
     EXPECT_EQ(MessagesOf(log, "Caller"),
               (Messages{"Caller() [N] : ***** Can't write to files", named, named}));
 }
+
+} // namespace vesk

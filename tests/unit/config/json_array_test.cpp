@@ -2,6 +2,8 @@
 
 #include "tests/support/config_fixture.h"
 
+namespace vesk {
+
 class JsonArrayTest : public ConfigTest {};
 
 TEST_F(JsonArrayTest, HasStringFindsAnEqualElement) {
@@ -68,3 +70,5 @@ TEST_F(JsonArrayTest, RemovingTheLastElementLeavesAnEmptyValue) {
     EXPECT_EQ(JsonArrayRemoveString(array, "3"), 0);
     EXPECT_TRUE(array.isNull());
 }
+
+} // namespace vesk

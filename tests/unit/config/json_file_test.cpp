@@ -5,10 +5,12 @@
 #include <filesystem>
 #include <sys/stat.h>
 
+namespace vesk {
+
 class JsonFileTest : public ConfigTest {};
 
 TEST_F(JsonFileTest, TheExampleDocumentRoundTrips) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     Json::Value root;
     ASSERT_EQ(ReadFileToJson(path_, &root), 0);
     ASSERT_EQ(WriteJsonToFile(root, path_.c_str()), 0);
@@ -16,7 +18,7 @@ TEST_F(JsonFileTest, TheExampleDocumentRoundTrips) {
     EXPECT_EQ(written, root.toStyledString());
     Json::Value again;
     ASSERT_EQ(ReadFileToJson(path_, &again), 0);
-    EXPECT_EQ(again, ParseDocument(exampleDocument));
+    EXPECT_EQ(again, ParseDocument(kExampleDocument));
     ASSERT_EQ(WriteJsonToFile(again, path_.c_str()), 0);
     EXPECT_EQ(Stored(), written);
 }
@@ -95,7 +97,7 @@ TEST_F(JsonFileTest, WhatIsNotJsonFails) {
 }
 
 TEST_F(JsonFileTest, EveryTruncationOfADocumentFails) {
-    const std::string whole = exampleDocument;
+    const std::string whole = kExampleDocument;
     for (size_t length = 0; length < whole.size() - 1; ++length) { // the last byte is a line feed
         Store(whole.substr(0, length));
         CapturedLog log;
@@ -120,7 +122,7 @@ TEST_F(JsonFileTest, WritingCreatesAMissingFile) {
 
 TEST_F(JsonFileTest, TheTextIsTheLibrarysStyledOne) {
     for (const char *text : {"{}", "null", "[]", "{\"a\":[1,2,[3,{\"b\":\"\\u00e9\"}]],\"c\":1.5}",
-                             "// before\n{\"a\":1 // behind\n}\n", exampleDocument}) {
+                             "// before\n{\"a\":1 // behind\n}\n", kExampleDocument}) {
         WriteWhole(path_, text);
         Json::Value root;
         ASSERT_EQ(ReadFileToJson(path_, &root), 0) << text;
@@ -148,14 +150,14 @@ TEST_F(JsonFileTest, WritingOverADirectoryFails) {
 }
 
 TEST_F(JsonFileTest, AWriteThatFailsIsNotReportedAndLosesNothing) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
     FakeLibc::FailFrom("write", 28 /* ENOSPC */);
     const int result = WriteJsonToFile(Json::Value("new"), path_.c_str());
     FakeLibc::Reset();
     EXPECT_EQ(result, 0);
     EXPECT_EQ(log.Messages(), Messages{});
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
     EXPECT_EQ(std::distance(std::filesystem::directory_iterator(folder_.Path()),
                             std::filesystem::directory_iterator()),
               2); // the document and the volume's folder
@@ -187,3 +189,5 @@ TEST_F(JsonFileTest, AtLevel2BothAreTraced) {
                   "WriteJsonToFile() [N] : -----",
               }));
 }
+
+} // namespace vesk

@@ -5,6 +5,8 @@
 
 #include <sys/stat.h>
 
+namespace vesk {
+
 class PinnedFilesCycleTest : public ConfigTest {
 protected:
     int Finish(const RequestRecord &record, const std::string &num) const {
@@ -18,11 +20,11 @@ protected:
         chmod(folder_.Path().c_str(), 0755);
         chmod(path_.c_str(), 0444);
     }
-    const RequestRecord pin_ = MakeRecord(requestPinFiles, "/volume1", "share/b.bin#5678");
+    const RequestRecord pin_ = MakeRecord(kRequestPinFiles, "/volume1", "share/b.bin#5678");
 };
 
 TEST_F(PinnedFilesCycleTest, RecordsAndQueueChangeInOneWrite) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
     FakeLibc::Count("rename");
     EXPECT_EQ(Finish(pin_, "1"), 0);
@@ -51,19 +53,19 @@ TEST_F(PinnedFilesCycleTest, RecordsAndQueueChangeInOneWrite) {
 
 TEST_F(PinnedFilesCycleTest, PinAndUnpinOfTheSameFileLeaveNoVolume) {
     Store(R"({"requestQueue" : ["0", "1"], "requests" : {"0" : {}, "1" : {}}})");
-    EXPECT_EQ(Finish(MakeRecord(requestPinFiles, "/volume1", "a#1"), "0"), 0);
+    EXPECT_EQ(Finish(MakeRecord(kRequestPinFiles, "/volume1", "a#1"), "0"), 0);
     EXPECT_EQ(StoredDocument()["volumes"],
               ParseDocument(R"({"/volume1" : {"files" : {"1" : "a"}}})"));
-    EXPECT_EQ(Finish(MakeRecord(requestUnpinFiles, "/volume1", "a#1"), "1"), 0);
+    EXPECT_EQ(Finish(MakeRecord(kRequestUnpinFiles, "/volume1", "a#1"), "1"), 0);
     EXPECT_EQ(StoredDocument(),
               ParseDocument(R"({"requestQueue" : null, "requests" : {}, "volumes" : {}})"));
 }
 
 TEST_F(PinnedFilesCycleTest, AReloadOnlyLeavesTheQueue) {
-    Store(exampleDocument);
-    EXPECT_EQ(Finish(MakeRecord(requestReloadPinBlocks, "/volume1"), "2"), 0);
+    Store(kExampleDocument);
+    EXPECT_EQ(Finish(MakeRecord(kRequestReloadPinBlocks, "/volume1"), "2"), 0);
     EXPECT_EQ(StoredDocument()["requestQueue"], ParseDocument(R"(["1"])"));
-    EXPECT_EQ(StoredDocument()["volumes"], ParseDocument(exampleDocument)["volumes"]);
+    EXPECT_EQ(StoredDocument()["volumes"], ParseDocument(kExampleDocument)["volumes"]);
 }
 
 TEST_F(PinnedFilesCycleTest, WithoutAFileItFails) {
@@ -84,28 +86,28 @@ TEST_F(PinnedFilesCycleTest, WithADamagedFileItFails) {
 }
 
 TEST_F(PinnedFilesCycleTest, AListThatDoesNotParseFailsAndWritesNothing) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
-    EXPECT_EQ(Finish(MakeRecord(requestPinFiles, "/volume1", "b"), "1"), -1);
+    EXPECT_EQ(Finish(MakeRecord(kRequestPinFiles, "/volume1", "b"), "1"), -1);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Parse file inode from string (b) failed",
                                   "Can't get file infos",
                                   "Can't update pin file list",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(PinnedFilesCycleTest, ARequestThatIsNotQueuedFailsAndWritesNothing) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log(2);
     EXPECT_EQ(Finish(pin_, "7"), -1);
     EXPECT_EQ(MessagesOf(log, "ConfigUpdatedByFinishedRequest"),
               Messages{"ConfigUpdatedByFinishedRequest() [N] : ***** Can't remove request"});
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(PinnedFilesCycleTest, AFileThatCannotBeWrittenFails) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     MakeReadOnly();
     CapturedLog log;
     {
@@ -116,7 +118,7 @@ TEST_F(PinnedFilesCycleTest, AFileThatCannotBeWrittenFails) {
                                   "Can't open config file (" + path_ + ")",
                                   "Write json data to config (" + path_ + ") failed",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(PinnedFilesCycleTest, RemovingAVolumeWithoutAFileSucceedsAndCreatesNothing) {
@@ -128,17 +130,17 @@ TEST_F(PinnedFilesCycleTest, RemovingAVolumeWithoutAFileSucceedsAndCreatesNothin
 }
 
 TEST_F(PinnedFilesCycleTest, RemovingAVolumeKeepsItsQueuedRequests) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
     EXPECT_EQ(RemoveVolume(), 0);
     EXPECT_EQ(log.Messages(), Messages{"Remove pin file volume (/volume1) from config file"});
-    Json::Value expected = ParseDocument(exampleDocument);
+    Json::Value expected = ParseDocument(kExampleDocument);
     expected["volumes"] = Json::Value(Json::objectValue);
     EXPECT_EQ(StoredDocument(), expected);
 }
 
 TEST_F(PinnedFilesCycleTest, RemovingAVolumeIsANoticeAtLevel2) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log(2);
     EXPECT_EQ(RemoveVolume(), 0);
     EXPECT_EQ(MessagesOf(log, "ConfigRemovePinFileVolume"),
@@ -166,7 +168,7 @@ TEST_F(PinnedFilesCycleTest, RemovingAVolumeFromADamagedFileFails) {
 }
 
 TEST_F(PinnedFilesCycleTest, RemovingAVolumeFromAFileThatCannotBeWrittenFails) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     MakeReadOnly();
     CapturedLog log;
     {
@@ -177,5 +179,7 @@ TEST_F(PinnedFilesCycleTest, RemovingAVolumeFromAFileThatCannotBeWrittenFails) {
                                   "Can't open config file (" + path_ + ")",
                                   "Write json data to config (" + path_ + ") failed",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
+
+} // namespace vesk

@@ -2,6 +2,8 @@
 
 #include "tests/support/config_fixture.h"
 
+namespace vesk {
+
 class PinnedFilesTest : public ConfigTest {
 protected:
     static int Update(Json::Value &root, int type, const std::string &data) {
@@ -12,16 +14,16 @@ protected:
 
 TEST_F(PinnedFilesTest, PinningRecordsEachFileByItsInode) {
     Json::Value root;
-    EXPECT_EQ(Update(root, requestPinFiles, "share/a.txt#1234;b#4294967295"), 0);
+    EXPECT_EQ(Update(root, kRequestPinFiles, "share/a.txt#1234;b#4294967295"), 0);
     EXPECT_EQ(root, ParseDocument(R"({"volumes" : {"/volume1" : {"files" :
         {"1234" : "share/a.txt", "4294967295" : "b"}}}})"));
 }
 
 TEST_F(PinnedFilesTest, PinningTwiceKeepsTheFirstPath) {
     Json::Value root;
-    EXPECT_EQ(Update(root, requestPinFiles, "a#1"), 0);
+    EXPECT_EQ(Update(root, kRequestPinFiles, "a#1"), 0);
     CapturedLog log(2);
-    EXPECT_EQ(Update(root, requestPinFiles, "renamed#1;b#2"), 0);
+    EXPECT_EQ(Update(root, kRequestPinFiles, "renamed#1;b#2"), 0);
     EXPECT_EQ(root, ParseDocument(R"({"volumes" : {"/volume1" : {"files" :
         {"1" : "a", "2" : "b"}}}})"));
     EXPECT_EQ(MessagesOf(log, "JsonUpdatePinFileInfo"),
@@ -34,9 +36,9 @@ TEST_F(PinnedFilesTest, PinningTwiceKeepsTheFirstPath) {
 }
 
 TEST_F(PinnedFilesTest, UnpinningTheLastFileRemovesTheVolume) {
-    Json::Value root = ParseDocument(exampleDocument);
+    Json::Value root = ParseDocument(kExampleDocument);
     CapturedLog log(2);
-    EXPECT_EQ(Update(root, requestUnpinFiles, "share/a.txt#1234;b#2"), 0);
+    EXPECT_EQ(Update(root, kRequestUnpinFiles, "share/a.txt#1234;b#2"), 0);
     EXPECT_EQ(root["volumes"], ParseDocument("{}"));
     EXPECT_EQ(
         MessagesOf(log, "JsonUpdatePinFileInfo"),
@@ -51,14 +53,14 @@ TEST_F(PinnedFilesTest, UnpinningTheLastFileRemovesTheVolume) {
 
 TEST_F(PinnedFilesTest, UnpinningOneOfTwoKeepsTheOther) {
     Json::Value root;
-    Update(root, requestPinFiles, "a#1;b#2");
-    EXPECT_EQ(Update(root, requestUnpinFiles, "a#1"), 0);
+    Update(root, kRequestPinFiles, "a#1;b#2");
+    EXPECT_EQ(Update(root, kRequestUnpinFiles, "a#1"), 0);
     EXPECT_EQ(root, ParseDocument(R"({"volumes" : {"/volume1" : {"files" : {"2" : "b"}}}})"));
 }
 
 TEST_F(PinnedFilesTest, OtherVolumesKeepTheirRecords) {
     Json::Value root = ParseDocument(R"({"volumes" : {"/volume2" : {"files" : {"1" : "a"}}}})");
-    EXPECT_EQ(Update(root, requestUnpinFiles, "a#1"), 0);
+    EXPECT_EQ(Update(root, kRequestUnpinFiles, "a#1"), 0);
     EXPECT_EQ(root, ParseDocument(R"({"volumes" : {"/volume2" : {"files" : {"1" : "a"}}}})"));
 }
 
@@ -66,21 +68,21 @@ TEST_F(PinnedFilesTest, UnpinningOnAVolumeWithoutRecordsLeavesNone) {
     for (const char *text :
          {"null", R"({"volumes" : {}})", R"({"volumes" : {"/volume1" : null}})"}) {
         Json::Value root = ParseDocument(text);
-        EXPECT_EQ(Update(root, requestUnpinFiles, "a#1"), 0);
+        EXPECT_EQ(Update(root, kRequestUnpinFiles, "a#1"), 0);
         EXPECT_EQ(root, ParseDocument(R"({"volumes" : {}})"));
     }
 }
 
 TEST_F(PinnedFilesTest, AnEmptyPinLeavesNoVolume) {
     Json::Value root;
-    EXPECT_EQ(Update(root, requestPinFiles, ""), 0);
+    EXPECT_EQ(Update(root, kRequestPinFiles, ""), 0);
     EXPECT_EQ(root, ParseDocument(R"({"volumes" : {}})"));
 }
 
 TEST_F(PinnedFilesTest, OtherTypesChangeNothing) {
     Json::Value root;
     CapturedLog log(2);
-    EXPECT_EQ(Update(root, requestReloadPinBlocks, "x"), 0);
+    EXPECT_EQ(Update(root, kRequestReloadPinBlocks, "x"), 0);
     EXPECT_TRUE(root.isNull());
     EXPECT_EQ(MessagesOf(log, "JsonUpdatePinFileInfo"),
               (Messages{
@@ -93,7 +95,7 @@ TEST_F(PinnedFilesTest, OtherTypesChangeNothing) {
 TEST_F(PinnedFilesTest, AListThatDoesNotParseFails) {
     Json::Value root;
     CapturedLog log;
-    EXPECT_EQ(Update(root, requestPinFiles, "a#1;b"), -1);
+    EXPECT_EQ(Update(root, kRequestPinFiles, "a#1;b"), -1);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Parse file inode from string (b) failed",
                                   "Can't get file infos",
@@ -101,7 +103,7 @@ TEST_F(PinnedFilesTest, AListThatDoesNotParseFails) {
 }
 
 TEST_F(PinnedFilesTest, RemovingAVolumeAnswers2WhenItWasThere) {
-    Json::Value root = ParseDocument(exampleDocument);
+    Json::Value root = ParseDocument(kExampleDocument);
     EXPECT_EQ(JsonRemovePinFileVolume(root, "/volume1"), 2);
     EXPECT_EQ(root["volumes"], ParseDocument("{}"));
 }
@@ -111,12 +113,14 @@ TEST_F(PinnedFilesTest, RemovingAnAbsentVolumeAnswers1) {
     EXPECT_EQ(JsonRemovePinFileVolume(root, "/volume1"), 1);
     EXPECT_TRUE(root.isMember("volumes"));
     EXPECT_TRUE(root["volumes"].isNull());
-    Json::Value other = ParseDocument(exampleDocument);
+    Json::Value other = ParseDocument(kExampleDocument);
     EXPECT_EQ(JsonRemovePinFileVolume(other, "/volume"), 1);
-    EXPECT_EQ(other, ParseDocument(exampleDocument));
+    EXPECT_EQ(other, ParseDocument(kExampleDocument));
 }
 
 TEST_F(PinnedFilesTest, ANullVolumeCountsAsAbsent) {
     Json::Value root = ParseDocument(R"({"volumes" : {"/volume1" : null}})");
     EXPECT_EQ(JsonRemovePinFileVolume(root, "/volume1"), 1);
 }
+
+} // namespace vesk

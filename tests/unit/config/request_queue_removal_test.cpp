@@ -4,14 +4,16 @@
 
 #include <sys/stat.h>
 
+namespace vesk {
+
 class RequestRemovalTest : public ConfigTest {};
 
 TEST_F(RequestRemovalTest, RemovingTakesQueueEntryAndRequest) {
-    Json::Value root = ParseDocument(exampleDocument);
+    Json::Value root = ParseDocument(kExampleDocument);
     CapturedLog log(2);
     EXPECT_EQ(JsonRemoveRequest(root, "1"), 0);
     EXPECT_EQ(log.Messages(), Messages{"JsonRemoveRequest() [N]: Remove request num = 1"});
-    Json::Value expected = ParseDocument(exampleDocument);
+    Json::Value expected = ParseDocument(kExampleDocument);
     expected["requestQueue"] = ParseDocument(R"(["2"])");
     expected["requests"].removeMember("1");
     EXPECT_EQ(root, expected);
@@ -62,11 +64,11 @@ TEST_F(RequestRemovalTest, RemovingANullRequestFails) {
 TEST_F(RequestRemovalTest, CountingGivesTheDocumentAndTheQueuesLength) {
     Json::Value root;
     int count = -1;
-    Store(exampleDocument);
+    Store(kExampleDocument);
     const ServiceLockGuard lock;
     EXPECT_EQ(ConfigGetJsonAndNumRequest(path_.c_str(), &root, &count), 0);
     EXPECT_EQ(count, 2);
-    EXPECT_EQ(root, ParseDocument(exampleDocument));
+    EXPECT_EQ(root, ParseDocument(kExampleDocument));
     Store("{}");
     EXPECT_EQ(ConfigGetJsonAndNumRequest(path_.c_str(), &root, &count), 0);
     EXPECT_EQ(count, 0);
@@ -75,7 +77,7 @@ TEST_F(RequestRemovalTest, CountingGivesTheDocumentAndTheQueuesLength) {
 }
 
 TEST_F(RequestRemovalTest, DroppingARequestRewritesTheFile) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
     EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "2"), 0);
     EXPECT_EQ(log.Messages(), Messages{});
@@ -104,7 +106,7 @@ TEST_F(RequestRemovalTest, DroppingTheLastRequestLeavesANullQueueThatTakesTheNex
     ASSERT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "4"), 0);
     EXPECT_EQ(StoredDocument(),
               ParseDocument(R"({"nextRequestNum" : 5, "requestQueue" : null, "requests" : {}})"));
-    const RequestRecord reload = MakeRecord(requestReloadPinBlocks, "/volume1");
+    const RequestRecord reload = MakeRecord(kRequestReloadPinBlocks, "/volume1");
     EXPECT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
     EXPECT_EQ(StoredDocument()["requestQueue"], ParseDocument(R"(["5"])"));
 }
@@ -129,7 +131,7 @@ TEST_F(RequestRemovalTest, DroppingFromADamagedFileFails) {
 }
 
 TEST_F(RequestRemovalTest, DroppingAnUnknownRequestFailsAndWritesNothing) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
     EXPECT_EQ(ConfigDropErrorRequest(path_.c_str(), nullptr, "7"), -1);
     EXPECT_EQ(log.Messages(), (Messages{
@@ -137,11 +139,11 @@ TEST_F(RequestRemovalTest, DroppingAnUnknownRequestFailsAndWritesNothing) {
                                   "Can't remove request num (7) from request queue",
                                   "Can't remove request",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(RequestRemovalTest, DroppingFromAFileThatCannotBeWrittenFails) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     chmod(folder_.Path().c_str(), 0755);
     chmod(path_.c_str(), 0444);
     CapturedLog log;
@@ -153,5 +155,7 @@ TEST_F(RequestRemovalTest, DroppingFromAFileThatCannotBeWrittenFails) {
                                   "Can't open config file (" + path_ + ")",
                                   "Write json data to config (" + path_ + ") failed",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
+
+} // namespace vesk

@@ -4,10 +4,12 @@
 
 #include <sys/stat.h>
 
+namespace vesk {
+
 class RequestQueueTest : public ConfigTest {
 protected:
     int Add(const RequestRecord &record) const { return ConfigAddRequest(path_.c_str(), &record); }
-    int AddReload() const { return Add(MakeRecord(requestReloadPinBlocks, "/volume1")); }
+    int AddReload() const { return Add(MakeRecord(kRequestReloadPinBlocks, "/volume1")); }
 };
 
 TEST_F(RequestQueueTest, TheFirstRequestCreatesTheFileWithNumber0) {
@@ -40,11 +42,12 @@ TEST_F(RequestQueueTest, AnEmptyObjectAndNullMembersCountAsAMissingFile) {
 }
 
 TEST_F(RequestQueueTest, APinRequestStoresItsFileInodeList) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     const std::string a = CreateFile("share/a");
     const std::string b = CreateFile("b");
-    EXPECT_EQ(Add(MakeRecord(requestPinFiles, volume_, volume_ + "/share/a;" + volume_ + "/b")), 0);
-    Json::Value expected = ParseDocument(exampleDocument);
+    EXPECT_EQ(Add(MakeRecord(kRequestPinFiles, volume_, volume_ + "/share/a;" + volume_ + "/b")),
+              0);
+    Json::Value expected = ParseDocument(kExampleDocument);
     expected["nextRequestNum"] = 4;
     expected["requestQueue"].append("3");
     expected["requests"]["3"]["type"] = "pinFiles";
@@ -55,7 +58,7 @@ TEST_F(RequestQueueTest, APinRequestStoresItsFileInodeList) {
 
 TEST_F(RequestQueueTest, AnUnpinRequestStoresItsFileInodeList) {
     const std::string a = CreateFile("a");
-    EXPECT_EQ(Add(MakeRecord(requestUnpinFiles, volume_, volume_ + "/a")), 0);
+    EXPECT_EQ(Add(MakeRecord(kRequestUnpinFiles, volume_, volume_ + "/a")), 0);
     EXPECT_EQ(StoredDocument()["requests"]["0"]["data"], Json::Value("a#" + a));
 }
 
@@ -107,35 +110,35 @@ TEST_F(RequestQueueTest, ANumberThatIsQueuedAlreadyIsAcceptedAgain) {
 }
 
 TEST_F(RequestQueueTest, AFileThatDoesNotExistRefusesTheRequest) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
-    EXPECT_EQ(Add(MakeRecord(requestPinFiles, volume_, volume_ + "/missing")), -1);
+    EXPECT_EQ(Add(MakeRecord(kRequestPinFiles, volume_, volume_ + "/missing")), -1);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Stat file " + volume_ + "/missing error",
                                   "Cant' get inode number of file (" + volume_ + "/missing)",
                                   "Get relative paths failed",
                                   "Can't add request to json",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(RequestQueueTest, ARefusedFirstRequestCreatesNoFile) {
     CapturedLog log;
-    EXPECT_EQ(Add(MakeRecord(requestUnpinFiles, volume_, "/elsewhere/a")), -1);
+    EXPECT_EQ(Add(MakeRecord(kRequestUnpinFiles, volume_, "/elsewhere/a")), -1);
     EXPECT_EQ(Stored(), "");
     EXPECT_TRUE(log.Has("Get relative paths failed"));
 }
 
 TEST_F(RequestQueueTest, ATypeWithoutANameCannotBeAdded) {
     for (const int type : {7, -1, 2147483647}) {
-        Store(exampleDocument);
+        Store(kExampleDocument);
         CapturedLog log;
         EXPECT_EQ(Add(MakeRecord(type, "/volume1")), -1);
         EXPECT_EQ(log.Messages(), (Messages{
                                       "Convert request type to string errror",
                                       "Can't add request to json",
                                   }));
-        EXPECT_EQ(Stored(), exampleDocument);
+        EXPECT_EQ(Stored(), kExampleDocument);
     }
 }
 
@@ -150,14 +153,14 @@ TEST_F(RequestQueueTest, AnUnreadableFileRefusesTheRequest) {
 }
 
 TEST_F(RequestQueueTest, AFileThatCannotBeLookedUpIsNotTakenForAMissingOne) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     FakeLibc::Fail("stat", EIO);
     EXPECT_EQ(AddReload(), 0);
-    EXPECT_EQ(StoredDocument()["volumes"], ParseDocument(exampleDocument)["volumes"]);
+    EXPECT_EQ(StoredDocument()["volumes"], ParseDocument(kExampleDocument)["volumes"]);
 }
 
 TEST_F(RequestQueueTest, AFileThatCannotBeWrittenRefusesTheRequest) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     chmod(folder_.Path().c_str(), 0755);
     chmod(path_.c_str(), 0444);
     CapturedLog log;
@@ -169,7 +172,7 @@ TEST_F(RequestQueueTest, AFileThatCannotBeWrittenRefusesTheRequest) {
                                   "Can't open config file (" + path_ + ")",
                                   "Can't write to files",
                               }));
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(RequestQueueTest, AtLevel2TheDocumentIsLogged) {
@@ -183,9 +186,11 @@ TEST_F(RequestQueueTest, AtLevel2TheDocumentIsLogged) {
 
 TEST_F(RequestQueueTest, AtLevel2FailuresNameTheirFunctions) {
     CapturedLog log(2);
-    EXPECT_EQ(Add(MakeRecord(requestPinFiles, volume_, "/elsewhere/a")), -1);
+    EXPECT_EQ(Add(MakeRecord(kRequestPinFiles, volume_, "/elsewhere/a")), -1);
     EXPECT_EQ(MessagesOf(log, "JsonAddRequest"),
               Messages{"JsonAddRequest() [N] : ***** Get relative paths failed"});
     EXPECT_EQ(MessagesOf(log, "ConfigAddRequest"),
               Messages{"ConfigAddRequest() [N] : ***** Can't add request to json"});
 }
+
+} // namespace vesk

@@ -6,11 +6,13 @@
 #include <cstring>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 using Messages = std::vector<std::string>;
 
-const char device[] = "/dev/null"; // can be opened; what it is asked is answered by the test
+const char kDevice[] = "/dev/null"; // can be opened; what it is asked is answered by the test
 
 class BitmapControlTest : public LeakCheckedTest {
 protected:
@@ -43,7 +45,7 @@ TEST_F(BitmapControlTest, SendHandsOverTheRecordItself) {
         EXPECT_EQ(data, &bitmap);
         return 0;
     };
-    EXPECT_EQ(BitmapSendToDriver(&bitmap, device), 0);
+    EXPECT_EQ(BitmapSendToDriver(&bitmap, kDevice), 0);
     EXPECT_EQ(calls, 1);
     EXPECT_EQ(log.Text(), "");
 }
@@ -59,13 +61,13 @@ TEST_F(BitmapControlTest, DescriptorIsTheBytesAddressAndTheirCount) {
         EXPECT_EQ(length, 4U);
         return 0;
     };
-    EXPECT_EQ(BitmapSendToDriver(&bitmap, device), 0);
+    EXPECT_EQ(BitmapSendToDriver(&bitmap, kDevice), 0);
 }
 
 TEST_F(BitmapControlTest, SendRefusesMissingArguments) {
     ExpectNoRequest();
     CapturedLog log(2);
-    EXPECT_EQ(BitmapSendToDriver(nullptr, device), -1);
+    EXPECT_EQ(BitmapSendToDriver(nullptr, kDevice), -1);
     EXPECT_EQ(BitmapSendToDriver(&bitmap, nullptr), -1);
     const Messages once = {"BitmapSendToDriver() [N] : +++++",
                            "BitmapSendToDriver() [N] : ***** Incorrect parameter",
@@ -78,7 +80,7 @@ TEST_F(BitmapControlTest, SendRefusesMissingArguments) {
 TEST_F(BitmapControlTest, SendFailsWhenTheDriverRefuses) {
     Refuse();
     CapturedLog log;
-    EXPECT_EQ(BitmapSendToDriver(&bitmap, device), -1);
+    EXPECT_EQ(BitmapSendToDriver(&bitmap, kDevice), -1);
     char expected[200];
     snprintf(expected, sizeof(expected),
              "Ioctl Error: Send ioctl 65231 Data (%p) size (8) to /dev/null, ret=-1",
@@ -89,7 +91,7 @@ TEST_F(BitmapControlTest, SendFailsWhenTheDriverRefuses) {
 TEST_F(BitmapControlTest, SendIsTracedAtLevel2) {
     FakeLibc::onIoctl = [](unsigned long, void *) { return 0; };
     CapturedLog log(2);
-    EXPECT_EQ(BitmapSendToDriver(&bitmap, device), 0);
+    EXPECT_EQ(BitmapSendToDriver(&bitmap, kDevice), 0);
     EXPECT_EQ(log.Messages(),
               (Messages{"BitmapSendToDriver() [N] : +++++", "DoIoctl() [N] : +++++",
                         "DoIoctl() [N] : -----", "BitmapSendToDriver() [N] : -----"}));
@@ -100,7 +102,7 @@ TEST_F(BitmapControlTest, IsSetGivesTheDriversWord) {
         Answer(0x8004FECF, word);
         CapturedLog log;
         int isSet = 9;
-        EXPECT_EQ(BitmapIsSet(device, &isSet), 0);
+        EXPECT_EQ(BitmapIsSet(kDevice, &isSet), 0);
         EXPECT_EQ(isSet, word);
         EXPECT_EQ(log.Text(), "");
     }
@@ -110,7 +112,7 @@ TEST_F(BitmapControlTest, IsSetTellsTheWordAtLevel2WithoutATraceOfItsOwn) {
     Answer(0x8004FECF, 1);
     CapturedLog log(2);
     int isSet = 0;
-    EXPECT_EQ(BitmapIsSet(device, &isSet), 0);
+    EXPECT_EQ(BitmapIsSet(kDevice, &isSet), 0);
     EXPECT_EQ(log.Messages(), (Messages{"DoIoctl() [N] : +++++", "DoIoctl() [N] : -----",
                                         "BitmapIsSet() [N]: Bitmap is set = 1"}));
 }
@@ -119,7 +121,7 @@ TEST_F(BitmapControlTest, IsSetFailsWhenTheDriverRefuses) {
     Refuse();
     CapturedLog log(2);
     int isSet = 0;
-    EXPECT_EQ(BitmapIsSet(device, &isSet), -1);
+    EXPECT_EQ(BitmapIsSet(kDevice, &isSet), -1);
     char expected[200];
     snprintf(expected, sizeof(expected),
              "DoIoctl() [N] : ***** Ioctl Error: Send ioctl -2147156273 Data (%p) size (4) to "
@@ -143,7 +145,7 @@ TEST_F(BitmapControlTest, AllUnpinnedGivesTheDriversWord) {
         Answer(0x8004FED2, word, word); // an answer above 0 is success, too
         CapturedLog log;
         int allUnpinned = 9;
-        EXPECT_EQ(isAllBlocksUnpin(device, &allUnpinned), 0);
+        EXPECT_EQ(isAllBlocksUnpin(kDevice, &allUnpinned), 0);
         EXPECT_EQ(allUnpinned, word);
         EXPECT_EQ(log.Text(), "");
     }
@@ -153,7 +155,7 @@ TEST_F(BitmapControlTest, AllUnpinnedTellsPathAndWordAtLevel2) {
     Answer(0x8004FED2, 1);
     CapturedLog log(2);
     int allUnpinned = 0;
-    EXPECT_EQ(isAllBlocksUnpin(device, &allUnpinned), 0);
+    EXPECT_EQ(isAllBlocksUnpin(kDevice, &allUnpinned), 0);
     EXPECT_EQ(log.Messages(),
               (Messages{"isAllBlocksUnpin() [N] : +++++",
                         "isAllBlocksUnpin() [N]: Cache path = /dev/null", "DoIoctl() [N] : +++++",
@@ -165,8 +167,10 @@ TEST_F(BitmapControlTest, AllUnpinnedFailsWhenTheDriverRefuses) {
     Refuse();
     CapturedLog log(2);
     int allUnpinned = 0;
-    EXPECT_EQ(isAllBlocksUnpin(device, &allUnpinned), -1);
+    EXPECT_EQ(isAllBlocksUnpin(kDevice, &allUnpinned), -1);
     const Messages messages = log.Messages();
     EXPECT_EQ(messages.at(messages.size() - 2), "isAllBlocksUnpin() [N] : ***** Ioctl error");
     EXPECT_EQ(LastOf(messages), "isAllBlocksUnpin() [N] : -----");
 }
+
+} // namespace vesk

@@ -8,6 +8,8 @@
 #include <cerrno>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 std::string Address(const void *data) {
@@ -144,3 +146,5 @@ TEST_F(DoIoctlTest, CallersFailureIsLoggedAtItsPlaceBehindItsCause) {
     EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** No answer");
     EXPECT_EQ(log.Count("DoIoctl() [N] : -----"), 2);
 }
+
+} // namespace vesk

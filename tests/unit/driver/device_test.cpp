@@ -8,6 +8,8 @@
 #include <gtest/gtest.h>
 #include <linux/fs.h>
 
+namespace vesk {
+
 namespace {
 
 class DeviceGetSizeByteTest : public LeakCheckedTest {
@@ -73,3 +75,5 @@ TEST_F(DeviceGetSizeByteTest, LogsInItsOwnName) {
     EXPECT_EQ(DeviceGetSizeByte("/no/such", &size), -1);
     EXPECT_TRUE(log.Has("DeviceGetSizeByte() [N] : ***** Can't open device (/no/such)"));
 }
+
+} // namespace vesk

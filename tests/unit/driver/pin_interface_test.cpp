@@ -3,12 +3,14 @@
 #include <cstring>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 TEST(PinInterface, RequestNumbersAreTheDrivers) {
-    EXPECT_EQ(pinIoctlSetBitmap, 65231U);
-    EXPECT_EQ(pinIoctlQueryBitmapSet, 2147811023U);
-    EXPECT_EQ(pinIoctlUnpinRanges, 65232U);
-    EXPECT_EQ(pinIoctlUnpinAll, 65233U);
-    EXPECT_EQ(pinIoctlQueryAllUnpinned, 2147811026U);
+    EXPECT_EQ(kPinIoctlSetBitmap, 65231U);
+    EXPECT_EQ(kPinIoctlQueryBitmapSet, 2147811023U);
+    EXPECT_EQ(kPinIoctlUnpinRanges, 65232U);
+    EXPECT_EQ(kPinIoctlUnpinAll, 65233U);
+    EXPECT_EQ(kPinIoctlQueryAllUnpinned, 2147811026U);
 }
 
 TEST(PinInterface, RangeRecordIsStartThenCountInLittleEndian) {
@@ -25,3 +27,5 @@ TEST(PinInterface, RangeListIs1024RecordsIn16384Bytes) {
     const auto *bytes = reinterpret_cast<const char *>(&list);
     EXPECT_EQ(reinterpret_cast<const char *>(&list.ranges[1023]) - bytes, 16368);
 }
+
+} // namespace vesk

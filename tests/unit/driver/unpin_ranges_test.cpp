@@ -2,6 +2,8 @@
 
 #include "tests/support/unpin_ranges_fixture.h"
 
+namespace vesk {
+
 namespace {
 
 using SendUnpinInfoToDriverTest = UnpinRangesTest;
@@ -11,7 +13,7 @@ int Send(uint64_t count) {
     for (uint64_t i = 0; i < count; ++i) {
         ranges.push_back(Range(i));
     }
-    return SendUnpinInfoToDriver(device, ranges);
+    return SendUnpinInfoToDriver(kDevice, ranges);
 }
 
 } // namespace
@@ -25,7 +27,7 @@ TEST_F(SendUnpinInfoToDriverTest, SendsNothingForAnEmptyList) {
 
 TEST_F(SendUnpinInfoToDriverTest, FirstRecordIsTheseBytes) {
     CapturedLog log;
-    EXPECT_EQ(SendUnpinInfoToDriver(device, {{0x1122334455667788, 0x80}}), 0);
+    EXPECT_EQ(SendUnpinInfoToDriver(kDevice, {{0x1122334455667788, 0x80}}), 0);
     ASSERT_EQ(sent.size(), 1U);
     const char record[] = "\x88\x77\x66\x55\x44\x33\x22\x11\x80\0\0\0\0\0\0";
     EXPECT_EQ(sent[0].substr(0, 16), std::string(record, 16));
@@ -81,7 +83,7 @@ TEST_F(SendUnpinInfoToDriverTest, DropsEvery1025thRange) {
 
 TEST_F(SendUnpinInfoToDriverTest, RangesOfZerosAreSentAsTheyAre) {
     CapturedLog log;
-    EXPECT_EQ(SendUnpinInfoToDriver(device, {{0, 0}, {5, 0}}), 0);
+    EXPECT_EQ(SendUnpinInfoToDriver(kDevice, {{0, 0}, {5, 0}}), 0);
     ASSERT_EQ(sent.size(), 1U);
     std::string expected(16384, '\0');
     expected[16] = 5;
@@ -109,7 +111,7 @@ TEST_F(SendUnpinInfoToDriverTest, FailsWhenTheLastListIsRefused) {
 
 TEST_F(SendUnpinInfoToDriverTest, TellsEveryListAtLevel2) {
     CapturedLog log(2);
-    EXPECT_EQ(SendUnpinInfoToDriver(device, {{128, 256}, {UINT64_MAX, 1}}), 0);
+    EXPECT_EQ(SendUnpinInfoToDriver(kDevice, {{128, 256}, {UINT64_MAX, 1}}), 0);
     EXPECT_EQ(log.Messages(),
               (Messages{"SendUnpinInfoToDriver() [N] : +++++",
                         "SendUnpinInfoToDriver() [N]: Pass range to driver start",
@@ -152,7 +154,7 @@ TEST_F(SendUnpinInfoToDriverTest, OneListIsSentAsItIs) {
     UnpinList list{};
     list.ranges[0] = Range(3);
     CapturedLog log;
-    EXPECT_EQ(SendUnpinList(device, &list, {"Caller", 1}), 0);
+    EXPECT_EQ(SendUnpinList(kDevice, &list, {"Caller", 1}), 0);
     ExpectSent({Request(3, 4)});
     EXPECT_EQ(log.Text(), "");
 }
@@ -161,6 +163,8 @@ TEST_F(SendUnpinInfoToDriverTest, OneListThatIsRefusedFailsAtTheCallersPlace) {
     refused = 1;
     UnpinList list{};
     CapturedLog log(2);
-    EXPECT_EQ(SendUnpinList(device, &list, {"Caller", 1}), -1);
+    EXPECT_EQ(SendUnpinList(kDevice, &list, {"Caller", 1}), -1);
     EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Send unpin inctl to driver failed");
 }
+
+} // namespace vesk

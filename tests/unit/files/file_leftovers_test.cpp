@@ -8,6 +8,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 class FileLeftoversTest : public LeakCheckedTest {
@@ -84,3 +86,5 @@ TEST_F(FileLeftoversTest, AFolderThatIsNotThereIsNoMatter) {
     FileRemoveLeftovers("/no/such/config.json");
     FileRemoveLeftovers("");
 }
+
+} // namespace vesk

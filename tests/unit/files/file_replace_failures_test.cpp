@@ -8,9 +8,11 @@
 #include <cerrno>
 #include <fcntl.h>
 
+namespace vesk {
+
 namespace {
 
-const bool privateMounts = UsePrivateMounts();
+const bool kPrivateMounts = UsePrivateMounts();
 
 class FileReplaceFailureTest : public FileReplaceTest {
 protected:
@@ -196,7 +198,7 @@ TEST_F(FileReplaceFailureTest, DevicesAreWrittenAndNotReplaced) {
 
 TEST_F(FileReplaceFailureTest, ReadOnlyFolderOfAnotherUserIsFollowedByWritingInPlace) {
     SKIP_WITHOUT_ROOT();
-    ASSERT_EQ(chown(path.c_str(), nobody, nobody), 0);
+    ASSERT_EQ(chown(path.c_str(), kNobody, kNobody), 0);
     ASSERT_EQ(chmod(folder.Path().c_str(), 0755), 0);
     const ino_t before = Status(path).st_ino;
     EXPECT_EQ(ReplaceAsNobody(path, fresh), FileReplaceResult::Done);
@@ -207,7 +209,7 @@ TEST_F(FileReplaceFailureTest, ReadOnlyFolderOfAnotherUserIsFollowedByWritingInP
 
 TEST_F(FileReplaceFailureTest, FolderThatCannotBeReadIsFollowedByWritingInPlace) {
     SKIP_WITHOUT_ROOT();
-    ASSERT_EQ(chown(path.c_str(), nobody, nobody), 0);
+    ASSERT_EQ(chown(path.c_str(), kNobody, kNobody), 0);
     ASSERT_EQ(chmod(folder.Path().c_str(), 0711), 0);
     const ino_t before = Status(path).st_ino;
     EXPECT_EQ(ReplaceAsNobody(path, fresh), FileReplaceResult::Done);
@@ -216,14 +218,14 @@ TEST_F(FileReplaceFailureTest, FolderThatCannotBeReadIsFollowedByWritingInPlace)
 
 TEST_F(FileReplaceFailureTest, FileThatMayNotBeWrittenStaysThoughTheFolderWouldAllowIt) {
     SKIP_WITHOUT_ROOT();
-    ASSERT_EQ(chown(folder.Path().c_str(), nobody, nobody), 0);
+    ASSERT_EQ(chown(folder.Path().c_str(), kNobody, kNobody), 0);
     EXPECT_EQ(ReplaceAsNobody(path, fresh), FileReplaceResult::CannotOpen);
     ExpectOldWhole();
 }
 
 TEST_F(FileReplaceFailureTest, FileOfAnotherUserKeepsItsOwnerByWritingInPlace) {
     SKIP_WITHOUT_ROOT();
-    ASSERT_EQ(chown(folder.Path().c_str(), nobody, nobody), 0);
+    ASSERT_EQ(chown(folder.Path().c_str(), kNobody, kNobody), 0);
     ASSERT_EQ(chmod(path.c_str(), 0666), 0);
     const ino_t before = Status(path).st_ino;
     EXPECT_EQ(ReplaceAsNobody(path, fresh), FileReplaceResult::Done);
@@ -256,3 +258,5 @@ TEST_F(FileReplaceFailureTest, FullDiskLeavesTheOldContent) {
     EXPECT_EQ(FileReplaceContent(disk.Path("file").c_str(), fresh), FileReplaceResult::Done);
     EXPECT_EQ(ReadWhole(disk.Path("file")), fresh);
 }
+
+} // namespace vesk

@@ -1,6 +1,5 @@
 // A folder with one file that holds `old`, to be replaced by `fresh`.
-#ifndef TESTS_UNIT_FILES_FILE_REPLACE_FIXTURE_H
-#define TESTS_UNIT_FILES_FILE_REPLACE_FIXTURE_H
+#pragma once
 
 #include "files/file_replace.h"
 #include "tests/support/leak_checked_test.h"
@@ -15,7 +14,9 @@
 #include <unistd.h>
 #include <vector>
 
-const uid_t nobody = 65534;
+namespace vesk {
+
+const uid_t kNobody = 65534;
 
 class FileReplaceTest : public LeakCheckedTest {
 protected:
@@ -69,7 +70,7 @@ protected:
         fflush(stdout);
         const pid_t child = fork();
         if (child == 0) {
-            if (setgid(nobody) < 0 || setuid(nobody) < 0) {
+            if (setgid(kNobody) < 0 || setuid(kNobody) < 0) {
                 _exit(99);
             }
             _exit(static_cast<int>(FileReplaceContent(file.c_str(), content)));
@@ -96,4 +97,4 @@ private:
     }                                                                                              \
     static_assert(true, "a semicolon follows")
 
-#endif
+} // namespace vesk

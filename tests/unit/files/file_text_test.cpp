@@ -8,6 +8,8 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
+namespace vesk {
+
 namespace {
 
 class FileTextTest : public LeakCheckedTest {
@@ -116,3 +118,5 @@ TEST_F(FileTextTest, ReadFailsOnAnEmptyFileAndOnAFolder) {
         EXPECT_EQ(log.Text(), "tool: Can't get a line from file (" + unreadable + ")\n");
     }
 }
+
+} // namespace vesk

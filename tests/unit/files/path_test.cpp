@@ -10,6 +10,8 @@
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 class PathTest : public LeakCheckedTest {
@@ -179,3 +181,5 @@ TEST_F(PathTest, NothingIsNeitherAndSaysSo) {
               (std::vector<std::string>{"PathIsFile() [N] : ***** Path (/no/such) doesn't exist",
                                         "PathIsDir() [N] : ***** Path (/no/such) doesn't exist"}));
 }
+
+} // namespace vesk

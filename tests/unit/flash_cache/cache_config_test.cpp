@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <filesystem>
 
+namespace vesk {
+
 namespace {
 
 constexpr char kOne[] =
@@ -115,3 +117,5 @@ TEST(CacheConfigPath, FollowsTheEnvironment) {
 }
 
 } // namespace
+
+} // namespace vesk

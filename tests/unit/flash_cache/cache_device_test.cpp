@@ -7,6 +7,8 @@
 
 #include <sys/stat.h>
 
+namespace vesk {
+
 namespace {
 
 TEST(CacheDeviceAsk, PinInterface) {
@@ -52,3 +54,5 @@ TEST(CacheDeviceAsk, NoCacheDevice) {
 }
 
 } // namespace
+
+} // namespace vesk

@@ -10,6 +10,8 @@
 #include <cstdlib>
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
 // Configures one cache each for the spaces "u1" and "u2", with the SSDs "ssd1" and "ssd2".
@@ -180,3 +182,5 @@ TEST_F(FlashCache, FirstOfTwoEntriesCounts) {
 }
 
 } // namespace
+
+} // namespace vesk

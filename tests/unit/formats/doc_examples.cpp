@@ -5,6 +5,8 @@
 #include <sstream>
 #include <stdexcept>
 
+namespace vesk {
+
 std::string DocExample(const std::string &name) {
     const std::string page = ReadWhole(VESK_DOCS "/formats.md");
     const size_t mark = page.find(" " + name + "\n");
@@ -26,3 +28,5 @@ std::string DocExampleBytes(const std::string &name) {
     }
     return bytes;
 }
+
+} // namespace vesk

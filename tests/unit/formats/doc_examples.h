@@ -1,8 +1,9 @@
 // The worked examples of docs/formats.md: code blocks marked "```<kind> <name>".
-#ifndef TESTS_FORMATS_DOC_EXAMPLES_H
-#define TESTS_FORMATS_DOC_EXAMPLES_H
+#pragma once
 
 #include <string>
+
+namespace vesk {
 
 // The text of the block with this name, its last line feed included. Throws where there is none.
 std::string DocExample(const std::string &name);
@@ -10,4 +11,4 @@ std::string DocExample(const std::string &name);
 // The bytes of a block of hexadecimal numbers.
 std::string DocExampleBytes(const std::string &name);
 
-#endif
+} // namespace vesk

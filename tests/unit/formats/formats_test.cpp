@@ -21,9 +21,11 @@
 #include <cstring>
 #include <sys/ipc.h>
 
+namespace vesk {
+
 namespace {
 
-const bool privateWorld = UsePrivateWorld();
+const bool kPrivateWorld = UsePrivateWorld();
 
 std::string WithoutLineFeed(std::string text) {
     text.pop_back();
@@ -31,7 +33,7 @@ std::string WithoutLineFeed(std::string text) {
 }
 
 // Any existing file serves as a device that requests are sent to.
-const char anyDevice[] = "/dev/null";
+const char kAnyDevice[] = "/dev/null";
 
 } // namespace
 
@@ -41,7 +43,7 @@ protected:
 };
 
 TEST_F(FormatsTest, TheBitmapFileOf16MiBBeginsAsShown) {
-    unsigned char bytes[(16 << 20) >> bitmapSizeShift] = {};
+    unsigned char bytes[(16 << 20) >> kBitmapSizeShift] = {};
     ASSERT_EQ(sizeof(bytes), 32U);
     PinBitmap bitmap{bytes, sizeof(bytes)};
     BitmapSetRange(&bitmap, 127, 2);
@@ -73,7 +75,7 @@ TEST_F(FormatsTest, TheConfigurationIsWhatFinishingTheFirstRequestLeaves) {
     before["requests"]["0"]["data"] = "share/a.txt#1234";
     ASSERT_EQ(WriteJsonToFile(before, path.c_str()), 0);
     RequestRecord record{};
-    record.type = requestPinFiles;
+    record.type = kRequestPinFiles;
     strcpy(record.mountPath, "/volume1");
     strcpy(record.data, "share/a.txt#1234");
     ASSERT_EQ(ConfigUpdatedByFinishedRequest(path.c_str(), &record, "0"), 0);
@@ -97,12 +99,12 @@ TEST_F(FormatsTest, TheFileInodeListNamesTwoFiles) {
 TEST_F(FormatsTest, TheMessageOfAPinIsAsShown) {
     SKIP_WITHOUT_PRIVATE_WORLD();
     EmptyPrivateWorld();
-    FakeApplianceOneVolume(anyDevice);
+    FakeApplianceOneVolume(kAnyDevice);
     ToolParameters parameters;
     parameters.mountPath = "/volume1";
     parameters.files = "/volume1/a";
     ASSERT_EQ(PinFilesRequest(&parameters), 0);
-    const RawMessage message = TakeMessage(MsgQueueGet(messageKeyFile));
+    const RawMessage message = TakeMessage(MsgQueueGet(kMessageKeyFile));
     EXPECT_EQ(message.type, 1);
     EXPECT_EQ(message.text.size(), 1540U);
     const std::string start = DocExampleBytes("message-start");
@@ -131,7 +133,7 @@ TEST_F(FormatsTest, TheBitmapDescriptorIsTwoWordsOnTheTarget) {
         sent.assign(static_cast<const char *>(descriptor), 8);
         return 0;
     };
-    ASSERT_EQ(BitmapSendToDriver(&bitmap, anyDevice), 0);
+    ASSERT_EQ(BitmapSendToDriver(&bitmap, kAnyDevice), 0);
     EXPECT_EQ(sent, DocExampleBytes("bitmap-descriptor"));
 }
 
@@ -142,8 +144,10 @@ TEST_F(FormatsTest, TheRangeListBeginsAsShownAndIsSentWhole) {
         sent.assign(static_cast<const char *>(list), 16384);
         return 0;
     };
-    ASSERT_EQ(SendUnpinInfoToDriver(anyDevice, {{33112, 8192}}), 0);
+    ASSERT_EQ(SendUnpinInfoToDriver(kAnyDevice, {{33112, 8192}}), 0);
     const std::string shown = DocExampleBytes("range-list");
     EXPECT_EQ(sent.substr(0, shown.size()), shown);
     EXPECT_EQ(sent.find_first_not_of('\0', shown.size()), std::string::npos);
 }
+
+} // namespace vesk

@@ -8,6 +8,8 @@
 #include <cerrno>
 #include <cstring>
 
+namespace vesk {
+
 class MessageQueueSendTest : public QueueTest {
 protected:
     void SetUp() override {
@@ -25,8 +27,8 @@ protected:
         return message;
     }
     int Send(int queueId) const {
-        const RequestMessage message = Message(requestReloadPinBlocks, "/volume1");
-        return MsgQueueSend(queueId, &message, requestMessageBytes);
+        const RequestMessage message = Message(kRequestReloadPinBlocks, "/volume1");
+        return MsgQueueSend(queueId, &message, kRequestMessageBytes);
     }
     void FillQueue() const {
         for (int i = 0; i < 1024; ++i) {
@@ -130,7 +132,7 @@ TEST_F(MessageQueueSendTest, WithoutAnAcknowledgementTheWaitEndsAfterThreeSecond
 TEST_F(MessageQueueSendTest, AnAcknowledgementEndsTheWait) {
     FakeLibc::onSleep = [this] {
         if (FakeLibc::sleeps == 2) {
-            PutMessage(queueId_, 2, RecordBytes(requestAck, "/volume1"));
+            PutMessage(queueId_, 2, RecordBytes(kRequestAck, "/volume1"));
         }
     };
     CapturedLog log(2);
@@ -146,10 +148,12 @@ TEST_F(MessageQueueSendTest, AnAcknowledgementEndsTheWait) {
 }
 
 TEST_F(MessageQueueSendTest, AnyOtherAnswerIsWrong) {
-    PutMessage(queueId_, 1, RecordBytes(requestAck, "/volume1")); // not the type waited for
-    PutMessage(queueId_, 2, RecordBytes(requestPinFiles, "/volume1"));
+    PutMessage(queueId_, 1, RecordBytes(kRequestAck, "/volume1")); // not the type waited for
+    PutMessage(queueId_, 2, RecordBytes(kRequestPinFiles, "/volume1"));
     CapturedLog log;
     EXPECT_EQ(WaitForAck(queueId_, 2), -1);
     EXPECT_EQ(log.Messages(), Messages{"Get wrong request"});
     EXPECT_EQ(CountMessages(queueId_), 1);
 }
+
+} // namespace vesk

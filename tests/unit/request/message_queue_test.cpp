@@ -10,20 +10,22 @@
 #include <sys/msg.h>
 #include <thread>
 
+namespace vesk {
+
 namespace {
 
-const bool privateWorld = UsePrivateWorld();
+const bool kPrivateWorld = UsePrivateWorld();
 
 } // namespace
 
 class MessageQueueTest : public QueueTest {};
 
 TEST_F(MessageQueueTest, TheMessageIsAHeaderWordAndTheRecord) {
-    EXPECT_STREQ(messageKeyFile, "/var/run/veskcachepinfile-msg-server.key");
-    EXPECT_EQ(requestMessageType, 1);
-    EXPECT_EQ(requestMessageBytes, 1540U);
-    EXPECT_EQ(messageQueueRequests, 1024);
-    EXPECT_EQ(messageQueueBytes, 1576960U);
+    EXPECT_STREQ(kMessageKeyFile, "/var/run/veskcachepinfile-msg-server.key");
+    EXPECT_EQ(kRequestMessageType, 1);
+    EXPECT_EQ(kRequestMessageBytes, 1540U);
+    EXPECT_EQ(kMessageQueueRequests, 1024);
+    EXPECT_EQ(kMessageQueueBytes, 1576960U);
     EXPECT_EQ(offsetof(RequestMessage, record), sizeof(long));
 }
 
@@ -261,3 +263,5 @@ TEST_F(MessageQueueTest, NothingOnTheWayCatchesWhatAKeyFileWithoutANumberThrows)
     WriteWhole(keyFile_, "abc");
     EXPECT_THROW(MsgQueueGet(KeyFile()), std::invalid_argument);
 }
+
+} // namespace vesk

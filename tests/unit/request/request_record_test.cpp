@@ -4,6 +4,8 @@
 
 #include <cstddef>
 
+namespace vesk {
+
 class RequestRecordTest : public ConfigTest {};
 
 TEST_F(RequestRecordTest, LayoutIsTheMessageText) {
@@ -14,7 +16,7 @@ TEST_F(RequestRecordTest, LayoutIsTheMessageText) {
 }
 
 TEST_F(RequestRecordTest, TextNamesTypeMountPathAndData) {
-    const RequestRecord record = MakeRecord(requestPinFiles, "/volume1", "a%s#1;b#2");
+    const RequestRecord record = MakeRecord(kRequestPinFiles, "/volume1", "a%s#1;b#2");
     std::string text = "old";
     RequestToString(&text, &record);
     EXPECT_EQ(text, "Request type=pinFiles mountPath=/volume1 data=a%s#1;b#2");
@@ -22,7 +24,7 @@ TEST_F(RequestRecordTest, TextNamesTypeMountPathAndData) {
 
 TEST_F(RequestRecordTest, ALongTextIsCutAt1023Characters) {
     const RequestRecord record =
-        MakeRecord(requestAck, std::string(511, 'm'), std::string(1023, 'd'));
+        MakeRecord(kRequestAck, std::string(511, 'm'), std::string(1023, 'd'));
     std::string text;
     RequestToString(&text, &record);
     const std::string head = "Request type=ack mountPath=" + std::string(511, 'm') + " data=";
@@ -37,3 +39,5 @@ TEST_F(RequestRecordTest, ATypeWithoutANameIsShownWithoutPrintingANull) {
     EXPECT_EQ(text, "Request type=(null) mountPath=/volume1 data=");
     EXPECT_EQ(log.Messages(), Messages{"Convert request type to string errror"});
 }
+
+} // namespace vesk

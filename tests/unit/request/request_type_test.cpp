@@ -4,6 +4,8 @@
 
 #include <climits>
 
+namespace vesk {
+
 class RequestTypeTest : public ConfigTest {};
 
 TEST_F(RequestTypeTest, EveryValueHasItsName) {
@@ -52,3 +54,5 @@ TEST_F(RequestTypeTest, OtherNamesAreUnknownWithoutAMessage) {
     EXPECT_EQ(StringToRequestType(std::string("pinFiles\0", 9)), 0);
     EXPECT_EQ(log.Messages(), Messages{});
 }
+
+} // namespace vesk

@@ -21,6 +21,8 @@
 #include <thread>
 #include <unistd.h>
 
+namespace vesk {
+
 // Writes the counts of a build that measures coverage; only such a build has it.
 extern "C" void __gcov_dump() __attribute__((weak));
 
@@ -28,7 +30,7 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-const int stretched = 100;
+const int kStretched = 100;
 
 // Not usleep(), whose time tests stretch.
 void PauseBriefly() {
@@ -78,7 +80,7 @@ void *RunBody(void *argument) {
     LogLevel = setup.logLevel;
     ProgramName = "tool";
     FakeLibc::onSleep = PauseBriefly;
-    FakeLibc::alarmFactor = setup.stuffedPipe ? 1 : stretched;
+    FakeLibc::alarmFactor = setup.stuffedPipe ? 1 : kStretched;
     at_quick_exit(WriteCoverage);
 
     sigset_t all;
@@ -207,3 +209,5 @@ std::vector<std::string> ChildProcess::Messages() {
     }
     return messages;
 }
+
+} // namespace vesk

@@ -4,8 +4,7 @@
 // Messages go to standard output; pauses last a millisecond. The limit that the tool sets to its
 // own end is stretched, unless the child cannot end otherwise: what ends orderly is then seen to,
 // however busy the machine is. The child is killed when the object goes or the test program does.
-#ifndef TESTS_SERVICE_CHILD_PROCESS_H
-#define TESTS_SERVICE_CHILD_PROCESS_H
+#pragma once
 
 #include <chrono>
 #include <cstdlib>
@@ -13,6 +12,8 @@
 #include <string>
 #include <sys/types.h>
 #include <vector>
+
+namespace vesk {
 
 // The thread sanitizer holds signals back until the thread calls something that it knows, and calls
 // a handler's output an error: what is meant to end a process inside such a call cannot be shown.
@@ -78,4 +79,4 @@ private:
     std::string text_;
 };
 
-#endif
+} // namespace vesk

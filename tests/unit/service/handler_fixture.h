@@ -1,7 +1,6 @@
 // What the tests of handlers and worker share: one volume with its cache device, files on it whose
 // extents are scripted, and the volume's bitmap file.
-#ifndef TESTS_SERVICE_HANDLER_FIXTURE_H
-#define TESTS_SERVICE_HANDLER_FIXTURE_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 #include "tests/support/fake_appliance.h"
@@ -20,6 +19,8 @@
 #include <gtest/gtest.h>
 #include <map>
 #include <memory>
+
+namespace vesk {
 
 using Events = std::vector<std::string>;
 
@@ -69,4 +70,4 @@ protected:
     };
 };
 
-#endif
+} // namespace vesk

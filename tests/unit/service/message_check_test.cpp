@@ -7,6 +7,8 @@
 
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
 int Check(int type, const std::string &mountPath, const std::string &data) {
@@ -54,3 +56,5 @@ TEST_F(MessageCheckTest, PinAndUnpinNeedFiles) {
     EXPECT_EQ(Check(2, "/volume1", ""), -1);
     EXPECT_EQ(log.Messages(), Messages{"CheckNormalMsg() [N] : ***** Should provide file paths"});
 }
+
+} // namespace vesk

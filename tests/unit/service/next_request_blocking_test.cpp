@@ -6,6 +6,8 @@
 
 #include <thread>
 
+namespace vesk {
+
 // The selection on a thread of its own; it ends when it has found something.
 class NextRequestBlockingTest : public ConfigTest {
 protected:
@@ -37,13 +39,13 @@ TEST_F(NextRequestBlockingTest, WithoutAFileItWaitsForTheFirstRequest) {
     CapturedLog log(2);
     Start();
     AwaitWaiting(log, 1);
-    const RequestRecord reload = MakeRecord(requestReloadPinBlocks, "/volume1");
+    const RequestRecord reload = MakeRecord(kRequestReloadPinBlocks, "/volume1");
     ASSERT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
     ServiceSignalRequest();
     selection_.join();
     EXPECT_EQ(result_, NextRequest::Taken);
     EXPECT_EQ(num_, "0");
-    EXPECT_EQ(record_.type, requestReloadPinBlocks);
+    EXPECT_EQ(record_.type, kRequestReloadPinBlocks);
     EXPECT_EQ(MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
               (Messages{
                   "ConfigParseAndGetNextAvailableRequest() [N]: Config doesn't exist",
@@ -61,7 +63,7 @@ TEST_F(NextRequestBlockingTest, ASignalWithoutARequestIsWaitedOn) {
     AwaitWaiting(log, 1);
     ServiceSignalRequest();
     AwaitWaiting(log, 2);
-    const RequestRecord reload = MakeRecord(requestReloadPinBlocks, "/volume1");
+    const RequestRecord reload = MakeRecord(kRequestReloadPinBlocks, "/volume1");
     ASSERT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
     ServiceSignalRequest();
     selection_.join();
@@ -79,3 +81,5 @@ TEST_F(NextRequestBlockingTest, AFileThatIsDamagedMeanwhileEndsTheWaitWithAnErro
     selection_.join();
     EXPECT_EQ(result_, NextRequest::Error);
 }
+
+} // namespace vesk

@@ -6,9 +6,11 @@
 #include <sys/stat.h>
 #include <thread>
 
+namespace vesk {
+
 namespace {
 
-const char pinA[] = R"({"type" : "pinFiles", "mountPath" : "/volume1", "data" : "a#1"})";
+const char kPinA[] = R"({"type" : "pinFiles", "mountPath" : "/volume1", "data" : "a#1"})";
 
 } // namespace
 
@@ -40,19 +42,19 @@ protected:
 };
 
 TEST_F(NextRequestTest, TheOldestRequestIsTakenAndStaysInTheFile) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log;
     EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "1");
-    EXPECT_EQ(record_.type, requestPinFiles);
+    EXPECT_EQ(record_.type, kRequestPinFiles);
     EXPECT_STREQ(record_.mountPath, "/volume1");
     EXPECT_STREQ(record_.data, "share/b.bin#5678");
     EXPECT_EQ(log.Messages(), Messages{});
-    EXPECT_EQ(Stored(), exampleDocument);
+    EXPECT_EQ(Stored(), kExampleDocument);
 }
 
 TEST_F(NextRequestTest, ATakenRequestIsLoggedWithAnOpenParenthesis) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     CapturedLog log(2);
     EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
@@ -61,23 +63,23 @@ TEST_F(NextRequestTest, ATakenRequestIsLoggedWithAnOpenParenthesis) {
 }
 
 TEST_F(NextRequestTest, NullDataGivesTheEmptyText) {
-    StoreTwo(R"({"type" : "reloadPinBlocks", "mountPath" : "/volume1", "data" : null})", pinA);
+    StoreTwo(R"({"type" : "reloadPinBlocks", "mountPath" : "/volume1", "data" : null})", kPinA);
     EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "0");
-    EXPECT_EQ(record_.type, requestReloadPinBlocks);
+    EXPECT_EQ(record_.type, kRequestReloadPinBlocks);
     EXPECT_STREQ(record_.data, "");
 }
 
 TEST_F(NextRequestTest, ARequestOfAPendingSpaceIsPassedOverAndKeepsItsPlace) {
     FakeAppliance::spaces.push_back({"/dev/space2", "/volume2", "uuid-2"});
     FakeAppliance::caches.push_back({"uuid-2", "/dev/ssd2", "/dev/cachedev_1"});
-    StoreTwo(pinA, R"({"type" : "unpinFiles", "mountPath" : "/volume2", "data" : "b#2"})");
+    StoreTwo(kPinA, R"({"type" : "unpinFiles", "mountPath" : "/volume2", "data" : "b#2"})");
     const std::string before = Stored();
     SetPending("/volume1");
     CapturedLog log(2);
     EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "1");
-    EXPECT_EQ(record_.type, requestUnpinFiles);
+    EXPECT_EQ(record_.type, kRequestUnpinFiles);
     EXPECT_STREQ(record_.mountPath, "/volume2");
     EXPECT_EQ(MessagesOf(log, "ConfigParseAndGetNextAvailableRequest"),
               (Messages{
@@ -90,7 +92,7 @@ TEST_F(NextRequestTest, ARequestOfAPendingSpaceIsPassedOverAndKeepsItsPlace) {
 }
 
 TEST_F(NextRequestTest, WithOnlyPendingRequestsTheAnswerIsNoneAtOnce) {
-    StoreTwo(pinA, pinA);
+    StoreTwo(kPinA, kPinA);
     SetPending("/volume1");
     CapturedLog log;
     EXPECT_EQ(Next(), NextRequest::None);
@@ -100,26 +102,27 @@ TEST_F(NextRequestTest, WithOnlyPendingRequestsTheAnswerIsNoneAtOnce) {
 }
 
 TEST_F(NextRequestTest, APendingSpaceIsComparedExactly) {
-    StoreTwo(pinA, pinA);
+    StoreTwo(kPinA, kPinA);
     SetPending("/volume1/");
     EXPECT_EQ(Next(), NextRequest::Taken);
 }
 
 TEST_F(NextRequestTest, ARequestOfAVolumeWithoutCacheIsDroppedWithItsRecords) {
-    StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})", pinA);
+    StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})", kPinA);
     FakeAppliance::spaces.push_back({"/dev/space9", "/volume9", "uuid-9"});
     CapturedLog log;
     EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "1");
     EXPECT_EQ(log.Messages(), Messages{"Drop requests finish"});
-    EXPECT_EQ(StoredDocument(),
-              ParseDocument(
-                  R"({"nextRequestNum" : 2, "requestQueue" : ["1"], "requests" : {"1" : )" +
-                  std::string(pinA) + R"(}, "volumes" : {"/volume1" : {"files" : {"7" : "x"}}}})"));
+    EXPECT_EQ(
+        StoredDocument(),
+        ParseDocument(R"({"nextRequestNum" : 2, "requestQueue" : ["1"], "requests" : {"1" : )" +
+                      std::string(kPinA) +
+                      R"(}, "volumes" : {"/volume1" : {"files" : {"7" : "x"}}}})"));
 }
 
 TEST_F(NextRequestTest, ADropIsLoggedAtLevel2) {
-    StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})", pinA);
+    StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})", kPinA);
     FakeAppliance::spaces.push_back({"/dev/space9", "/volume9", "uuid-9"});
     CapturedLog log(2);
     EXPECT_EQ(Next(), NextRequest::Taken);
@@ -136,7 +139,7 @@ TEST_F(NextRequestTest, ADropIsLoggedAtLevel2) {
 
 TEST_F(NextRequestTest, WhenAllAreDroppedTheAnswerIsNone) {
     FakeAppliance::caches[0].supportPin = 0;
-    StoreTwo(pinA, pinA);
+    StoreTwo(kPinA, kPinA);
     CapturedLog log;
     EXPECT_EQ(Next(), NextRequest::None);
     EXPECT_EQ(log.Messages(), Messages{"Drop requests finish"});
@@ -145,7 +148,7 @@ TEST_F(NextRequestTest, WhenAllAreDroppedTheAnswerIsNone) {
 }
 
 TEST_F(NextRequestTest, ARunnableRequestEndsTheWalkBeforeALaterDrop) {
-    StoreTwo(pinA, R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})");
+    StoreTwo(kPinA, R"({"type" : "pinFiles", "mountPath" : "/volume9", "data" : "b#2"})");
     const std::string before = Stored();
     EXPECT_EQ(Next(), NextRequest::Taken);
     EXPECT_EQ(num_, "0");
@@ -154,7 +157,7 @@ TEST_F(NextRequestTest, ARunnableRequestEndsTheWalkBeforeALaterDrop) {
 
 TEST_F(NextRequestTest, ADropLeavesTheVolumesOwnPendingStateAlone) {
     FakeAppliance::caches.clear();
-    StoreTwo(pinA, pinA);
+    StoreTwo(kPinA, kPinA);
     SetPending("/volume1");
     EXPECT_EQ(Next(), NextRequest::None);
     EXPECT_TRUE(ServiceIsPendingSpace("/volume1"));
@@ -162,7 +165,7 @@ TEST_F(NextRequestTest, ADropLeavesTheVolumesOwnPendingStateAlone) {
 
 TEST_F(NextRequestTest, ADropTakesTheEmptyPathOutOfThePendingList) {
     FakeAppliance::caches.clear();
-    StoreTwo(pinA, pinA);
+    StoreTwo(kPinA, kPinA);
     SetPending("");
     SetPending("/volume1");
     CapturedLog log(2);
@@ -202,7 +205,7 @@ TEST_F(NextRequestTest, AnUnknownTypeIsAnError) {
     for (const char *type : {"\"what\"", "\"unknown\"", "\"\"", "null", "1", "\"PinFiles\""}) {
         StoreTwo(std::string(R"({"mountPath" : "/volume1", "data" : "a#1", "type" : )") + type +
                      "}",
-                 pinA);
+                 kPinA);
         CapturedLog log;
         EXPECT_EQ(Next(), NextRequest::Error) << type;
         EXPECT_EQ(log.Messages(), Messages{"Can't get correct request type"}) << type;
@@ -223,7 +226,7 @@ TEST_F(NextRequestTest, ADamagedFileIsAnError) {
 
 TEST_F(NextRequestTest, ADropOfANumberThatStandsTwiceIsAnError) {
     FakeAppliance::caches.clear();
-    Store(std::string(R"({"requestQueue" : ["0", "0"], "requests" : {"0" : )") + pinA + "}}");
+    Store(std::string(R"({"requestQueue" : ["0", "0"], "requests" : {"0" : )") + kPinA + "}}");
     const std::string before = Stored();
     CapturedLog log;
     EXPECT_EQ(Next(), NextRequest::Error);
@@ -237,7 +240,7 @@ TEST_F(NextRequestTest, ADropOfANumberThatStandsTwiceIsAnError) {
 
 TEST_F(NextRequestTest, ADropThatCannotBeWrittenIsAnError) {
     FakeAppliance::caches.clear();
-    StoreTwo(pinA, pinA);
+    StoreTwo(kPinA, kPinA);
     const std::string before = Stored();
     chmod(folder_.Path().c_str(), 0755);
     chmod(path_.c_str(), 0444);
@@ -258,9 +261,11 @@ TEST_F(NextRequestTest, LongTextsAreCutToTheRecordsFields) {
     FakeAppliance::spaces[0].referencePath = mountPath.substr(0, 511);
     StoreTwo(R"({"type" : "ack", "mountPath" : ")" + mountPath.substr(0, 511) + R"(", "data" : ")" +
                  std::string(2000, 'd') + "\"}",
-             pinA);
+             kPinA);
     EXPECT_EQ(Next(), NextRequest::Taken);
-    EXPECT_EQ(record_.type, requestAck);
+    EXPECT_EQ(record_.type, kRequestAck);
     EXPECT_EQ(record_.mountPath, mountPath.substr(0, 511));
     EXPECT_EQ(record_.data, std::string(1023, 'd'));
 }
+
+} // namespace vesk

@@ -1,6 +1,5 @@
 // What the receiver tests share.
-#ifndef TESTS_SERVICE_RECEIVER_FIXTURE_H
-#define TESTS_SERVICE_RECEIVER_FIXTURE_H
+#pragma once
 
 #include "tests/support/queue_fixture.h"
 #include "tests/support/thread_state.h"
@@ -19,6 +18,8 @@
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <unistd.h>
+
+namespace vesk {
 
 inline Json::Value ParseJson(const std::string &text) {
     Json::Value root;
@@ -39,7 +40,7 @@ protected:
         }
         ASSERT_EQ(ServiceStateInitialize(), 0);
         std::filesystem::create_directory(volume_);
-        queueId_ = MsgQueueGet(messageKeyFile);
+        queueId_ = MsgQueueGet(kMessageKeyFile);
         ASSERT_NE(queueId_, -1);
     }
     static void *Receive(void *configPath) {
@@ -61,7 +62,7 @@ protected:
         Put(RecordBytes(type, mountPath, data));
     }
     // Puts a record that ends the receiver behind the others.
-    void PutEnd() const { Put(requestReloadPinBlocks, ""); }
+    void PutEnd() const { Put(kRequestReloadPinBlocks, ""); }
 
     void RunReceiver() {
         pthread_t thread{};
@@ -82,4 +83,4 @@ protected:
     int queueId_ = -1;
 };
 
-#endif
+} // namespace vesk

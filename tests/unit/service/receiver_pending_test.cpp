@@ -5,15 +5,17 @@
 
 #include <thread>
 
+namespace vesk {
+
 using ReceiverPendingTest = ReceiverTest;
 
 TEST_F(ReceiverPendingTest, PendingSpaceMessagesChangeTheListAndNothingElse) {
-    Put(requestAddPendingSpace, "/volume1");
-    Put(requestAddPendingSpace, "/volume1");
-    Put(requestAddPendingSpace, "/volume2");
-    Put(requestAddPendingSpace, "");
-    Put(requestRemovePendigSpace, "/volume2");
-    Put(requestRemovePendigSpace, "/volume2");
+    Put(kRequestAddPendingSpace, "/volume1");
+    Put(kRequestAddPendingSpace, "/volume1");
+    Put(kRequestAddPendingSpace, "/volume2");
+    Put(kRequestAddPendingSpace, "");
+    Put(kRequestRemovePendigSpace, "/volume2");
+    Put(kRequestRemovePendigSpace, "/volume2");
     PutEnd();
     CapturedLog log(2);
     RunReceiver();
@@ -41,7 +43,7 @@ TEST_F(ReceiverPendingTest, PendingSpaceMessagesChangeTheListAndNothingElse) {
 }
 
 TEST_F(ReceiverPendingTest, RemovingWhatIsNotPendingIsANotice) {
-    Put(requestRemovePendigSpace, "/volume1");
+    Put(kRequestRemovePendigSpace, "/volume1");
     PutEnd();
     CapturedLog log;
     RunReceiver();
@@ -55,7 +57,7 @@ TEST_F(ReceiverPendingTest, RemovingWhatIsNotPendingIsANotice) {
 TEST_F(ReceiverPendingTest, ASpaceThatLeavesTheListMeanwhileStopsIt) {
     std::string path = "/volume1";
     ASSERT_EQ(ServiceAddPendingSpaceAtomic(&path[0]), 0);
-    Put(requestRemovePendigSpace, path);
+    Put(kRequestRemovePendigSpace, path);
     CapturedLog log(2);
     ServiceLock();
     std::thread receiver([this] { RunReceiver(); });
@@ -74,7 +76,7 @@ TEST_F(ReceiverPendingTest, ASpaceThatEntersTheListMeanwhileStopsIt) {
     GTEST_SKIP() << "the lock stays with a thread that has ended, which the sanitizer reports";
 #endif
     std::string path = "/volume1";
-    Put(requestAddPendingSpace, path);
+    Put(kRequestAddPendingSpace, path);
     CapturedLog log(2);
     ServiceLock();
     std::atomic<pid_t> adding{0};
@@ -96,3 +98,5 @@ TEST_F(ReceiverPendingTest, ASpaceThatEntersTheListMeanwhileStopsIt) {
     EXPECT_TRUE(ServiceIsPendingSpace("/volume1"));
     ASSERT_EQ(ServiceStateInitialize(), 0); // its lock was kept
 }
+
+} // namespace vesk

@@ -5,6 +5,8 @@
 
 #include <climits>
 
+namespace vesk {
+
 using ReceiverRecordTest = ReceiverTest;
 
 TEST_F(ReceiverRecordTest, ATypeWithoutANameStopsIt) {
@@ -26,10 +28,10 @@ TEST_F(ReceiverRecordTest, ATypeWithoutANameStopsIt) {
 }
 
 TEST_F(ReceiverRecordTest, PathsAreDataAndNeverFormats) {
-    Put(requestReloadPinBlocks, "/%s%n%d");
+    Put(kRequestReloadPinBlocks, "/%s%n%d");
     const std::string inode = CreateFile("100%s");
-    Put(requestPinFiles, volume_, volume_ + "/100%s");
-    Put(requestAddPendingSpace, "/%n%n");
+    Put(kRequestPinFiles, volume_, volume_ + "/100%s");
+    Put(kRequestAddPendingSpace, "/%n%n");
     PutEnd();
     CapturedLog log(2);
     RunReceiver();
@@ -40,8 +42,8 @@ TEST_F(ReceiverRecordTest, PathsAreDataAndNeverFormats) {
 }
 
 TEST_F(ReceiverRecordTest, TextsWithoutTheirNulEndAtTheirLastByte) {
-    Put(requestReloadPinBlocks, std::string(512, 'm'), std::string(1024, 'd'));
-    Put(requestPinFiles, volume_, std::string(1024, 'd'));
+    Put(kRequestReloadPinBlocks, std::string(512, 'm'), std::string(1024, 'd'));
+    Put(kRequestPinFiles, volume_, std::string(1024, 'd'));
     CapturedLog log;
     RunReceiver();
     EXPECT_EQ(ParseJson(ReadWhole(config_))["requests"]["0"]["mountPath"],
@@ -52,9 +54,9 @@ TEST_F(ReceiverRecordTest, TextsWithoutTheirNulEndAtTheirLastByte) {
 
 TEST_F(ReceiverRecordTest, AShortMessageInheritsNothingFromTheOneBefore) {
     const std::string inode = CreateFile("a");
-    Put(requestPinFiles, volume_, volume_ + "/a");
-    Put(RecordBytes(requestReloadPinBlocks, "/volume2").substr(0, 4 + 8)); // no NUL
-    Put(RecordBytes(requestPinFiles, volume_).substr(0, 4 + volume_.size()));
+    Put(kRequestPinFiles, volume_, volume_ + "/a");
+    Put(RecordBytes(kRequestReloadPinBlocks, "/volume2").substr(0, 4 + 8)); // no NUL
+    Put(RecordBytes(kRequestPinFiles, volume_).substr(0, 4 + volume_.size()));
     CapturedLog log;
     RunReceiver();
     const Json::Value document = ParseJson(ReadWhole(config_));
@@ -78,3 +80,5 @@ TEST_F(ReceiverRecordTest, AMessageThatIsTooLongStopsIt) {
         log.Has("GetRequests() [N] : ***** Receive messaged failed: Argument list too long"));
     EXPECT_EQ(CountMessages(queueId_), 1);
 }
+
+} // namespace vesk

@@ -5,20 +5,22 @@
 #include <csignal>
 #include <sys/msg.h>
 
+namespace vesk {
+
 namespace {
 
-const bool privateWorld = UsePrivateWorld();
+const bool kPrivateWorld = UsePrivateWorld();
 
 } // namespace
 
 TEST_F(ReceiverTest, RequestsAreStoredInTheOrderOfTheQueue) {
     const std::string a = CreateFile("a");
     const std::string b = CreateFile("b");
-    Put(requestPinFiles, volume_, volume_ + "/a;" + volume_ + "/b");
-    Put(requestUnpinFiles, volume_, volume_ + "/a");
-    Put(requestReloadPinBlocks, "/volume2");
-    Put(requestUnknown, "/volume3");
-    Put(requestAck, "/volume4");
+    Put(kRequestPinFiles, volume_, volume_ + "/a;" + volume_ + "/b");
+    Put(kRequestUnpinFiles, volume_, volume_ + "/a");
+    Put(kRequestReloadPinBlocks, "/volume2");
+    Put(kRequestUnknown, "/volume3");
+    Put(kRequestAck, "/volume4");
     PutEnd();
     CapturedLog log;
     RunReceiver();
@@ -38,7 +40,7 @@ TEST_F(ReceiverTest, RequestsAreStoredInTheOrderOfTheQueue) {
 }
 
 TEST_F(ReceiverTest, AtLevel2EachMessageIsLogged) {
-    Put(requestReloadPinBlocks, "/volume1");
+    Put(kRequestReloadPinBlocks, "/volume1");
     PutEnd();
     CapturedLog log(2);
     RunReceiver();
@@ -56,8 +58,8 @@ TEST_F(ReceiverTest, AtLevel2EachMessageIsLogged) {
 }
 
 TEST_F(ReceiverTest, AnEmptyMountPathStopsItAndLaterRequestsStayUnread) {
-    Put(requestPinFiles, "", "/volume1/a");
-    Put(requestReloadPinBlocks, "/volume1");
+    Put(kRequestPinFiles, "", "/volume1/a");
+    Put(kRequestReloadPinBlocks, "/volume1");
     CapturedLog log;
     RunReceiver();
     EXPECT_EQ(log.Messages(), (Messages{"Space UUID is not set", "Get wrong message format"}));
@@ -66,14 +68,14 @@ TEST_F(ReceiverTest, AnEmptyMountPathStopsItAndLaterRequestsStayUnread) {
 }
 
 TEST_F(ReceiverTest, APinWithoutFilesStopsIt) {
-    Put(requestPinFiles, "/volume1");
+    Put(kRequestPinFiles, "/volume1");
     CapturedLog log;
     RunReceiver();
     EXPECT_EQ(log.Messages(), (Messages{"Should provide file paths", "Get wrong message format"}));
 }
 
 TEST_F(ReceiverTest, AFileThatDoesNotExistStopsIt) {
-    Put(requestPinFiles, volume_, volume_ + "/missing");
+    Put(kRequestPinFiles, volume_, volume_ + "/missing");
     CapturedLog log(2);
     RunReceiver();
     const Messages messages = MessagesOf(log, "GetRequests");
@@ -84,7 +86,7 @@ TEST_F(ReceiverTest, AFileThatDoesNotExistStopsIt) {
 
 TEST_F(ReceiverTest, ADamagedConfigurationStopsItAndStaysAsItIs) {
     WriteWhole(config_, "[]");
-    Put(requestReloadPinBlocks, "/volume1");
+    Put(kRequestReloadPinBlocks, "/volume1");
     CapturedLog log;
     RunReceiver();
     EXPECT_EQ(log.Messages(), (Messages{
@@ -95,9 +97,9 @@ TEST_F(ReceiverTest, ADamagedConfigurationStopsItAndStaysAsItIs) {
 }
 
 TEST_F(ReceiverTest, MessagesOfOtherTypesStayInTheQueue) {
-    Put(RecordBytes(requestReloadPinBlocks, "/other"), 2);
-    Put(RecordBytes(requestReloadPinBlocks, "/other"), 99);
-    Put(requestReloadPinBlocks, "/volume1");
+    Put(RecordBytes(kRequestReloadPinBlocks, "/other"), 2);
+    Put(RecordBytes(kRequestReloadPinBlocks, "/other"), 99);
+    Put(kRequestReloadPinBlocks, "/volume1");
     PutEnd();
     const CapturedLog log;
     RunReceiver();
@@ -111,7 +113,7 @@ TEST_F(ReceiverTest, AQueueThatIsTakenAwayStopsIt) {
     // The queue goes while the receiver is at a message, before it asks for the next.
     FakeLibc::onRead = [this](int, long long, size_t) { msgctl(queueId_, IPC_RMID, nullptr); };
     WriteWhole(config_, "{}");
-    Put(requestReloadPinBlocks, "/volume1");
+    Put(kRequestReloadPinBlocks, "/volume1");
     CapturedLog log;
     RunReceiver();
     FakeLibc::onRead = nullptr;
@@ -120,7 +122,7 @@ TEST_F(ReceiverTest, AQueueThatIsTakenAwayStopsIt) {
 }
 
 TEST_F(ReceiverTest, WithoutAQueueItEndsAtOnce) {
-    WriteWhole(messageKeyFile, "");
+    WriteWhole(kMessageKeyFile, "");
     CapturedLog log(2);
     RunReceiver();
     EXPECT_EQ(ServerMsgQueueId, -1);
@@ -139,10 +141,10 @@ TEST_F(ReceiverTest, ItCreatesQueueAndKeyFileWhenItComesFirst) {
     pthread_t thread{};
     const CapturedLog log;
     ASSERT_EQ(pthread_create(&thread, nullptr, Receive, const_cast<char *>(config_.c_str())), 0);
-    while (ReadWhole(messageKeyFile).empty()) {
+    while (ReadWhole(kMessageKeyFile).empty()) {
         sched_yield();
     }
-    EXPECT_TRUE(PutMessage(MsgQueueGet(messageKeyFile), 1, ""));
+    EXPECT_TRUE(PutMessage(MsgQueueGet(kMessageKeyFile), 1, ""));
     pthread_join(thread, nullptr);
     EXPECT_EQ(CountQueues(), 1);
 }
@@ -150,6 +152,8 @@ TEST_F(ReceiverTest, ItCreatesQueueAndKeyFileWhenItComesFirst) {
 using ReceiverDeathTest = ReceiverTest;
 
 TEST_F(ReceiverDeathTest, AKeyFileWithoutANumberEndsTheProcess) {
-    WriteWhole(messageKeyFile, "abc");
+    WriteWhole(kMessageKeyFile, "abc");
     EXPECT_EXIT(RunReceiver(), ::testing::KilledBySignal(SIGABRT), "invalid_argument");
 }
+
+} // namespace vesk

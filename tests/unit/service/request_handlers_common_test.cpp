@@ -5,13 +5,15 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 class RequestHandlersCommonTest : public HandlerTest {
 protected:
     WorkResult Handle(int type, const std::string &data = "") {
         const RequestRecord record = Record(type, data);
         return HandleRequest(&record);
     }
-    const int handledTypes_[3] = {requestPinFiles, requestUnpinFiles, requestReloadPinBlocks};
+    const int handledTypes_[3] = {kRequestPinFiles, kRequestUnpinFiles, kRequestReloadPinBlocks};
 };
 
 TEST_F(RequestHandlersCommonTest, OtherTypesAreNotHandled) {
@@ -54,7 +56,7 @@ TEST_F(RequestHandlersCommonTest, WithoutTheSpaceItFails) {
 TEST_F(RequestHandlersCommonTest, WithoutACacheItFails) {
     FakeAppliance::caches.clear();
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't get cache's ssd path",
                                   "Can't get cache path",
@@ -66,7 +68,7 @@ TEST_F(RequestHandlersCommonTest, WithoutACacheItFails) {
 TEST_F(RequestHandlersCommonTest, FailuresNameTheirFunction) {
     FakeAppliance::caches.clear();
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleRequest"),
               (Messages{
                   "HandleRequest() [N] : ***** Can't get cache path",
@@ -79,7 +81,7 @@ TEST_F(RequestHandlersCommonTest, FailuresNameTheirFunction) {
 TEST_F(RequestHandlersCommonTest, ADeviceWithoutASizeLeavesAnEmptyBitmapToFree) {
     FakeAppliance::caches[0].cachePath = "/missing/device";
     CapturedLog log;
-    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestReloadPinBlocks), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Can't open device (/missing/device)",
                                   "Can't get block device path",
@@ -93,7 +95,7 @@ TEST_F(RequestHandlersCommonTest, ADeviceWithoutASizeLeavesAnEmptyBitmapToFree) 
 TEST_F(RequestHandlersCommonTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
     WriteWhole(bitmapFile_, "abc");
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Incorrect bitmap size (2), file size (3)",
                                   "Allocate bitmap failed",
@@ -105,7 +107,7 @@ TEST_F(RequestHandlersCommonTest, ABitmapFileThatIsTooLongFailsAndIsKept) {
 }
 
 TEST_F(RequestHandlersCommonTest, AListThatDoesNotParseFails) {
-    for (const int type : {requestPinFiles, requestUnpinFiles}) {
+    for (const int type : {kRequestPinFiles, kRequestUnpinFiles}) {
         CapturedLog log;
         EXPECT_EQ(Handle(type, "a#1;b%s"), WorkResult::Failed);
         EXPECT_EQ(log.Messages(), (Messages{
@@ -120,7 +122,7 @@ TEST_F(RequestHandlersCommonTest, AListThatDoesNotParseFails) {
 TEST_F(RequestHandlersCommonTest, AReloadReadsTheStoredBitmapsBlocks) {
     WriteWhole(bitmapFile_, std::string("\x28\x80", 2));
     CapturedLog log;
-    EXPECT_EQ(Handle(requestReloadPinBlocks, "what#is this"), WorkResult::Done); // has no files
+    EXPECT_EQ(Handle(kRequestReloadPinBlocks, "what#is this"), WorkResult::Done); // has no files
     EXPECT_EQ(device_->events,
               (Events{"read 196608+65536", "read 327680+65536", "read 983040+65536"}));
     EXPECT_EQ(log.Messages(), Messages{});
@@ -129,7 +131,7 @@ TEST_F(RequestHandlersCommonTest, AReloadReadsTheStoredBitmapsBlocks) {
 
 TEST_F(RequestHandlersCommonTest, AReloadWithoutABitmapFileReadsNothing) {
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestReloadPinBlocks), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{});
     EXPECT_EQ(MessagesOf(log, "ReloadPinBlocksToCache"),
               (Messages{
@@ -143,7 +145,7 @@ TEST_F(RequestHandlersCommonTest, AReloadIsInterrupted) {
     WriteWhole(bitmapFile_, std::string("\x28\x80", 2));
     device_->onRead = [this] { SetPending(); };
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Interrupted);
+    EXPECT_EQ(Handle(kRequestReloadPinBlocks), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, Events{"read 196608+65536"});
     EXPECT_EQ(MessagesOf(log, "HandleRequest"), Messages{"HandleRequest() [N]: Get Interruped"});
 }
@@ -152,10 +154,12 @@ TEST_F(RequestHandlersCommonTest, AReloadWhoseReadFailsFails) {
     WriteWhole(bitmapFile_, std::string("\x28\x80", 2));
     device_->onRead = [] { FakeLibc::Fail("read", EIO); };
     CapturedLog log;
-    EXPECT_EQ(Handle(requestReloadPinBlocks), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestReloadPinBlocks), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Read block error (seek = 196608 num bytes = 65536",
                                   "Read range to cache failed",
                                   "Handle request failed",
                               }));
 }
+
+} // namespace vesk

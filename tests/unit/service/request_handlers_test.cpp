@@ -4,6 +4,8 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 class RequestHandlersTest : public HandlerTest {
 protected:
     WorkResult Handle(int type, const std::string &data = "") {
@@ -14,7 +16,7 @@ protected:
 
 TEST_F(RequestHandlersTest, APinWritesTheBitmapThenSendsItThenReads) {
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1;share/b#2"), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1;share/b#2"), WorkResult::Done);
     EXPECT_EQ(device_->events, (Events{
                                    "bitmap 0902 file 0902",
                                    "read 8192+4096",
@@ -27,7 +29,7 @@ TEST_F(RequestHandlersTest, APinWritesTheBitmapThenSendsItThenReads) {
 
 TEST_F(RequestHandlersTest, APinAddsToTheStoredBitmap) {
     WriteWhole(bitmapFile_, std::string("\x80\x10", 2));
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Done);
     EXPECT_EQ(FirstOf(device_->events), "bitmap 8110 file 8110");
 }
 
@@ -39,7 +41,7 @@ TEST_F(RequestHandlersTest, LookupsGoByFolderAndInode) {
         table.entries = {FakeExtent(0, 8, 16)};
         return 0;
     };
-    EXPECT_EQ(Handle(requestPinFiles, "a#1;share/b#4294967295"), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1;share/b#4294967295"), WorkResult::Done);
     EXPECT_EQ(asked, (std::vector<std::string>{volume_ + " 1", volume_ + "/share 4294967295"}));
     EXPECT_EQ(FakeAppliance::askedPath, volume_);
 }
@@ -47,7 +49,7 @@ TEST_F(RequestHandlersTest, LookupsGoByFolderAndInode) {
 TEST_F(RequestHandlersTest, AGrownVolumesBitmapIsWrittenInItsNewSize) {
     WriteWhole(bitmapFile_, "\x80");
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Done);
     EXPECT_EQ(log.Messages(), Messages{"Bitmap size changed. Could be due to volume expansion"});
     EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "8100");
 }
@@ -55,7 +57,7 @@ TEST_F(RequestHandlersTest, AGrownVolumesBitmapIsWrittenInItsNewSize) {
 TEST_F(RequestHandlersTest, APinWhoseSecondFileFailsChangesNothing) {
     WriteWhole(bitmapFile_, std::string("\x80\x10", 2));
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1;x#77;b#2"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1;x#77;b#2"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Get mapping result fail.",
                                   "Can't add file (" + volume_ + "/x) inode (77) to bitmap",
@@ -69,7 +71,7 @@ TEST_F(RequestHandlersTest, APinWhoseSecondFileFailsChangesNothing) {
 TEST_F(RequestHandlersTest, APinWhoseBitmapCannotBeWrittenTellsTheDriverNothing) {
     FakeLibc::Fail("write", ENOSPC);
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Write bitmap file (" + bitmapFile_ + ") error",
                                   "",
@@ -82,7 +84,7 @@ TEST_F(RequestHandlersTest, APinWhoseBitmapCannotBeWrittenTellsTheDriverNothing)
 TEST_F(RequestHandlersTest, APinThatTheDriverRefusesLeavesTheFileChanged) {
     device_->failingRequest = 0xFECF;
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandlePinRequest"),
               Messages{"HandlePinRequest() [N] : ***** Can't send bitmap to driver"});
     EXPECT_EQ(MessagesOf(log, "HandleRequest"),
@@ -94,7 +96,7 @@ TEST_F(RequestHandlersTest, APinThatTheDriverRefusesLeavesTheFileChanged) {
 TEST_F(RequestHandlersTest, APinWhoseReadFailsHasChangedFileAndDriver) {
     device_->onRead = [] { FakeLibc::Fail("read", EIO); };
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1;b#2"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1;b#2"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Read block error (seek = 8192 num bytes = 4096",
                                   "Read fd to null failed (disk start sector = 16 num sectors = 8)",
@@ -107,7 +109,7 @@ TEST_F(RequestHandlersTest, APinWhoseReadFailsHasChangedFileAndDriver) {
 TEST_F(RequestHandlersTest, AnInterruptedPinHasChangedFileAndDriver) {
     device_->onRead = [this] { SetPending(); };
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestPinFiles, "b#2"), WorkResult::Interrupted);
+    EXPECT_EQ(Handle(kRequestPinFiles, "b#2"), WorkResult::Interrupted);
     EXPECT_EQ(device_->events, (Events{"bitmap 0802 file 0802", "read 196608+4096"}));
     EXPECT_EQ(MessagesOf(log, "HandleRequest"), Messages{"HandleRequest() [N]: Get Interruped"});
 }
@@ -115,14 +117,14 @@ TEST_F(RequestHandlersTest, AnInterruptedPinHasChangedFileAndDriver) {
 TEST_F(RequestHandlersTest, AnInterruptionIsSilentAtLevel1) {
     SetPending();
     CapturedLog log;
-    EXPECT_EQ(Handle(requestPinFiles, "a#1"), WorkResult::Interrupted);
+    EXPECT_EQ(Handle(kRequestPinFiles, "a#1"), WorkResult::Interrupted);
     EXPECT_EQ(log.Messages(), Messages{});
     EXPECT_EQ(device_->events, Events{"bitmap 0100 file 0100"});
 }
 
 TEST_F(RequestHandlersTest, APinOfNoFilesSendsTheBitmapAsItIs) {
     WriteWhole(bitmapFile_, std::string("\x80\x10", 2));
-    EXPECT_EQ(Handle(requestPinFiles, ""), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestPinFiles, ""), WorkResult::Done);
     EXPECT_EQ(device_->events, Events{"bitmap 8010 file 8010"});
 }
 
@@ -152,7 +154,7 @@ TEST_F(RequestHandlersTest, AnEntryWithoutAPathCanBeUnpinned) {
 TEST_F(RequestHandlersTest, AnUnpinWritesAndSendsTheBitmapThenReleasesTheRanges) {
     WriteWhole(bitmapFile_, "\xff\xff");
     CapturedLog log;
-    EXPECT_EQ(Handle(requestUnpinFiles, "share/b#2;a#1"), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "share/b#2;a#1"), WorkResult::Done);
     EXPECT_EQ(device_->events, (Events{"bitmap f6fd file f6fd", "ranges 384+8 1152+16 16+8"}));
     EXPECT_EQ(log.Messages(), Messages{});
 }
@@ -160,7 +162,7 @@ TEST_F(RequestHandlersTest, AnUnpinWritesAndSendsTheBitmapThenReleasesTheRanges)
 TEST_F(RequestHandlersTest, AnUnpinWhoseSecondFileFailsChangesNothing) {
     WriteWhole(bitmapFile_, "\xff\xff");
     CapturedLog log;
-    EXPECT_EQ(Handle(requestUnpinFiles, "a#1;x#77"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "a#1;x#77"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Get mapping result fail.",
                                   "Get mapping table of file (" + volume_ + "/x) failed",
@@ -175,7 +177,7 @@ TEST_F(RequestHandlersTest, AnUnpinWhoseBitmapCannotBeWrittenTellsTheDriverNothi
     WriteWhole(bitmapFile_, "\xff\xff");
     FakeLibc::Fail("write", ENOSPC);
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestUnpinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleUnpinRequest"),
               Messages{"HandleUnpinRequest() [N] : ***** Write bitmap failed"});
     EXPECT_EQ(device_->events, Events{});
@@ -185,7 +187,7 @@ TEST_F(RequestHandlersTest, AnUnpinThatTheDriverRefusesReleasesNothing) {
     WriteWhole(bitmapFile_, "\xff\xff");
     device_->failingRequest = 0xFECF;
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestUnpinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleUnpinRequest"),
               Messages{"HandleUnpinRequest() [N] : ***** Can't send bitmap to driver"});
     EXPECT_EQ(device_->events, Events{"bitmap feff file feff"});
@@ -195,7 +197,7 @@ TEST_F(RequestHandlersTest, ReleasedRangesThatAreRefusedFailTheUnpin) {
     WriteWhole(bitmapFile_, "\xff\xff");
     device_->failingRequest = 0xFED0;
     CapturedLog log(2);
-    EXPECT_EQ(Handle(requestUnpinFiles, "a#1"), WorkResult::Failed);
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "a#1"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleUnpinRequest"),
               Messages{"HandleUnpinRequest() [N] : ***** Can't send unpin information to driver"});
     EXPECT_EQ(device_->events, (Events{"bitmap feff file feff", "ranges 16+8"}));
@@ -204,5 +206,7 @@ TEST_F(RequestHandlersTest, ReleasedRangesThatAreRefusedFailTheUnpin) {
 TEST_F(RequestHandlersTest, AnUnpinIsNotInterrupted) {
     WriteWhole(bitmapFile_, "\xff\xff");
     SetPending();
-    EXPECT_EQ(Handle(requestUnpinFiles, "a#1"), WorkResult::Done);
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "a#1"), WorkResult::Done);
 }
+
+} // namespace vesk

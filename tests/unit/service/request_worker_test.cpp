@@ -9,6 +9,8 @@
 #include <sstream>
 #include <thread>
 
+namespace vesk {
+
 namespace {
 
 std::string Compact(const std::string &text) {
@@ -71,7 +73,7 @@ protected:
 TEST_F(RequestWorkerTest, ADoneRequestIsRecordedAndRemoved) {
     Queue({{"pinFiles", "a#1"}, {"reloadPinBlocks", "null"}});
     CapturedLog log;
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "0"), WorkResult::Done);
+    EXPECT_EQ(HandleAndModify(kRequestPinFiles, "a#1", "0"), WorkResult::Done);
     EXPECT_EQ(log.Messages(), Messages{});
     EXPECT_EQ(Compact(ReadWhole(config_)), Compact(R"({"nextRequestNum" : 2,
         "requestQueue" : ["1"], "requests" : {"1" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
@@ -83,7 +85,7 @@ TEST_F(RequestWorkerTest, ADoneRequestThatCannotBeRecordedStaysAndIsDone) {
     Queue({{"pinFiles", "a#1"}});
     const std::string before = ReadWhole(config_);
     CapturedLog log(2);
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "7"), WorkResult::Done);
+    EXPECT_EQ(HandleAndModify(kRequestPinFiles, "a#1", "7"), WorkResult::Done);
     EXPECT_EQ(
         MessagesOf(log, "HandleRequestAndModifyConfig"),
         (Messages{
@@ -96,7 +98,7 @@ TEST_F(RequestWorkerTest, ADoneRequestThatCannotBeRecordedStaysAndIsDone) {
 TEST_F(RequestWorkerTest, AFailedRequestIsDropped) {
     Queue({{"pinFiles", "x#77"}});
     CapturedLog log;
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "x#77", "0"), WorkResult::Failed);
+    EXPECT_EQ(HandleAndModify(kRequestPinFiles, "x#77", "0"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), (Messages{
                                   "Get mapping result fail.",
                                   "Can't add file (" + volume_ + "/x) inode (77) to bitmap",
@@ -111,7 +113,7 @@ TEST_F(RequestWorkerTest, AFailedRequestThatCannotBeDroppedStays) {
     Queue({{"pinFiles", "x#77"}});
     const std::string before = ReadWhole(config_);
     CapturedLog log(2);
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "x#77", "7"), WorkResult::Failed);
+    EXPECT_EQ(HandleAndModify(kRequestPinFiles, "x#77", "7"), WorkResult::Failed);
     EXPECT_EQ(MessagesOf(log, "HandleRequestAndModifyConfig"),
               (Messages{
                   "HandleRequestAndModifyConfig() [N]: Handle request (num = 7)",
@@ -141,7 +143,7 @@ TEST_F(RequestWorkerTest, AnInterruptedRequestStaysUntouched) {
     const std::string before = ReadWhole(config_);
     SetPending();
     CapturedLog log(2);
-    EXPECT_EQ(HandleAndModify(requestPinFiles, "a#1", "0"), WorkResult::Interrupted);
+    EXPECT_EQ(HandleAndModify(kRequestPinFiles, "a#1", "0"), WorkResult::Interrupted);
     EXPECT_EQ(MessagesOf(log, "HandleRequestAndModifyConfig"),
               (Messages{
                   "HandleRequestAndModifyConfig() [N]: Handle request (num = 0)",
@@ -260,3 +262,5 @@ TEST_F(RequestWorkerTest, ASelectionErrorEndsTheThread) {
                               }));
     EXPECT_EQ(FakeLibc::sleeps, 0);
 }
+
+} // namespace vesk

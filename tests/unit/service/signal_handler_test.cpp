@@ -10,9 +10,11 @@
 #include <thread>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const int endingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
+const int kEndingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
 
 // Which of the ending signals have the handler (bits 0 to 2) and which are blocked (bits 3 to 5).
 int SignalState() {
@@ -21,9 +23,9 @@ int SignalState() {
     int state = 0;
     for (int i = 0; i < 3; ++i) {
         struct sigaction action {};
-        sigaction(endingSignals[i], nullptr, &action);
+        sigaction(kEndingSignals[i], nullptr, &action);
         state |= action.sa_handler == SignalHandler ? 1 << i : 0;
-        state |= sigismember(&blocked, endingSignals[i]) == 1 ? 8 << i : 0;
+        state |= sigismember(&blocked, kEndingSignals[i]) == 1 ? 8 << i : 0;
     }
     return state;
 }
@@ -60,7 +62,7 @@ TEST_F(SignalHandlerTest, AFailureEndsItAndLeavesTheHandlersBeforeIt) {
 
 TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten) {
     SKIP_WHERE_SIGNALS_ARE_EMULATED();
-    for (const int number : endingSignals) {
+    for (const int number : kEndingSignals) {
         ChildProcess child({2}, [] {
             LogNotice("still in the buffer");
             SetSignalHandler();
@@ -142,3 +144,5 @@ TEST_F(SignalHandlerTest, TheLastServiceThreadEndsTheProcess) {
     EXPECT_EQ(child.AwaitEnd(), 0);
     EXPECT_EQ(child.Messages(), Messages{"one is left"});
 }
+
+} // namespace vesk

@@ -20,6 +20,8 @@
 #include <thread>
 #include <unistd.h>
 
+namespace vesk {
+
 // The whole service in a process of its own.
 class StartServiceTest : public HandlerTest {
 protected:
@@ -30,7 +32,7 @@ protected:
         }
         SKIP_WITHOUT_PRIVATE_WORLD();
         EmptyPrivateWorld();
-        queueId_ = MsgQueueGet(messageKeyFile);
+        queueId_ = MsgQueueGet(kMessageKeyFile);
     }
     void TearDown() override {
         HandlerTest::TearDown();
@@ -77,9 +79,9 @@ protected:
     }
     // The receiver has taken a message and waits for the lock to store it.
     void SendMessageToHold(ChildProcess *service) const {
-        Send(requestReloadPinBlocks, volume_);
+        Send(kRequestReloadPinBlocks, volume_);
         EXPECT_TRUE(service->AwaitOutput("Choosing"));
-        Send(requestReloadPinBlocks, volume_);
+        Send(kRequestReloadPinBlocks, volume_);
         EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 0; }));
     }
     static bool Contains(const Messages &all, const std::string &message) {
@@ -97,7 +99,7 @@ TEST_F(StartServiceTest, ARequestIsReceivedStoredAndCarriedOut) {
     const auto inode = static_cast<uint32_t>(status.st_ino);
     extents_[inode] = {FakeExtent(0, 8, 16)};
     ChildProcess service({1, false, true}, Service());
-    Send(requestPinFiles, volume_, volume_ + "/a");
+    Send(kRequestPinFiles, volume_, volume_ + "/a");
     EXPECT_TRUE(service.AwaitOutput("OK \n"));
     service.Signal(SIGTERM);
     EXPECT_EQ(service.AwaitEnd(), 0);
@@ -111,7 +113,7 @@ TEST_F(StartServiceTest, ARequestIsReceivedStoredAndCarriedOut) {
 TEST_F(StartServiceTest, EachSignalEndsTheIdleServiceWithItsOutputWritten) {
     for (const int number : {SIGTERM, SIGINT, SIGQUIT}) {
         ChildProcess service({2}, Service());
-        Send(requestReloadPinBlocks, "/volume9"); // of no cache: stored, woken for and dropped
+        Send(kRequestReloadPinBlocks, "/volume9"); // of no cache: stored, woken for and dropped
         EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
         service.Signal(number);
         EXPECT_EQ(service.AwaitEnd(), 0);
@@ -128,7 +130,7 @@ TEST_F(StartServiceTest, EachSignalEndsTheIdleServiceWithItsOutputWritten) {
         std::filesystem::remove(config_);
     }
     EXPECT_NE(CountMessages(queueId_), -1); // queue and key file stay
-    EXPECT_NE(ReadWhole(messageKeyFile), "");
+    EXPECT_NE(ReadWhole(kMessageKeyFile), "");
 }
 
 TEST_F(StartServiceTest, ASignalEndsTheServiceInTheMiddleOfARequest) {
@@ -143,7 +145,7 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceInTheMiddleOfARequest) {
     };
     {
         ChildProcess service({2}, Service());
-        Send(requestReloadPinBlocks, volume_);
+        Send(kRequestReloadPinBlocks, volume_);
         char byte = 0;
         EXPECT_EQ(syscall(SYS_read, marker[0], &byte, 1), 1);
         service.Signal(SIGTERM);
@@ -161,7 +163,7 @@ TEST_F(StartServiceTest, ASignalLetsTheMessageInHandBeStoredAndNoOtherBeTaken) {
     // machine's matter.
     ChildProcess service({1, false, true}, ServiceThatChoosesUntilReleased(100));
     SendMessageToHold(&service);
-    Send(requestReloadPinBlocks, volume_);
+    Send(kRequestReloadPinBlocks, volume_);
     service.Signal(SIGTERM);
     // By the signal that calls the receiver to rest.
     ASSERT_TRUE(ChildProcess::Await([&] { return service.Catches(SIGUSR1); }));
@@ -184,7 +186,7 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceWhoseOutputNobodyReads) {
     SKIP_WHERE_SIGNALS_COME_LATE();
     ChildProcess service({2, true}, Service());
     for (int i = 0; i < 200; ++i) {
-        Send(requestAddPendingSpace, "/volume" + std::to_string(i));
+        Send(kRequestAddPendingSpace, "/volume" + std::to_string(i));
     }
     // It sleeps though messages wait: it cannot write.
     ASSERT_TRUE(ChildProcess::Await([&] {
@@ -198,8 +200,8 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceWhoseOutputNobodyReads) {
 TEST_F(StartServiceTest, ASignalEndsTheServiceBeforeItHasItsQueue) {
     // A key file that is a FIFO holds the receiver up at reading the key of the existing queue.
     EmptyPrivateWorld();
-    ASSERT_EQ(mkfifo(messageKeyFile, 0600), 0);
-    ASSERT_NE(msgget(ftok(messageKeyFile, 'x'), IPC_CREAT | 0600), -1);
+    ASSERT_EQ(mkfifo(kMessageKeyFile, 0600), 0);
+    ASSERT_NE(msgget(ftok(kMessageKeyFile, 'x'), IPC_CREAT | 0600), -1);
     for (const int number : {SIGTERM, SIGINT, SIGQUIT}) {
         ChildProcess service({2, false, true}, Service());
         EXPECT_TRUE(service.AwaitOutput("Message queue exist, try to get key"));
@@ -225,7 +227,7 @@ TEST_F(StartServiceTest, ASignalRightAfterTheHandlersAreInstalledEndsTheService)
 }
 
 TEST_F(StartServiceTest, WithoutItsQueueTheReceiverEndsAndTheWorkerGoesOn) {
-    WriteWhole(messageKeyFile, "");
+    WriteWhole(kMessageKeyFile, "");
     WriteWhole(config_, R"({"requestQueue" : ["0"], "requests" :
         {"0" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
                             volume_ + R"("}}})");
@@ -243,7 +245,7 @@ TEST_F(StartServiceTest, ASelectionErrorEndsTheWorkerAndTheReceiverGoesOn) {
     WriteWhole(config_, R"({"requestQueue" : ["7"]})");
     ChildProcess service({1, false, true}, Service());
     EXPECT_TRUE(service.AwaitOutput("Get request error"));
-    Send(requestReloadPinBlocks, "/volume1");
+    Send(kRequestReloadPinBlocks, "/volume1");
     EXPECT_TRUE(AwaitConfig("/volume1"));
     EXPECT_TRUE(service.Runs());
     service.Signal(SIGTERM);
@@ -257,7 +259,7 @@ TEST_F(StartServiceTest, ASelectionErrorEndsTheWorkerAndTheReceiverGoesOn) {
 TEST_F(StartServiceTest, WhenBothThreadsHaveEndedTheProcessEndsWithStatus0) {
     WriteWhole(config_, "[]");
     ChildProcess service({2}, Service());
-    Send(requestReloadPinBlocks, "/volume1");
+    Send(kRequestReloadPinBlocks, "/volume1");
     EXPECT_EQ(service.AwaitEnd(), 0);
     const Messages messages = service.Messages();
     EXPECT_EQ(LastOf(Of(messages, "GetRequests")), "GetRequests() [N] : -----");
@@ -298,3 +300,5 @@ TEST_F(StartServiceTest, WithoutItsWorkerItDoesNotStart) {
                   "StartService() [N] : ***** Can't create thread: Cannot allocate memory",
               }));
 }
+
+} // namespace vesk

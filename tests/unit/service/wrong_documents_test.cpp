@@ -9,6 +9,8 @@
 #include <sys/stat.h>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 struct Operation {
@@ -19,8 +21,8 @@ struct Operation {
 };
 
 const std::vector<Operation> &Operations() {
-    static const RequestRecord reload = MakeRecord(requestReloadPinBlocks, "/volume1");
-    static const RequestRecord pin = MakeRecord(requestPinFiles, "/volume1", "a#1");
+    static const RequestRecord reload = MakeRecord(kRequestReloadPinBlocks, "/volume1");
+    static const RequestRecord pin = MakeRecord(kRequestPinFiles, "/volume1", "a#1");
     static const std::vector<Operation> operations = {
         {"add", -1, "Can't read data from config file (%)",
          [](const char *path) { return ConfigAddRequest(path, &reload); }},
@@ -122,7 +124,7 @@ TEST_F(WrongDocumentsTest, WhatDoesNotParseIsRefused) {
 }
 
 TEST_F(WrongDocumentsTest, EveryTruncationIsRefused) {
-    const std::string whole = exampleDocument;
+    const std::string whole = kExampleDocument;
     for (size_t length = 0; length < whole.size() - 1; ++length) { // the last byte is a line feed
         Store(whole.substr(0, length));
         ExpectRefusedByAll();
@@ -138,7 +140,7 @@ TEST_F(WrongDocumentsTest, ADirectoryIsRefused) {
 }
 
 TEST_F(WrongDocumentsTest, AnUnreadableFileIsRefused) {
-    Store(exampleDocument);
+    Store(kExampleDocument);
     chmod(folder_.Path().c_str(), 0755);
     chmod(path_.c_str(), 0);
     for (const Operation &operation : Operations()) {
@@ -149,7 +151,7 @@ TEST_F(WrongDocumentsTest, AnUnreadableFileIsRefused) {
         }
         EXPECT_EQ(FirstOf(log.Messages()), "Can't open file " + path_);
         chmod(path_.c_str(), 0600);
-        EXPECT_EQ(Stored(), exampleDocument);
+        EXPECT_EQ(Stored(), kExampleDocument);
         chmod(path_.c_str(), 0);
     }
 }
@@ -166,3 +168,5 @@ TEST_F(WrongDocumentsTest, InvalidUtf8ThrowsNothing) {
         EXPECT_NO_THROW(operation.run(path_.c_str())) << operation.name;
     }
 }
+
+} // namespace vesk

@@ -11,11 +11,13 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
-const bool privateMounts = UsePrivateMounts();
-const char controlFile[] = "/tmp/veskcachepinfiletool.debug";
-const char file[] = "/volume1/photo/a.jpg";
+const bool kPrivateMounts = UsePrivateMounts();
+const char kControlFile[] = "/tmp/veskcachepinfiletool.debug";
+const char kFile[] = "/volume1/photo/a.jpg";
 
 class FileSimulateGetMappingFailedTest : public LeakCheckedTest {
 protected:
@@ -27,11 +29,11 @@ protected:
         if (!PrivateMountsMissing().empty()) {
             return;
         }
-        std::filesystem::remove(controlFile);
+        std::filesystem::remove(kControlFile);
         LeakCheckedTest::TearDown();
     }
-    static int WithControl(const std::string &content, const std::string &path = file) {
-        WriteWhole(controlFile, content);
+    static int WithControl(const std::string &content, const std::string &path = kFile) {
+        WriteWhole(kControlFile, content);
         return FileSimulateGetMappingFailed(path);
     }
 };
@@ -40,7 +42,7 @@ protected:
 
 TEST_F(FileSimulateGetMappingFailedTest, NothingFailsWithoutAControlFile) {
     CapturedLog log(3);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
     EXPECT_EQ(FileSimulateGetMappingFailed(""), 0);
     EXPECT_EQ(log.Text(), "");
 }
@@ -94,35 +96,35 @@ TEST_F(FileSimulateGetMappingFailedTest, ControlFileIsReadAnewEveryTime) {
     CapturedLog log;
     EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
     EXPECT_EQ(WithControl("/volume1/photo/b.jpg\n"), 0);
-    std::filesystem::remove(controlFile);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    std::filesystem::remove(kControlFile);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, LinkToAControlFileIsFollowed) {
     CapturedLog log;
     const TempDir folder;
     WriteWhole(folder.Path("control"), "/volume1/photo/a.jpg\n");
-    ASSERT_EQ(symlink(folder.Path("control").c_str(), controlFile), 0);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 1);
+    ASSERT_EQ(symlink(folder.Path("control").c_str(), kControlFile), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 1);
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, FifoDoesNotBlockAndCountsAsAbsent) {
     CapturedLog log(3);
-    ASSERT_EQ(mkfifo(controlFile, 0666), 0);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    ASSERT_EQ(mkfifo(kControlFile, 0666), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
     EXPECT_EQ(log.Text(), "");
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, FolderSocketAndDeviceCountAsAbsent) {
     CapturedLog log(3);
-    ASSERT_EQ(mkdir(controlFile, 0777), 0);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
-    std::filesystem::remove(controlFile);
-    ASSERT_EQ(mknod(controlFile, S_IFSOCK | 0666, 0), 0);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
-    std::filesystem::remove(controlFile);
-    ASSERT_EQ(symlink("/dev/zero", controlFile), 0);
-    EXPECT_EQ(FileSimulateGetMappingFailed(file), 0);
+    ASSERT_EQ(mkdir(kControlFile, 0777), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
+    std::filesystem::remove(kControlFile);
+    ASSERT_EQ(mknod(kControlFile, S_IFSOCK | 0666, 0), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
+    std::filesystem::remove(kControlFile);
+    ASSERT_EQ(symlink("/dev/zero", kControlFile), 0);
+    EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
     EXPECT_EQ(log.Text(), "");
 }
 
@@ -133,13 +135,13 @@ TEST_F(FileSimulateGetMappingFailedTest, ControlFileThatCannotBeReadCountsAsAbse
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, ControlFileWithoutPermissionCountsAsAbsent) {
-    WriteWhole(controlFile, "/volume1/photo/a.jpg\n");
-    ASSERT_EQ(chmod(controlFile, 0600), 0);
+    WriteWhole(kControlFile, "/volume1/photo/a.jpg\n");
+    ASSERT_EQ(chmod(kControlFile, 0600), 0);
     fflush(stdout);
     const pid_t child = fork();
     if (child == 0) {
         const CapturedLog log;
-        _exit(setuid(65534) == 0 ? FileSimulateGetMappingFailed(file) : 99);
+        _exit(setuid(65534) == 0 ? FileSimulateGetMappingFailed(kFile) : 99);
     }
     int status = -1; // of no process, where there is none
     waitpid(child, &status, 0);
@@ -158,3 +160,5 @@ TEST_F(FileSimulateGetMappingFailedTest, ComparisonIsToldAtLevel3) {
                   "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
                   "failed failed=/other ret=0"}));
 }
+
+} // namespace vesk

@@ -7,11 +7,13 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 using Messages = std::vector<std::string>;
 
-const std::string file = "/volume1/photo/a.jpg";
+const std::string kFile = "/volume1/photo/a.jpg";
 
 class FileExtentsTest : public LeakCheckedTest {
 protected:
@@ -38,7 +40,7 @@ protected:
             return result;
         };
     }
-    int Lookup(const std::string &path = file) {
+    int Lookup(const std::string &path = kFile) {
         return GetMappingTableFromFile(&table, "/volume1", path, 4711);
     }
 
@@ -68,7 +70,7 @@ TEST_F(FileExtentsTest, AsksTheMountPathsDeviceForTheInodeInTheFilesFolder) {
 TEST_F(FileExtentsTest, LargestInodeIsNotExtended) {
     CapturedLog log(2);
     AnswerWithExtents({1});
-    EXPECT_EQ(GetMappingTableFromFile(&table, "/volume1", file, 4294967295U), 0);
+    EXPECT_EQ(GetMappingTableFromFile(&table, "/volume1", kFile, 4294967295U), 0);
     EXPECT_EQ(askedInode, 4294967295U);
     EXPECT_EQ(FirstOf(log.Messages()), "GetMappingTableFromFile() [N]: Start for file "
                                        "(/volume1/photo/a.jpg), inode = 4294967295");
@@ -220,7 +222,7 @@ TEST_F(FileExtentsTest, VolumeWithoutDeviceIsAnErrorWithTheFilesPath) {
 
 TEST_F(FileExtentsFaultTest, SimulatedFailureFailsTheLookupThatSucceeded) {
     SKIP_WITHOUT_PRIVATE_MOUNTS();
-    WriteWhole("/tmp/veskcachepinfiletool.debug", file + "\n");
+    WriteWhole("/tmp/veskcachepinfiletool.debug", kFile + "\n");
     AnswerWithExtents({2});
     CapturedLog log(2);
     EXPECT_EQ(Lookup(), -1);
@@ -236,3 +238,5 @@ TEST_F(FileExtentsFaultTest, SimulatedFailureFailsTheLookupThatSucceeded) {
     std::filesystem::remove("/tmp/veskcachepinfiletool.debug");
     EXPECT_EQ(Lookup(), 0);
 }
+
+} // namespace vesk

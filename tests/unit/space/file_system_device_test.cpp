@@ -7,6 +7,8 @@
 #include <gtest/gtest.h>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 using Messages = std::vector<std::string>;
@@ -55,3 +57,5 @@ TEST_F(CreateDeviceTest, EveryOtherResultGoesOn) {
     }
     EXPECT_EQ(log.Text(), "");
 }
+
+} // namespace vesk

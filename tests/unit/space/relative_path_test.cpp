@@ -6,9 +6,11 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
-const char refused[] = "(refused)";
+const char kRefused[] = "(refused)";
 
 std::string Relative(const std::string &mountPath, const std::string &filePath) {
     CapturedLog log;
@@ -16,7 +18,7 @@ std::string Relative(const std::string &mountPath, const std::string &filePath) 
     EXPECT_EQ(log.Text(), path ? ""
                                : "tool: Failed to Get relative path (Volume path=" + mountPath +
                                      " File path=" + filePath + "\n");
-    return path ? path.get() : refused;
+    return path ? path.get() : kRefused;
 }
 
 std::string TopDir(const std::string &path, size_t size = 512) {
@@ -26,7 +28,7 @@ std::string TopDir(const std::string &path, size_t size = 512) {
     EXPECT_EQ(out.back(), '#'); // nothing behind the buffer
     EXPECT_EQ(log.Text(),
               result == 0 ? "" : "tool: Get top directory of file (" + path + ") error\n\n");
-    return result == 0 ? out.c_str() : refused;
+    return result == 0 ? out.c_str() : kRefused;
 }
 
 using RelativePathTest = LeakCheckedTest;
@@ -42,20 +44,20 @@ TEST_F(RelativePathTest, IsWhatStandsBehindTheMountPathAndASlash) {
 }
 
 TEST_F(RelativePathTest, FileOutsideTheMountPathIsRefused) {
-    EXPECT_EQ(Relative("/volume1", "/volume2/a"), refused);
-    EXPECT_EQ(Relative("/volume1", "/volume10/a"), refused);
-    EXPECT_EQ(Relative("/volume1", "/volume"), refused);
-    EXPECT_EQ(Relative("/volume1", "volume1/a"), refused);
-    EXPECT_EQ(Relative("/volume1", ""), refused);
+    EXPECT_EQ(Relative("/volume1", "/volume2/a"), kRefused);
+    EXPECT_EQ(Relative("/volume1", "/volume10/a"), kRefused);
+    EXPECT_EQ(Relative("/volume1", "/volume"), kRefused);
+    EXPECT_EQ(Relative("/volume1", "volume1/a"), kRefused);
+    EXPECT_EQ(Relative("/volume1", ""), kRefused);
 }
 
 TEST_F(RelativePathTest, TheMountPathItselfIsRefused) {
-    EXPECT_EQ(Relative("/volume1", "/volume1"), refused);
-    EXPECT_EQ(Relative("/volume1", "/volume1/"), refused);
+    EXPECT_EQ(Relative("/volume1", "/volume1"), kRefused);
+    EXPECT_EQ(Relative("/volume1", "/volume1/"), kRefused);
 }
 
 TEST_F(RelativePathTest, MountPathWithATrailingSlashNeverMatches) {
-    EXPECT_EQ(Relative("/volume1/", "/volume1/a"), refused);
+    EXPECT_EQ(Relative("/volume1/", "/volume1/a"), kRefused);
 }
 
 TEST_F(RelativePathTest, PathIsCutAtTheFirstWhiteSpace) {
@@ -67,19 +69,19 @@ TEST_F(RelativePathTest, PathIsCutAtTheFirstWhiteSpace) {
 
 TEST_F(RelativePathTest, LeadingWhiteSpaceIsSkipped) {
     EXPECT_EQ(Relative("/volume1", "/volume1/ \t\na b"), "a");
-    EXPECT_EQ(Relative("/volume1", "/volume1/  \t"), refused);
+    EXPECT_EQ(Relative("/volume1", "/volume1/  \t"), kRefused);
 }
 
 TEST_F(RelativePathTest, MountPathIsComparedLiterally) {
     EXPECT_EQ(Relative("/vol%s%n 1", "/vol%s%n 1/a"), "a");
-    EXPECT_EQ(Relative("/vol 1", "/vol  1/a"), refused);
-    EXPECT_EQ(Relative("/vol%%1", "/vol%1/a"), refused);
+    EXPECT_EQ(Relative("/vol 1", "/vol  1/a"), kRefused);
+    EXPECT_EQ(Relative("/vol%%1", "/vol%1/a"), kRefused);
     EXPECT_EQ(Relative("/" + std::string(2000, 'm'), "/" + std::string(2000, 'm') + "/a"), "a");
 }
 
 TEST_F(RelativePathTest, HoldsUpTo511CharactersAndRefusesMore) {
     EXPECT_EQ(Relative("/v", "/v/" + std::string(511, 'x')), std::string(511, 'x'));
-    EXPECT_EQ(Relative("/v", "/v/" + std::string(512, 'x')), refused);
+    EXPECT_EQ(Relative("/v", "/v/" + std::string(512, 'x')), kRefused);
     EXPECT_EQ(Relative("/v", "/v/" + std::string(511, 'x') + " y"), std::string(511, 'x'));
 }
 
@@ -126,10 +128,10 @@ TEST_F(TopDirTest, IsASlashAndTheFirstComponent) {
 }
 
 TEST_F(TopDirTest, PathWithoutAFirstComponentIsRefused) {
-    EXPECT_EQ(TopDir("volume1/a"), refused);
-    EXPECT_EQ(TopDir("/"), refused);
-    EXPECT_EQ(TopDir("//volume1"), refused);
-    EXPECT_EQ(TopDir(""), refused);
+    EXPECT_EQ(TopDir("volume1/a"), kRefused);
+    EXPECT_EQ(TopDir("/"), kRefused);
+    EXPECT_EQ(TopDir("//volume1"), kRefused);
+    EXPECT_EQ(TopDir(""), kRefused);
 }
 
 TEST_F(TopDirTest, IsCutToTheCallersBuffer) {
@@ -140,7 +142,7 @@ TEST_F(TopDirTest, IsCutToTheCallersBuffer) {
 
 TEST_F(TopDirTest, ComponentOf1023CharactersIsTheLongest) {
     EXPECT_EQ(TopDir("/" + std::string(1023, 'x') + "/a", 2000), "/" + std::string(1023, 'x'));
-    EXPECT_EQ(TopDir("/" + std::string(1024, 'x') + "/a", 2000), refused);
+    EXPECT_EQ(TopDir("/" + std::string(1024, 'x') + "/a", 2000), kRefused);
 }
 
 TEST_F(TopDirTest, MissingArgumentsAreRefused) {
@@ -153,3 +155,5 @@ TEST_F(TopDirTest, MissingArgumentsAreRefused) {
     EXPECT_EQ(log.Count("FileGetTopDir() [N] : ***** Incorrect parameter"), 3);
     EXPECT_EQ(log.Lines().size(), 3U);
 }
+
+} // namespace vesk

@@ -8,6 +8,8 @@
 #include <cstring>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 int copiesLeft = -1; // negative: memory never runs out
@@ -78,3 +80,5 @@ TEST_F(SpaceBitmapPathTest, RunningOutOfMemoryIsAnError) {
     copiesLeft = -1;
     EXPECT_EQ(log.Text(), "tool: Can't get bitmap path\n");
 }
+
+} // namespace vesk

@@ -8,6 +8,8 @@
 
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
 using Messages = std::vector<std::string>;
@@ -316,3 +318,5 @@ TEST_F(SpaceCacheTest, EveryLookUpByUuidTellsItsCause) {
     EXPECT_EQ(SpaceHasCacheAndSupportPinByUUID("uuid-1", &cause), 1);
     EXPECT_EQ(cause, SpaceCause::Found);
 }
+
+} // namespace vesk

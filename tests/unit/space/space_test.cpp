@@ -7,13 +7,15 @@
 #include <cstring>
 #include <gtest/gtest.h>
 
+namespace vesk {
+
 namespace {
 
-const char none[] = "(none)";
+const char kNone[] = "(none)";
 
 std::string Taken(char *text) {
     const MallocText owner(text);
-    return text == nullptr ? none : text;
+    return text == nullptr ? kNone : text;
 }
 
 std::string ReferencePathOf(const char *uuid) {
@@ -49,11 +51,11 @@ TEST_F(SpaceTest, IsFoundByUuidAndByReferencePath) {
 TEST_F(SpaceTest, ProperPrefixAndLongerTextDoNotMatch) {
     CapturedLog log;
     for (const char *uuid : {"uuid", "uuid-", "uuid-100", ""}) {
-        EXPECT_EQ(ReferencePathOf(uuid), none);
+        EXPECT_EQ(ReferencePathOf(uuid), kNone);
     }
     for (const char *path : {"/volume", "/volume100", "/volume1/", ""}) {
-        EXPECT_EQ(DevicePathOf(path), none);
-        EXPECT_EQ(UuidOf(path), none);
+        EXPECT_EQ(DevicePathOf(path), kNone);
+        EXPECT_EQ(UuidOf(path), kNone);
     }
     EXPECT_EQ(ReferencePathOf("uuid-10"), "/volume10");
     EXPECT_EQ(DevicePathOf("/volume10"), "/dev/space10");
@@ -82,7 +84,7 @@ TEST_F(SpaceTest, EveryLookupAsksForScope1) {
 
 TEST_F(SpaceTest, EveryLookupEnumeratesAfresh) {
     CapturedLog log;
-    EXPECT_EQ(UuidOf("/volume3"), none);
+    EXPECT_EQ(UuidOf("/volume3"), kNone);
     FakeAppliance::spaces.push_back({"/dev/space3", "/volume3", "uuid-3"});
     EXPECT_EQ(UuidOf("/volume3"), "uuid-3");
 }
@@ -90,18 +92,18 @@ TEST_F(SpaceTest, EveryLookupEnumeratesAfresh) {
 TEST_F(SpaceTest, NoSpaceAtAllIsNoError) {
     CapturedLog log;
     FakeAppliance::spaces.clear();
-    EXPECT_EQ(ReferencePathOf("uuid-1"), none);
-    EXPECT_EQ(DevicePathOf("/volume1"), none);
-    EXPECT_EQ(UuidOf("/volume1"), none);
+    EXPECT_EQ(ReferencePathOf("uuid-1"), kNone);
+    EXPECT_EQ(DevicePathOf("/volume1"), kNone);
+    EXPECT_EQ(UuidOf("/volume1"), kNone);
     EXPECT_EQ(log.Text(), "");
 }
 
 TEST_F(SpaceTest, FailedEnumerationIsAnErrorAndTheListIsReleased) {
     FakeAppliance::enumResult = -1;
     CapturedLog log(2);
-    EXPECT_EQ(ReferencePathOf("uuid-1"), none);
-    EXPECT_EQ(DevicePathOf("/volume1"), none);
-    EXPECT_EQ(UuidOf("/volume1"), none);
+    EXPECT_EQ(ReferencePathOf("uuid-1"), kNone);
+    EXPECT_EQ(DevicePathOf("/volume1"), kNone);
+    EXPECT_EQ(UuidOf("/volume1"), kNone);
     EXPECT_EQ(log.Messages(),
               (std::vector<std::string>{"SpaceGetReferencePath() [N] : ***** Can't enum spaces",
                                         "SpaceGetDevicePath() [N] : ***** Can't enum spaces",
@@ -122,14 +124,14 @@ TEST_F(SpaceTest, SpaceWhoseUuidCannotBeReadIsAnErrorAndDoesNotMatch) {
     EXPECT_EQ(log.Messages(), (std::vector<std::string>{
                                   "SpaceGetReferencePath() [N] : ***** Get space uuid failed",
                                   "SpaceGetReferencePath() [N]: Get reference path = /volume2"}));
-    EXPECT_EQ(ReferencePathOf(""), none);
-    EXPECT_EQ(UuidOf("/volume1"), none);
+    EXPECT_EQ(ReferencePathOf(""), kNone);
+    EXPECT_EQ(UuidOf("/volume1"), kNone);
 }
 
 TEST_F(SpaceTest, MissingReferencePathEndsTheDevicePathLookup) {
     CapturedLog log(2);
     FakeAppliance::spaces[1].referencePath = "";
-    EXPECT_EQ(DevicePathOf("/volume2"), none);
+    EXPECT_EQ(DevicePathOf("/volume2"), kNone);
     EXPECT_EQ(log.Messages(),
               std::vector<std::string>{
                   "SpaceGetDevicePath() [N] : ***** Reference path should not be null"});
@@ -184,16 +186,16 @@ TEST_F(SpaceTest, CauseOfAFailureIsToldBesideItsMessage) {
     SpaceCause cause = SpaceCause::Found;
     FakeAppliance::spaces[0].uuid = "";
     FakeAppliance::spaces[1].referencePath = "";
-    EXPECT_EQ(Taken(SpaceGetUUID("/volume1", &cause)), none);
+    EXPECT_EQ(Taken(SpaceGetUUID("/volume1", &cause)), kNone);
     EXPECT_EQ(cause, SpaceCause::NoUuid);
-    EXPECT_EQ(Taken(SpaceGetReferencePath("uuid-1", &cause)), none);
+    EXPECT_EQ(Taken(SpaceGetReferencePath("uuid-1", &cause)), kNone);
     EXPECT_EQ(cause, SpaceCause::NoSpace);
-    EXPECT_EQ(Taken(SpaceGetDevicePath("/volume2", &cause)), none);
+    EXPECT_EQ(Taken(SpaceGetDevicePath("/volume2", &cause)), kNone);
     EXPECT_EQ(cause, SpaceCause::NoReferencePath);
     FakeAppliance::enumResult = -1;
     for (const auto &lookUp : {SpaceGetReferencePath, SpaceGetDevicePath, SpaceGetUUID}) {
         cause = SpaceCause::Found;
-        EXPECT_EQ(Taken(lookUp("/volume2", &cause)), none);
+        EXPECT_EQ(Taken(lookUp("/volume2", &cause)), kNone);
         EXPECT_EQ(cause, SpaceCause::CannotEnumerate);
     }
     EXPECT_EQ(log.Text(), "tool: Get space uuid failed\n"
@@ -212,3 +214,5 @@ TEST_F(SpaceTest, TakenTextHasAnOwnerAndAMissingOneAMessageAtTheCallersPlace) {
     EXPECT_EQ(owner, nullptr);
     EXPECT_EQ(log.Messages(), std::vector<std::string>{"Caller() [N] : ***** No text"});
 }
+
+} // namespace vesk

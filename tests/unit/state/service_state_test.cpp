@@ -13,6 +13,8 @@
 #include <unistd.h>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 int Add(std::string path) {
@@ -193,3 +195,5 @@ TEST_F(ServiceStateTest, ReadersWithoutTheLockSeeWholeLists) {
     }
     EXPECT_EQ(missed, 0);
 }
+
+} // namespace vesk

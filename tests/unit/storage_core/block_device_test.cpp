@@ -8,6 +8,8 @@
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
+namespace vesk {
+
 namespace {
 
 class BlockDevice : public testing::Test {
@@ -98,3 +100,5 @@ TEST_F(BlockDevice, ProbeTellsTypeAndUuid) {
 }
 
 } // namespace
+
+} // namespace vesk

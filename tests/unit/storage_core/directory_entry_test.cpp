@@ -12,6 +12,8 @@
 #include <utility>
 #include <vector>
 
+namespace vesk {
+
 namespace {
 
 using Listing = std::vector<std::pair<uint64_t, const char *>>;
@@ -147,3 +149,5 @@ TEST(DirectoryOpenFile, FindsRealFilesByTheLow32Bits) {
 }
 
 } // namespace
+
+} // namespace vesk

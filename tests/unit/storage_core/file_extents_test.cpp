@@ -15,6 +15,7 @@
 #include <ostream>
 #include <sstream>
 
+// Found by the type that they are of, which is in no namespace.
 bool operator==(const FileMappingEntry &a, const FileMappingEntry &b) {
     return a.fileStartSector == b.fileStartSector && a.numSectors == b.numSectors &&
            a.deviceStartSector == b.deviceStartSector && a.flag == b.flag;
@@ -24,6 +25,8 @@ std::ostream &operator<<(std::ostream &out, const FileMappingEntry &entry) {
     return out << "{file " << entry.fileStartSector << " + " << entry.numSectors << " device "
                << entry.deviceStartSector << " flag " << entry.flag << "}";
 }
+
+namespace vesk {
 
 namespace {
 
@@ -321,3 +324,5 @@ INSTANTIATE_TEST_SUITE_P(Real, FileExtentsInline, testing::Values("inline"),
                          [](const auto &test) { return std::string(test.param); });
 
 } // namespace
+
+} // namespace vesk

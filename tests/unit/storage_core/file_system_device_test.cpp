@@ -13,6 +13,8 @@
 #include <filesystem>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 MountEntry Mount(const std::string &type, const std::string &options) {
@@ -229,3 +231,5 @@ TEST_F(FileSystem, RefusesAFileOfAnotherDevice) {
 }
 
 } // namespace
+
+} // namespace vesk

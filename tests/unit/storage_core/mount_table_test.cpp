@@ -6,6 +6,8 @@
 
 #include <sys/sysmacros.h>
 
+namespace vesk {
+
 namespace {
 
 // The table that this text gives.
@@ -102,3 +104,5 @@ TEST(MountTable, OptionValues) {
 }
 
 } // namespace
+
+} // namespace vesk

@@ -14,6 +14,8 @@
 #include <filesystem>
 #include <memory>
 
+namespace vesk {
+
 namespace {
 
 // Stands for the machine's device nodes: every source in /dev exists but /dev/root, which is vda.
@@ -194,3 +196,5 @@ TEST(VESKSpaceInfoEnum, NullArguments) {
 }
 
 } // namespace
+
+} // namespace vesk

@@ -6,6 +6,8 @@
 
 #include <cstring>
 
+namespace vesk {
+
 namespace {
 
 // The UUID of the space on this device, "(null)" where there is none.
@@ -44,3 +46,5 @@ TEST(VESKSpaceUUIDGet, PathFieldWithoutNulStaysInBounds) {
 }
 
 } // namespace
+
+} // namespace vesk

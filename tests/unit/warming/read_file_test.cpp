@@ -5,6 +5,8 @@
 #include <cerrno>
 #include <regex>
 
+namespace vesk {
+
 using Events = std::vector<std::string>;
 
 namespace {
@@ -118,3 +120,5 @@ TEST_F(ReadFileTest, WhatIsReadWholeIsDoneEvenOnAPendingVolume) {
     SetPending();
     EXPECT_EQ(Read(127), WorkResult::Done);
 }
+
+} // namespace vesk

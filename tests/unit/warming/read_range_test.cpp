@@ -9,6 +9,8 @@
 #include <fcntl.h>
 #include <vector>
 
+namespace vesk {
+
 using Events = std::vector<std::string>;
 
 class ReadRangeTest : public WarmingTest {
@@ -30,7 +32,7 @@ TEST_F(ReadRangeTest, TheBufferIsAlignedForDirectReads) {
     const WarmBuffer buffer = WarmBufferAllocate();
     ASSERT_TRUE(buffer);
     EXPECT_EQ(reinterpret_cast<uintptr_t>(buffer.get()) % 4096, 0U);
-    EXPECT_EQ(warmBufferBytes, 65536U);
+    EXPECT_EQ(kWarmBufferBytes, 65536U);
 }
 
 TEST_F(ReadRangeTest, ASmallRangeIsOneRead) {
@@ -146,3 +148,5 @@ TEST_F(ReadRangeTest, ABlockRangePastTheEndFails) {
     EXPECT_EQ(ReadBits(1, 1), -1);
     EXPECT_EQ(log.Messages(), Messages{"Read block error (seek = 65536 num bytes = 65536"});
 }
+
+} // namespace vesk

@@ -5,6 +5,8 @@
 #include <cerrno>
 #include <random>
 
+namespace vesk {
+
 using Events = std::vector<std::string>;
 
 namespace {
@@ -250,3 +252,5 @@ TEST_F(ReloadBlocksTest, WithoutADeviceItFails) {
     EXPECT_EQ(ReloadPinBlocksToCache(&bitmap, "/missing/device", "/volume1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), Messages{"Can't open file (/missing/device)"});
 }
+
+} // namespace vesk

@@ -6,6 +6,8 @@
 
 #include <cerrno>
 
+namespace vesk {
+
 using Events = std::vector<std::string>;
 
 namespace {
@@ -197,3 +199,5 @@ TEST_F(WarmFilesTest, AnExtentOf4GiBIsCutTo32Bits) {
               WorkResult::Done);
     EXPECT_EQ(device_->events, Events{"read 0+4096"});
 }
+
+} // namespace vesk

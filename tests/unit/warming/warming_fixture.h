@@ -1,6 +1,5 @@
 // What the warming tests share: a cache device, its volume and the pending-space list.
-#ifndef TESTS_WARMING_WARMING_FIXTURE_H
-#define TESTS_WARMING_WARMING_FIXTURE_H
+#pragma once
 
 #include "tests/support/captured_log.h"
 #include "tests/support/fake_appliance.h"
@@ -13,6 +12,8 @@
 
 #include <gtest/gtest.h>
 #include <memory>
+
+namespace vesk {
 
 class WarmingTest : public LeakCheckedTest {
 protected:
@@ -39,4 +40,4 @@ protected:
     }                                                                                              \
     static_assert(true, "a semicolon follows")
 
-#endif
+} // namespace vesk
