@@ -5,28 +5,28 @@
 namespace vesk {
 
 BlockRangeGuard::BlockRangeGuard(BlockRangeLock &rangeLock, const BlockRange &range)
-    : lock(rangeLock) {
-    std::unique_lock<std::mutex> hold(lock.mutex);
-    place = lock.queue.insert(lock.queue.end(), range);
+    : lock_(rangeLock) {
+    std::unique_lock<std::mutex> hold(lock_.mutex);
+    place_ = lock_.queue.insert(lock_.queue.end(), range);
     const auto free = [this, &range] {
-        return std::none_of(lock.queue.begin(), place, [&range](const BlockRange &earlier) {
+        return std::none_of(lock_.queue.begin(), place_, [&range](const BlockRange &earlier) {
             return earlier.first <= range.last && range.first <= earlier.last;
         });
     };
-    ++lock.waiting;
-    lock.released.wait(hold, free);
-    --lock.waiting;
+    ++lock_.waiting;
+    lock_.released.wait(hold, free);
+    --lock_.waiting;
 }
 
 BlockRangeGuard::~BlockRangeGuard() {
     bool wake = false;
     {
-        const std::lock_guard<std::mutex> hold(lock.mutex);
-        lock.queue.erase(place);
-        wake = lock.waiting > 0;
+        const std::lock_guard<std::mutex> hold(lock_.mutex);
+        lock_.queue.erase(place_);
+        wake = lock_.waiting > 0;
     }
     if (wake) {
-        lock.released.notify_all();
+        lock_.released.notify_all();
     }
 }
 

@@ -36,8 +36,8 @@ public:
     BlockRangeGuard &operator=(const BlockRangeGuard &) = delete;
 
 private:
-    BlockRangeLock &lock;
-    std::list<BlockRange>::iterator place; // this range in lock.queue
+    BlockRangeLock &lock_;
+    std::list<BlockRange>::iterator place_; // this range in lock_.queue
 };
 
 } // namespace vesk

@@ -24,10 +24,7 @@ int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes);
 int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool *sizeChanged);
 
 // Holds a bitmap until its scope ends.
-struct BitmapDeleter {
-    void operator()(PinBitmap *bitmap) const { BitmapFree(bitmap); }
-};
-using BitmapHolder = std::unique_ptr<PinBitmap, BitmapDeleter>;
+using BitmapHolder = std::unique_ptr<PinBitmap, Deleter<BitmapFree>>;
 
 // A volume's bitmap and what it is looked up by; null what has not been found.
 struct VolumeBitmap {

@@ -189,14 +189,14 @@ int RunGetBitmapSize(const ToolParameters &asked) {
 }
 
 // In value order of the commands; each gives the exit value.
-int (*const handlers[])(const ToolParameters &asked) = {
+int (*const kHandlers[])(const ToolParameters &asked) = {
     NoCommand,        RunPinFiles,     RunUnpinFiles,   RunSendBitmap,  RunStartService,
     RunHandleMount,   RunHandleUmount, RunSupportPin,   RunCheckBitmap, RunAddPending,
     RunRemovePending, RunGetUuid,      RunDeleteBitmap, RunCheckPin,    RunReloadPinBlocks,
     RunUnpinAll,      RunIsAllUnpin,   RunSetBitmap,    RunUnsetBitmap, RunUnpinRange,
     RunGetBitmapSize,
 };
-static_assert(std::size(handlers) == kCommandGetBitmapSizeByte + 1, "a handler for every command");
+static_assert(std::size(kHandlers) == kCommandGetBitmapSizeByte + 1, "a handler for every command");
 
 // Static: the service's worker reads it after the first thread may have ended.
 ToolParameters parameters;
@@ -216,7 +216,7 @@ int main(int argc, char *argv[]) try {
         LogLevel = 2;
     }
     LogTraceEntry();
-    const int exitValue = handlers[parameters.command](parameters);
+    const int exitValue = kHandlers[parameters.command](parameters);
     LogTraceExit();
     return exitValue;
 } catch (const std::bad_alloc &) {

@@ -81,11 +81,11 @@ bool Help(const MetOption & /*met*/) {
     exit(0);
 }
 
-const OptionAction KeepFiles = Keep<&ToolParameters::files>;
-const OptionAction KeepConfigPath = Keep<&ToolParameters::configPath>;
-const OptionAction KeepCachePath = Keep<&ToolParameters::cachePath>;
-const OptionAction KeepStartSector = KeepNumber<&ToolParameters::startSector>;
-const OptionAction KeepNumSectors = KeepNumber<&ToolParameters::numSectors>;
+const OptionAction kKeepFiles = Keep<&ToolParameters::files>;
+const OptionAction kKeepConfigPath = Keep<&ToolParameters::configPath>;
+const OptionAction kKeepCachePath = Keep<&ToolParameters::cachePath>;
+const OptionAction kKeepStartSector = KeepNumber<&ToolParameters::startSector>;
+const OptionAction kKeepNumSectors = KeepNumber<&ToolParameters::numSectors>;
 
 using Requirement = int RequiredParameters::*;
 const Requirement kCache = &RequiredParameters::cachePath;
@@ -105,10 +105,10 @@ struct OptionRow {
 };
 
 const OptionRow kOptionRows[] = {
-    {"pin-files", required_argument, 'a', KeepFiles, kCommandPinFiles, {kFiles, kMount}},
-    {"unpin-files", required_argument, 'b', KeepFiles, kCommandUnpinFiles, {kFiles, kMount}},
+    {"pin-files", required_argument, 'a', kKeepFiles, kCommandPinFiles, {kFiles, kMount}},
+    {"unpin-files", required_argument, 'b', kKeepFiles, kCommandUnpinFiles, {kFiles, kMount}},
     {"start-service", no_argument, 'c', nullptr, kCommandStartService, {kConfig}},
-    {"config-path", required_argument, 'f', KeepConfigPath},
+    {"config-path", required_argument, 'f', kKeepConfigPath},
     {"space-uuid", required_argument, 'g', KeepSpaceUuid},
     {"send-bitmap", no_argument, 'i', nullptr, kCommandSendBitmap, {kMount}},
     {"mount-path", required_argument, 'j', KeepMountPath},
@@ -124,14 +124,14 @@ const OptionRow kOptionRows[] = {
     {"check-pin", required_argument, 't', KeepCheckPinFile, kCommandCheckPin, {kConfig}},
     {"reload-blocks", no_argument, 'u', nullptr, kCommandReloadPinBlocks, {kMount}},
     {"unpin-all", no_argument, 'v', nullptr, kCommandUnpinAllBlocks},
-    {"is-all-unpin", required_argument, 'w', KeepCachePath, kCommandIsAllUnpin, {kCache}},
+    {"is-all-unpin", required_argument, 'w', kKeepCachePath, kCommandIsAllUnpin, {kCache}},
     {"set-bitmap", no_argument, 'x', nullptr, kCommandSetBitmap, {kMount, kStart, kCount}},
-    {"start-sector", required_argument, 0, KeepStartSector},
-    {"num-sectors", required_argument, 1, KeepNumSectors},
+    {"start-sector", required_argument, 0, kKeepStartSector},
+    {"num-sectors", required_argument, 1, kKeepNumSectors},
     {"unset-bitmap", no_argument, 2, nullptr, kCommandUnsetBitmap, {kMount, kStart, kCount}},
     {"unpin-range", no_argument, 3, nullptr, kCommandUnpinRange, {kMount, kStart, kCount}},
     {"get-bitmap-size-byte", no_argument, 4, nullptr, kCommandGetBitmapSizeByte, {kMount}},
-    {"cache-path", required_argument, 5, KeepCachePath},
+    {"cache-path", required_argument, 5, kKeepCachePath},
     {"help", no_argument, 'h', Help},
     {"verbose", no_argument, 'y', EnableVerbose},
     {"debug", no_argument, 'z', EnableDebug},

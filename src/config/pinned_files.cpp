@@ -36,6 +36,10 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
     }
     const bool pins = record->type == kRequestPinFiles;
     for (const FileInfo &info : infos) {
+        if (!pins && record->type != kRequestUnpinFiles) { // which the test above keeps away
+            LogError("Get unsupport type = %s", RequestTypeForLog(record->type));
+            return -1;
+        }
         const std::string key = std::to_string(info.inodeNum);
         const char *path = info.szRelativePath;
         if (files.isMember(key) == pins) {
@@ -80,20 +84,25 @@ int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *
 
 int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
     const LogPlace place = LogHere();
-    bool removed = false;
-    const auto remove = [mountPath, &place, &removed](Json::Value &root) {
-        removed = JsonRemovePinFileVolume(root, mountPath) == kVolumeRemoved;
-        if (!removed) {
+    int outcome = kVolumeAbsent;
+    const auto remove = [mountPath, &place, &outcome](Json::Value &root) {
+        outcome = JsonRemovePinFileVolume(root, mountPath);
+        if (outcome == kVolumeAbsent) {
             LogWrite(LogClass::Verbose, place,
                      "Volume (%s) deson't has pin files, no need to remove", mountPath);
         }
-        return removed ? nullptr : "";
+        return outcome == kVolumeRemoved ? nullptr : "";
     };
     const int result = ConfigUpdate(configPath, MissingConfig::Skipped, remove, place);
-    if (result == 0 && removed) {
-        LogNotice("Remove pin file volume (%s) from config file", mountPath);
+    if (result < 0 || outcome == kVolumeAbsent) {
+        return result;
     }
-    return result;
+    if (outcome != kVolumeRemoved) { // no outcome so far
+        LogError("Can't remove pin files in volume (%s)", mountPath);
+        return -1;
+    }
+    LogNotice("Remove pin file volume (%s) from config file", mountPath);
+    return 0;
 }
 
 } // namespace vesk

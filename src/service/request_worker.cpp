@@ -17,7 +17,7 @@ namespace vesk {
 
 namespace {
 
-// Chooses one request and has it carried out. False when none can be chosen.
+// Chooses one request and has it carried out. False when the choice has failed.
 bool DoNextRequest(const char *configPath, const LogPlace &place) {
     RequestRecord record{};
     std::string num;

@@ -1,5 +1,7 @@
 #include "space/space.h"
 
+#include "base/deleter.h"
+
 #include "vesk/storage_core.h"
 
 #include <cstring>
@@ -9,17 +11,15 @@ namespace vesk {
 
 namespace {
 
-struct SpaceListDeleter {
-    void operator()(VESKSpaceInfo *list) const { VESKSpaceInfoFree(list); }
-};
+using SpaceList = std::unique_ptr<VESKSpaceInfo, Deleter<VESKSpaceInfoFree>>;
 
 // Shows the spaces to `visit` until it answers something else than NoSpace, which is the result.
+// The list is the caller's, who logs the answer before it is freed.
 template <typename Visit>
-SpaceCause Walk(const Visit &visit, SpaceCause *asked, const LogPlace &place) {
+SpaceCause Walk(const Visit &visit, SpaceList *spaces, SpaceCause *asked, const LogPlace &place) {
     VESKSpaceInfo *list = nullptr;
     const int result = VESKSpaceInfoEnum(1, &list);
-    // The library may set a list even when it fails; it is released either way.
-    const std::unique_ptr<VESKSpaceInfo, SpaceListDeleter> spaces(list);
+    spaces->reset(list); // the library may set a list even when it fails
     if (result < 0) {
         LogWrite(LogClass::Error, place, "Can't enum spaces");
     }
@@ -47,7 +47,8 @@ char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause) {
         referencePath = strdup(space.referencePath);
         return SpaceCause::Found;
     };
-    if (Walk(visit, cause, place) != SpaceCause::CannotEnumerate) {
+    SpaceList spaces;
+    if (Walk(visit, &spaces, cause, place) != SpaceCause::CannotEnumerate) {
         LogVerbose("Get reference path = %s", referencePath);
     }
     return referencePath;
@@ -67,7 +68,8 @@ char *SpaceGetDevicePath(const char *referencePath, SpaceCause *cause) {
         devicePath = strdup(space.devicePath);
         return SpaceCause::Found;
     };
-    const SpaceCause result = Walk(visit, cause, place);
+    SpaceList spaces;
+    const SpaceCause result = Walk(visit, &spaces, cause, place);
     if (result == SpaceCause::Found || result == SpaceCause::NoSpace) {
         LogVerbose("Get device path = %s", devicePath);
     }
@@ -83,7 +85,8 @@ char *SpaceGetUUID(const char *referencePath, SpaceCause *cause) {
         uuid = VESKSpaceUUIDGet(&space);
         return uuid != nullptr ? SpaceCause::Found : SpaceCause::NoUuid;
     };
-    if (Walk(visit, cause, LogHere()) != SpaceCause::CannotEnumerate) {
+    SpaceList spaces;
+    if (Walk(visit, &spaces, cause, LogHere()) != SpaceCause::CannotEnumerate) {
         LogVerbose("Get UUID = %s", uuid);
     }
     return uuid;

@@ -15,9 +15,9 @@ namespace vesk {
 
 // Why a look-up here or in space/space_cache.h has come to its answer.
 enum class SpaceCause {
-    Found, // a text is null all the same when memory has run out; of pin support: there is
+    Found, // an answer is null or 0 all the same when memory has run out; of pin support: there is
     CannotEnumerate,
-    NoSpace,         // no space has this UUID or reference path
+    NoSpace,         // no space has this reference path, or none whose UUID can be read this UUID
     NoUuid,          // the space is there, its UUID cannot be read
     NoReferencePath, // a space without one stands before the one that was looked for
     NoCache,         // the cache configuration does not know the space

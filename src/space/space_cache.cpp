@@ -1,5 +1,7 @@
 #include "space/space_cache.h"
 
+#include "base/deleter.h"
+
 #include "vesk/flash_cache.h"
 
 #include <cstring>
@@ -12,11 +14,9 @@ namespace {
 const int kConfigBySpaceUuid = 2;
 const int kStatBySsdPath = 3;
 
-struct ConfigDeleter {
-    void operator()(VESKFlashCacheConfig *config) const { VESKFlashCacheConfigFree(config); }
-};
-using CacheConfig = std::unique_ptr<VESKFlashCacheConfig, ConfigDeleter>;
+using CacheConfig = std::unique_ptr<VESKFlashCacheConfig, Deleter<VESKFlashCacheConfigFree>>;
 
+// Its function takes a pointer to the pointer.
 struct StatDeleter {
     void operator()(VESKFlashCacheStat *stat) const { VESKFlashCacheStatFree(&stat); }
 };

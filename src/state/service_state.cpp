@@ -106,7 +106,7 @@ int ServiceAddPendingSpaceAtomic(char *mountPath) NOT_ANALYSED {
         return -1;
     }
     {
-        const ServiceLockGuard lock(ServiceLockGuard::adopt);
+        const ServiceLockGuard lock(ServiceLockGuard::kAdopt);
         PendingSpaces spaces = CopyPending();
         spaces.emplace_back(mountPath);
         PublishPending(std::move(spaces));

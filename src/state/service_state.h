@@ -56,7 +56,7 @@ class LOCK_SCOPE ServiceLockGuard {
 public:
     ServiceLockGuard() TAKES_LOCK(serviceLock) { ServiceLock(); }
     // For a caller that has taken the lock already.
-    enum Adopt { adopt };
+    enum Adopt { kAdopt };
     explicit ServiceLockGuard(Adopt /*taken*/) NEEDS_LOCK(serviceLock) {}
     ~ServiceLockGuard() GIVES_LOCK_BACK() { ServiceUnlock(); }
     ServiceLockGuard(const ServiceLockGuard &) = delete;

@@ -33,7 +33,7 @@ const char kOutputPath[] = "/run/faults/output";
 const char kReportPath[] = "/run/faults/report";
 const int kReportFd = 9;
 const int kPollMicroseconds = 2000;
-const std::chrono::minutes hang(5); // nothing here takes that long, also where all is slow
+const std::chrono::minutes kHang(5); // nothing here takes that long, also where all is slow
 
 void Redirect(const char *path, int fd) {
     const int opened = open(path, O_WRONLY | O_CREAT | O_TRUNC | O_APPEND, 0600);
@@ -144,7 +144,7 @@ bool Child::IsQuiet() const {
 }
 
 bool Child::AwaitQuiet() const {
-    const Clock::time_point end = Clock::now() + hang;
+    const Clock::time_point end = Clock::now() + kHang;
     while (!HasEnded() && Clock::now() < end) {
         if (IsQuiet()) {
             return true;
@@ -176,7 +176,7 @@ void Child::Signal(int number) const {
 }
 
 int Child::AwaitEnd() {
-    const Clock::time_point end = Clock::now() + hang;
+    const Clock::time_point end = Clock::now() + kHang;
     while (!HasEnded() && Clock::now() < end) {
         usleep(kPollMicroseconds / 4);
     }

@@ -99,8 +99,8 @@ FakeCacheDevice::FakeCacheDevice(uint64_t bytes)
     FakeLibc::onIoctl = [this](unsigned long request, void *argument) {
         return Answer(request, argument);
     };
-    FakeLibc::onRead = [this](int fd_, long long offset, size_t size) {
-        NoteRead(fd_, offset, size);
+    FakeLibc::onRead = [this](int fd, long long offset, size_t size) {
+        NoteRead(fd, offset, size);
     };
 }
 

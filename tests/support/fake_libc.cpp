@@ -138,7 +138,7 @@ int FakeLibc::Calls(const std::string &function) {
     static const auto real = Real<type>(#name);                                                    \
     return real(__VA_ARGS__)
 
-using sighandler = void (*)(int);
+using SignalAction = void (*)(int);
 struct msqid_ds;
 
 } // namespace vesk
@@ -271,9 +271,9 @@ int pthread_mutex_init(pthread_mutex_t *mutex, const pthread_mutexattr_t *attrib
     return real(mutex, attributes);
 }
 
-sighandler signal(int number, sighandler handler) noexcept {
-    PASS_OR_FAIL(reinterpret_cast<sighandler>(-1), signal, sighandler(*)(int, sighandler), number,
-                 handler);
+SignalAction signal(int number, SignalAction handler) noexcept {
+    PASS_OR_FAIL(reinterpret_cast<SignalAction>(-1), signal, SignalAction(*)(int, SignalAction),
+                 number, handler);
 }
 
 void *aligned_alloc(size_t alignment, size_t size) noexcept {

@@ -13,8 +13,8 @@ namespace {
 
 using OptionsDeathTest = OptionsTest;
 
-const ::testing::ExitedWithCode success(0);
-const ::testing::KilledBySignal aborted(SIGABRT);
+const ::testing::ExitedWithCode kSuccess(0);
+const ::testing::KilledBySignal kAborted(SIGABRT);
 
 } // namespace
 
@@ -22,21 +22,21 @@ TEST_F(OptionsDeathTest, ShortOptionThatNothingHandlesAbortsAfterItsMessage) {
     for (const char *option : {"-d", "-e"}) {
         SCOPED_TRACE(option);
         CapturedLog log;
-        EXPECT_EXIT(Parse({option}), aborted, "");
+        EXPECT_EXIT(Parse({option}), kAborted, "");
         EXPECT_EQ(log.Text(), std::string("tool: Get unhandled option = ") + option[1] + "\n");
     }
 }
 
 TEST_F(OptionsDeathTest, UnhandledOptionHasTheErrorMarkerInTheLongForm) {
     CapturedLog log(2);
-    EXPECT_EXIT(Parse({"-d"}), aborted, "");
+    EXPECT_EXIT(Parse({"-d"}), kAborted, "");
     EXPECT_EQ(log.Messages(),
               std::vector<std::string>{"GetOptions() [N] : ***** Get unhandled option = d"});
 }
 
 TEST_F(OptionsDeathTest, OptionsBehindAnUnhandledOneAreNotLookedAt) {
     CapturedLog log;
-    EXPECT_EXIT(Parse({"-de", "--help"}), aborted, "");
+    EXPECT_EXIT(Parse({"-de", "--help"}), kAborted, "");
     EXPECT_EQ(log.Text(), "tool: Get unhandled option = d\n");
 }
 
@@ -44,7 +44,7 @@ TEST_F(OptionsDeathTest, HelpPrintsTheUsageAndEndsWithStatus0) {
     for (const char *option : {"--help", "-h"}) {
         SCOPED_TRACE(option);
         CapturedLog log;
-        EXPECT_EXIT(Parse({option}), success, "");
+        EXPECT_EXIT(Parse({option}), kSuccess, "");
         const std::vector<std::string> lines = log.Lines();
         ASSERT_EQ(lines.size(), 37U);
         EXPECT_EQ(lines.front(), "Usage:");
@@ -55,7 +55,7 @@ TEST_F(OptionsDeathTest, HelpPrintsTheUsageAndEndsWithStatus0) {
 
 TEST_F(OptionsDeathTest, OptionsBehindHelpAreNotLookedAt) {
     CapturedLog log;
-    EXPECT_EXIT(Parse({"--verbose", "--help", "-d", "--check-pin", "/no/such"}), success, "");
+    EXPECT_EXIT(Parse({"--verbose", "--help", "-d", "--check-pin", "/no/such"}), kSuccess, "");
     EXPECT_EQ(log.Lines().at(0), "tool: Verbose mode is enable");
     EXPECT_EQ(log.Lines().at(1), "Usage:");
     EXPECT_EQ(log.Lines().size(), 38U);

@@ -11,13 +11,13 @@ using Events = std::vector<std::string>;
 
 namespace {
 
-struct BitRun {
+struct ExpectedRead {
     uint64_t start, length; // bits
 };
 
 // Bit by bit, least significant first: what shall be read.
-std::vector<BitRun> RunsOf(const std::string &bytes) {
-    std::vector<BitRun> runs;
+std::vector<ExpectedRead> RunsOf(const std::string &bytes) {
+    std::vector<ExpectedRead> runs;
     bool open = false;
     for (size_t bit = 0; bit < bytes.size() * 8; ++bit) {
         const bool set = ((static_cast<unsigned char>(bytes[bit / 8]) >> (bit % 8)) & 1) != 0;
@@ -33,9 +33,9 @@ std::vector<BitRun> RunsOf(const std::string &bytes) {
 }
 
 // The read calls for the runs: 64 KiB each.
-Events ReadsOf(const std::vector<BitRun> &runs) {
+Events ReadsOf(const std::vector<ExpectedRead> &runs) {
     Events reads;
-    for (const BitRun &run : runs) {
+    for (const ExpectedRead &run : runs) {
         for (uint64_t i = 0; i < run.length; ++i) {
             reads.push_back("read " + std::to_string((run.start + i) * 65536) + "+65536");
         }
@@ -43,9 +43,9 @@ Events ReadsOf(const std::vector<BitRun> &runs) {
     return reads;
 }
 
-Messages RangeLinesOf(const std::vector<BitRun> &runs) {
+Messages RangeLinesOf(const std::vector<ExpectedRead> &runs) {
     Messages lines;
-    for (const BitRun &run : runs) {
+    for (const ExpectedRead &run : runs) {
         lines.push_back("ReadFdToNullByRange() [N]: Range's bitStart=" + std::to_string(run.start) +
                         " numBits=" + std::to_string(run.length) +
                         " (size = " + std::to_string(run.length * 65536) + " bytes)");
@@ -146,7 +146,7 @@ TEST_F(ReloadBlocksTest, RandomBitmapsAreReadAsABitByBitWalkReadsThem) {
         if (i % 10 == 0) { // with a long clear stretch, on both sides of what is looked at at once
             bytes += std::string(4090 + random() % 20, '\0') + RandomBitmap(random, 5);
         }
-        const std::vector<BitRun> runs = RunsOf(bytes);
+        const std::vector<ExpectedRead> runs = RunsOf(bytes);
         device_->events.clear();
         CapturedLog log(2);
         ASSERT_EQ(Reload(bytes), WorkResult::Done) << i << " " << Hex(bytes);
@@ -179,13 +179,13 @@ TEST_F(ReloadBlocksTest, AVolumeThatTurnsPendingIsLeftAfterTheRangeBeingRead) {
     SKIP_WITHOUT_DIRECT_READS();
     for (const std::string &bytes : {std::string("\x38\x02", 2), std::string("\xff\x81", 2),
                                      std::string("\x01\x80", 2), std::string("\x55\x55", 2)}) {
-        const std::vector<BitRun> runs = RunsOf(bytes);
+        const std::vector<ExpectedRead> runs = RunsOf(bytes);
         const size_t calls = ReadsOf(runs).size();
         const bool lastBitSet = runs.back().start + runs.back().length == bytes.size() * 8;
         for (size_t call = 1; call <= calls; ++call) {
-            std::vector<BitRun> expected;
+            std::vector<ExpectedRead> expected;
             uint64_t counted = 0;
-            for (const BitRun &run : runs) {
+            for (const ExpectedRead &run : runs) {
                 if (counted < call) {
                     expected.push_back(run);
                     counted += run.length;
