@@ -5,7 +5,6 @@
 #include <string>
 
 namespace vesk {
-
 template <typename Ours, typename Limit>
 void BenchPair(const std::string &row, const std::vector<int64_t> &sizes, Ours ours, Limit limit) {
     for (const int64_t size : sizes) {
@@ -13,5 +12,4 @@ void BenchPair(const std::string &row, const std::vector<int64_t> &sizes, Ours o
         benchmark::RegisterBenchmark((row + "/limit").c_str(), limit)->Arg(size)->UseRealTime();
     }
 }
-
 } // namespace vesk

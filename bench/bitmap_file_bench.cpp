@@ -10,9 +10,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 const char kPath[] = "/dev/shm/bitmap";
 const int64_t kFullBytes = 32 << 20;
 const size_t kChunk = 4096;
@@ -64,7 +62,5 @@ const bool kRegistered = [] {
     BenchPair("bitmap_save", {kFullBytes / 16, kFullBytes / 4, kFullBytes}, Save, SavePlainly);
     return true;
 }();
-
 } // namespace
-
 } // namespace vesk

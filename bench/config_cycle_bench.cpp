@@ -5,7 +5,7 @@
 #include "base/log.h"
 #include "config/pinned_files.h"
 #include "config/request_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "state/service_state.h"
 
 #include <cstdio>
@@ -19,9 +19,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const char kPath[] = "/dev/shm/pins.json";
 const char kNewPath[] = "/dev/shm/pins.json.new";
 
@@ -94,7 +92,5 @@ const bool kRegistered = [] {
     BenchPair("config_cycle", {0, 100, 10000, 100000}, Cycle, PlainCycle);
     return true;
 }();
-
 } // namespace
-
 } // namespace vesk

@@ -8,9 +8,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 const int64_t kFullBytes = 32 << 20; // of a 16 TiB device
 const size_t kExtentCount = 1000000;
 
@@ -114,7 +112,5 @@ const bool kRegistered = [] {
               FillExtents);
     return true;
 }();
-
 } // namespace
-
 } // namespace vesk

@@ -11,7 +11,6 @@
 #include <fuse_lowlevel.h>
 
 namespace {
-
 int backing = -1;
 
 void GetAttributes(fuse_req_t request, fuse_ino_t /*inode*/, fuse_file_info * /*info*/) {
@@ -42,7 +41,6 @@ fuse_lowlevel_ops Operations() {
     operations.read = Read;
     return operations;
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

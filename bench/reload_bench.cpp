@@ -18,9 +18,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 const char kDevice[] = "/dev/shm/device";
 const int64_t kFullBytes = 32 << 20;
 
@@ -106,7 +104,5 @@ const bool kRegistered = [] {
     BenchPair("reload_random", {1 << 16, 1 << 18, 1 << 20}, Walk<OnePercent>, Reads<OnePercent>);
     return true;
 }();
-
 } // namespace
-
 } // namespace vesk

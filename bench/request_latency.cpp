@@ -14,7 +14,6 @@
 extern char **environ;
 
 namespace {
-
 using Clock = std::chrono::steady_clock;
 
 long BitmapsSet(const char *stateFile) {
@@ -29,7 +28,6 @@ long BitmapsSet(const char *stateFile) {
 double Microseconds(Clock::duration time) {
     return std::chrono::duration<double, std::micro>(time).count();
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

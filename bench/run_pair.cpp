@@ -12,7 +12,6 @@
 extern char **environ;
 
 namespace {
-
 double Run(char **words, const posix_spawn_file_actions_t *quiet) {
     const auto start = std::chrono::steady_clock::now();
     pid_t pid = 0;
@@ -25,7 +24,6 @@ double Run(char **words, const posix_spawn_file_actions_t *quiet) {
     return std::chrono::duration<double, std::micro>(std::chrono::steady_clock::now() - start)
         .count();
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

@@ -5,7 +5,5 @@
 extern "C" void __gcov_dump(void);
 
 namespace {
-
 [[maybe_unused]] const int registered = std::at_quick_exit(__gcov_dump);
-
 } // namespace

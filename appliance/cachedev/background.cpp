@@ -8,9 +8,7 @@
 #include <utility>
 
 namespace vesk {
-
 namespace {
-
 // Waits for the byte that BackgroundReady writes; the end of the pipe means the daemon is gone.
 bool AwaitReady(int fd) {
     char byte = 0;
@@ -20,7 +18,6 @@ bool AwaitReady(int fd) {
     } while (got < 0 && errno == EINTR);
     return got == 1;
 }
-
 } // namespace
 
 bool BackgroundStart(Background &background) {
@@ -66,5 +63,4 @@ void BackgroundReady(Background &background) {
     static_cast<void>(written);
     background.ready = ScopedFd();
 }
-
 } // namespace vesk

@@ -8,7 +8,6 @@
 #include "base/scoped_fd.h"
 
 namespace vesk {
-
 // The daemon's end of the line to the waiting parent.
 struct Background {
     ScopedFd ready; // not open: not in the background, or already reported
@@ -22,5 +21,4 @@ bool BackgroundStart(Background &background);
 // Lets the parent end with 0 and leaves terminal and folder: a session of its own, standard streams
 // on /dev/null, working folder "/". Does nothing without a waiting parent. Call it once.
 void BackgroundReady(Background &background);
-
 } // namespace vesk

@@ -3,9 +3,7 @@
 #include <utility>
 
 namespace vesk {
-
 namespace {
-
 void MakeEvictable(BlockCache &cache, uint32_t number) {
     CacheSlot &slot = cache.slots[number];
     slot.useNode.key() = slot.lastUse;
@@ -29,7 +27,6 @@ void Forget(BlockCache &cache, CacheSlot &slot) {
     slot.block = kNoBlock;
     slot.pinned = false;
 }
-
 } // namespace
 
 void BlockCacheInit(BlockCache &cache, uint32_t slotCount) {
@@ -140,5 +137,4 @@ std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache) {
     }
     return runs;
 }
-
 } // namespace vesk

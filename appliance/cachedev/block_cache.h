@@ -18,7 +18,6 @@
 #include <vector>
 
 namespace vesk {
-
 constexpr uint64_t kNoBlock = UINT64_MAX;
 constexpr uint32_t kNoSlot = UINT32_MAX;
 
@@ -92,5 +91,4 @@ void BlockCacheUnpinAll(BlockCache &cache);
 
 // The pinned blocks as runs in ascending order, no two of them adjacent.
 std::vector<BlockRun> BlockCachePinnedRuns(const BlockCache &cache);
-
 } // namespace vesk

@@ -3,7 +3,6 @@
 #include <algorithm>
 
 namespace vesk {
-
 BlockRangeGuard::BlockRangeGuard(BlockRangeLock &rangeLock, const BlockRange &range)
     : lock_(rangeLock) {
     std::unique_lock<std::mutex> hold(lock_.mutex);
@@ -29,5 +28,4 @@ BlockRangeGuard::~BlockRangeGuard() {
         lock_.released.notify_all();
     }
 }
-
 } // namespace vesk

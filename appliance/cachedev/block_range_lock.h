@@ -13,7 +13,6 @@
 #include <mutex>
 
 namespace vesk {
-
 struct BlockRange {
     uint64_t first; // block number
     uint64_t last;  // block number, not less than first
@@ -39,5 +38,4 @@ private:
     BlockRangeLock &lock_;
     std::list<BlockRange>::iterator place_; // this range in lock_.queue
 };
-
 } // namespace vesk

@@ -4,9 +4,7 @@
 #include <cerrno>
 
 namespace vesk {
-
 namespace {
-
 bool PassesEnd(const SectorRange &range, uint64_t deviceSectors) {
     return range.startSector > deviceSectors ||
            range.sectorCount > deviceSectors - range.startSector;
@@ -21,7 +19,6 @@ BlockRun TouchedBlocks(const SectorRange &range) {
     const uint64_t last = (range.startSector + range.sectorCount - 1) / kBlockSectors;
     return {first, last - first + 1};
 }
-
 } // namespace
 
 void CacheDeviceStart(CacheDevice &device) {
@@ -103,5 +100,4 @@ CacheSnapshot CacheDeviceSnapshot(CacheDevice &device) {
     snapshot.lastUnpin = device.lastUnpin;
     return snapshot;
 }
-
 } // namespace vesk

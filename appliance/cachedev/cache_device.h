@@ -27,7 +27,6 @@
 #include <vector>
 
 namespace vesk {
-
 // Faults to order, for tests.
 struct CacheFaults {
     std::map<uint32_t, int> failRequest; // request number -> errno
@@ -133,5 +132,4 @@ void CacheDeviceCountRequest(CacheDevice &device, uint64_t RequestCounters::*kin
 
 // A consistent picture of the device; changes nothing.
 CacheSnapshot CacheDeviceSnapshot(CacheDevice &device);
-
 } // namespace vesk

@@ -11,9 +11,7 @@
 #include <thread>
 
 namespace vesk {
-
 namespace {
-
 // The bytes of a request, or of the part of it that one run covers.
 struct Span {
     uint64_t offset; // on the device
@@ -174,7 +172,6 @@ int WriteRequest(CacheDevice &device, const Span &request) {
     }
     return 0;
 }
-
 } // namespace
 
 int64_t CacheDeviceRead(CacheDevice &device, uint64_t offset, size_t size,
@@ -206,5 +203,4 @@ int64_t CacheDeviceWrite(CacheDevice &device, uint64_t offset, const char *buffe
     const int error = WriteRequest(device, {offset, end, const_cast<char *>(buffer)});
     return error != 0 ? error : static_cast<int64_t>(end - offset);
 }
-
 } // namespace vesk

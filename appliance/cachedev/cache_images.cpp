@@ -12,9 +12,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 using TransferCall = ssize_t (*)(int, const struct iovec *, int, off_t);
 
 // preadv and pwritev may move less than was asked for; goes on until all is moved.
@@ -104,7 +102,6 @@ bool MapSlots(CacheImages &images, std::string &error) {
     images.slotMap.bytes = static_cast<size_t>(bytes);
     return true;
 }
-
 } // namespace
 
 SlotMap::~SlotMap() {
@@ -176,5 +173,4 @@ int CacheImagesSyncAll(const CacheImages &images) {
     const int ssd = fdatasync(images.ssd.Get()) == 0 ? 0 : -errno;
     return backing != 0 ? backing : ssd;
 }
-
 } // namespace vesk

@@ -19,7 +19,6 @@
 #include <sys/uio.h>
 
 namespace vesk {
-
 // The mapped slots; unmapped with the record.
 struct SlotMap {
     void *start = nullptr; // null: not mapped
@@ -68,5 +67,4 @@ int CacheImagesSyncBacking(const CacheImages &images);
 
 // Makes both images durable. 0 or a negative errno.
 int CacheImagesSyncAll(const CacheImages &images);
-
 } // namespace vesk

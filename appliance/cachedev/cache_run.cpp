@@ -6,9 +6,7 @@
 #include <mutex>
 
 namespace vesk {
-
 namespace {
-
 size_t MostBlocks(uint64_t first, uint64_t last) {
     return static_cast<size_t>(std::min<uint64_t>(kRunBlocks, last - first + 1));
 }
@@ -73,7 +71,6 @@ void WakeSlotWaiters(CacheDevice &device) {
         device.slotReleased.notify_all();
     }
 }
-
 } // namespace
 
 CacheRun CacheRunTakeForRead(CacheDevice &device, uint64_t first, uint64_t last) {
@@ -162,5 +159,4 @@ size_t CacheRunGroupEnd(const CacheRun &run, size_t index) {
 uint64_t CacheRunBlockStart(const CacheRun &run, size_t index) {
     return (run.firstBlock + index) * kBlockBytes;
 }
-
 } // namespace vesk

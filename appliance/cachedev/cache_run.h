@@ -13,7 +13,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 // Blocks of one run at most: a request of 1 MiB that begins inside a block.
 constexpr size_t kRunBlocks = 17;
 static_assert(kRunBlocks < kMostPieces, "a run is moved with one list of pieces");
@@ -60,5 +59,4 @@ size_t CacheRunGroupEnd(const CacheRun &run, size_t index);
 
 // Where block `index` of the run begins, in bytes on the device.
 uint64_t CacheRunBlockStart(const CacheRun &run, size_t index);
-
 } // namespace vesk

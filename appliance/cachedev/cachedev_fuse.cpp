@@ -12,9 +12,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 // Not in every libfuse header: the caller has 4-byte pointers.
 constexpr unsigned kIoctlFrom32Bit = 1U << 3;
 
@@ -251,7 +249,6 @@ void Ioctl(fuse_req_t request, fuse_ino_t inode, unsigned number, void *argument
         return 0;
     });
 }
-
 } // namespace
 
 struct fuse_lowlevel_ops CachedevFuseOperations() {
@@ -269,5 +266,4 @@ struct fuse_lowlevel_ops CachedevFuseOperations() {
     operations.ioctl = Ioctl;
     return operations;
 }
-
 } // namespace vesk

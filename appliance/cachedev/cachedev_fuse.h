@@ -20,7 +20,6 @@
 #include <fuse_lowlevel.h>
 
 namespace vesk {
-
 struct ServedDevice {
     CacheDevice &device;
     std::string deviceName;        // file name of the device
@@ -32,5 +31,4 @@ struct ServedDevice {
 
 // The callbacks; to be registered with a ServedDevice as user data, which must outlive the session.
 struct fuse_lowlevel_ops CachedevFuseOperations();
-
 } // namespace vesk

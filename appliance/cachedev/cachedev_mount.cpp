@@ -12,9 +12,7 @@
 #include <system_error>
 
 namespace vesk {
-
 namespace {
-
 using SessionPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_session_destroy>>;
 using MountPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_session_unmount>>;
 using HandlersPtr = std::unique_ptr<struct fuse_session, Deleter<fuse_remove_signal_handlers>>;
@@ -39,7 +37,6 @@ bool IsMountPoint(const std::string &folder) {
     return statx(AT_FDCWD, folder.c_str(), AT_NO_AUTOMOUNT, 0, &status) == 0 &&
            (status.stx_attributes & STATX_ATTR_MOUNT_ROOT) != 0;
 }
-
 } // namespace
 
 bool CachedevPrepareFolder(const std::string &folder, std::string &error) {
@@ -100,5 +97,4 @@ bool CachedevServe(ServedDevice &served, const std::string &folder) {
     }
     return true;
 }
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <string>
 
 namespace vesk {
-
 // Makes `folder` (absolute path) ready to be a mount point: creates it with its parents if missing,
 // and refuses a folder that is a mount point already or is not empty. False: `error` is a message
 // for the user.
@@ -16,5 +15,4 @@ bool CachedevPrepareFolder(const std::string &folder, std::string &error);
 // folder was unmounted. Call it from the first thread; it returns when all requests are answered.
 // False after a message on standard error.
 bool CachedevServe(ServedDevice &served, const std::string &folder);
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <limits>
 
 namespace vesk {
-
 namespace {
-
 constexpr uint64_t kMostErrno = 4095; // what the kernel takes for an error number
 constexpr uint64_t kMostDelayMs = 60000;
 
@@ -118,7 +116,6 @@ bool Apply(int code, const std::string &value, CachedevOptions &options) {
     default: return false;
     }
 }
-
 } // namespace
 
 bool CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
@@ -181,5 +178,4 @@ Numbers are decimal, or hexadecimal after 0x. Ends on SIGTERM, SIGINT and when t
 unmounted.
 )";
 }
-
 } // namespace vesk

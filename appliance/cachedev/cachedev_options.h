@@ -6,7 +6,6 @@
 #include <string>
 
 namespace vesk {
-
 struct CachedevOptions {
     std::string folder;      // absolute path of the folder that becomes the mount point
     std::string deviceName;  // file name of the device in it
@@ -25,5 +24,4 @@ bool CachedevOptionsParse(int argc, char *const *argv, CachedevOptions &options,
 
 // The usage text.
 const char *CachedevUsage();
-
 } // namespace vesk

@@ -6,9 +6,7 @@
 #include <sys/uio.h>
 
 namespace vesk {
-
 namespace {
-
 using TransferCall = ssize_t (*)(pid_t, const struct iovec *, unsigned long, const struct iovec *,
                                  unsigned long, unsigned long);
 
@@ -41,7 +39,6 @@ int Transfer(TransferCall call, const Caller &caller, uint64_t address, void *bu
     }
     return 0;
 }
-
 } // namespace
 
 int CallerRead(const Caller &caller, uint64_t address, void *buffer, size_t size) {
@@ -69,5 +66,4 @@ BitmapDescriptor DescriptorDecode(const unsigned char *bytes, bool is32bit) {
     }
     return descriptor;
 }
-
 } // namespace vesk

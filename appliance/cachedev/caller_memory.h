@@ -11,7 +11,6 @@
 #include <sys/types.h>
 
 namespace vesk {
-
 // Who sent a request.
 struct Caller {
     pid_t pid;    // process or thread id; 0: not visible from here
@@ -41,5 +40,4 @@ size_t DescriptorBytes(bool is32bit);
 
 // Decodes a descriptor of DescriptorBytes(is32bit) bytes; the padding is ignored.
 BitmapDescriptor DescriptorDecode(const unsigned char *bytes, bool is32bit);
-
 } // namespace vesk

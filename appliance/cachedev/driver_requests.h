@@ -8,7 +8,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 // The full 32-bit numbers tell the requests apart; the direction and size bits of a number do not
 // describe its payload (the two requests that pass a record carry neither).
 constexpr uint32_t kRequestSetBitmap = 0x0000FECF;      // argument: address of a bitmap descriptor
@@ -39,5 +38,4 @@ static_assert(sizeof(SectorRange) == 16, "record of the unpin-ranges request");
 constexpr size_t kRangeListRecords = 1024;
 constexpr size_t kRangeListBytes = kRangeListRecords * sizeof(SectorRange);
 static_assert(kRangeListBytes == 16384, "payload of the unpin-ranges request");
-
 } // namespace vesk

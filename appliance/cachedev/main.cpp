@@ -15,7 +15,6 @@
 using namespace vesk;
 
 namespace {
-
 int Fail(const std::string &message) {
     fprintf(stderr, "veskcachedev: %s\n", message.c_str());
     return 1;
@@ -86,7 +85,6 @@ int Run(int argc, char **argv) {
     }
     return isServed ? 0 : 1;
 }
-
 } // namespace
 
 int main(int argc, char **argv) {

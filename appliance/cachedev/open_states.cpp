@@ -6,7 +6,6 @@
 #include <utility>
 
 namespace vesk {
-
 uint64_t OpenStatesOpen(OpenStates &states, CacheDevice &device) {
     auto text =
         std::make_shared<const std::string>(StateJsonText(CacheDeviceSnapshot(device), getpid()));
@@ -37,5 +36,4 @@ uint64_t OpenStatesBytes(OpenStates &states, CacheDevice &device) {
     }
     return StateJsonText(CacheDeviceSnapshot(device), getpid()).size();
 }
-
 } // namespace vesk

@@ -12,7 +12,6 @@
 #include <string>
 
 namespace vesk {
-
 // Shared with the reads: a file may be closed as soon as the reply of a read is on its way, before
 // the read is done with the text.
 using StateText = std::shared_ptr<const std::string>;
@@ -37,5 +36,4 @@ void OpenStatesClose(OpenStates &states, uint64_t handle);
 // Whoever polls the state asks for this each time, so no text is made for it; the file is read to
 // its end whatever length it shows.
 uint64_t OpenStatesBytes(OpenStates &states, CacheDevice &device);
-
 } // namespace vesk

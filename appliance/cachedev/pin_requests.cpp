@@ -4,9 +4,7 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 int SetBitmap(CacheDevice &device, const PinRequest &request) {
     unsigned char bytes[kDescriptorBytes64] = {};
     const bool is32bit = request.caller.is32bit;
@@ -92,7 +90,6 @@ uint64_t RequestCounters::*CounterOf(uint32_t number) {
     default: return nullptr;
     }
 }
-
 } // namespace
 
 int PinRequestHandle(CacheDevice &device, const PinRequest &request) {
@@ -102,5 +99,4 @@ int PinRequestHandle(CacheDevice &device, const PinRequest &request) {
     CacheDeviceCountRequest(device, CounterOf(request.number), result != 0);
     return result;
 }
-
 } // namespace vesk

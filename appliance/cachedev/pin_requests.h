@@ -10,7 +10,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 struct PinRequest {
     uint32_t number;   // full request number
     uint64_t argument; // third argument of the ioctl: an address in the caller's memory
@@ -23,5 +22,4 @@ struct PinRequest {
 // memory of the caller that cannot be reached, -ENOTTY for any other number, and what the fault
 // settings order. Counts the request.
 int PinRequestHandle(CacheDevice &device, const PinRequest &request);
-
 } // namespace vesk

@@ -5,9 +5,7 @@
 #include <json/json.h>
 
 namespace vesk {
-
 namespace {
-
 Json::Value Number(uint64_t value) {
     return Json::Value(static_cast<Json::UInt64>(value));
 }
@@ -38,7 +36,6 @@ Json::Value RequestCounts(const RequestCounters &requests) {
     counts["refused"] = Number(requests.refused);
     return counts;
 }
-
 } // namespace
 
 std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
@@ -74,5 +71,4 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     writer["indentation"] = ""; // one line: some thousand slots are polled often
     return Json::writeString(writer, state) + "\n";
 }
-
 } // namespace vesk

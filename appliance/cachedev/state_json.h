@@ -7,8 +7,6 @@
 #include <sys/types.h>
 
 namespace vesk {
-
 // The snapshot as one line of JSON with a line feed at its end; `pid` is the daemon's. Pure.
 std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid);
-
 } // namespace vesk

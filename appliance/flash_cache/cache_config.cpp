@@ -8,9 +8,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 constexpr char kDefaultPath[] = "/etc/veskflashcache.json";
 constexpr size_t kMaxBytes = size_t{1024} * 1024;
 constexpr int kMaxDepth =
@@ -53,7 +51,6 @@ bool TextGet(const Json::Value &object, const char *name, std::string &text) {
     text = value.asString();
     return !text.empty() && text.find('\0') == std::string::npos;
 }
-
 } // namespace
 
 std::string CacheConfigPath() {
@@ -88,5 +85,4 @@ bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &ent
     entries.swap(caches);
     return true;
 }
-
 } // namespace vesk

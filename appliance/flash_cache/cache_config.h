@@ -11,7 +11,6 @@
 #include <vector>
 
 namespace vesk {
-
 // One cache. No text is empty or holds a NUL.
 struct CacheConfigEntry {
     std::string spaceUuid; // UUID of the space's filesystem
@@ -27,5 +26,4 @@ std::string CacheConfigPath();
 // the file cannot be read, is larger than a configuration can be (1 MiB), is no JSON or has another
 // form; `entries` is then empty.
 bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &entries);
-
 } // namespace vesk

@@ -9,13 +9,10 @@
 #include <cstdint>
 
 namespace vesk {
-
 namespace {
-
 // The driver writes whether all blocks are unpinned into a 32-bit int. A driver without the pin
 // interface does not know the request.
 constexpr unsigned long kQueryAllUnpinned = 0x8004FED2;
-
 } // namespace
 
 CacheDeviceState CacheDeviceAsk(const std::string &devicePath) {
@@ -31,5 +28,4 @@ CacheDeviceState CacheDeviceAsk(const std::string &devicePath) {
     state.supportsPin = ioctl(device.Get(), kQueryAllUnpinned, &allUnpinned) >= 0;
     return state;
 }
-
 } // namespace vesk

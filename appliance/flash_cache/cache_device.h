@@ -6,7 +6,6 @@
 #include <string>
 
 namespace vesk {
-
 struct CacheDeviceState {
     bool isUp = false;        // the device is there and opens
     bool supportsPin = false; // its driver has the pin interface
@@ -15,5 +14,4 @@ struct CacheDeviceState {
 // Opens the device for a moment and asks its driver. Anything but a block device or a regular file
 // (an emulated device) is no cache device and counts as not up.
 CacheDeviceState CacheDeviceAsk(const std::string &devicePath);
-
 } // namespace vesk

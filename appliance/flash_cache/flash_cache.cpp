@@ -10,9 +10,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 constexpr int32_t kConfigBySpaceUuid = 2;
 constexpr int32_t kStatBySsdPath = 3;
 
@@ -98,7 +96,6 @@ int CachePathGet(const char *ssdPath, char *buffer, size_t size) {
     std::memcpy(buffer, cache.cachePath.c_str(), cache.cachePath.size() + 1);
     return 1;
 }
-
 } // namespace
 
 extern "C" int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,
@@ -136,5 +133,4 @@ extern "C" int VESKFlashcacheGetCachePath(const char *ssdPath, char *buffer, siz
         return 0;
     }
 }
-
 } // namespace vesk

@@ -10,7 +10,6 @@
 #include <memory>
 
 namespace vesk {
-
 std::string BlockDeviceOfMount(const MountEntry &mount) {
     // A source such as "tank/data" or "none" must not be looked up in the current directory.
     const bool isPath = !mount.source.empty() && mount.source.front() == '/';
@@ -54,5 +53,4 @@ std::string BlockDeviceProbe(const std::string &devicePath, const char *name) {
     }
     return value;
 }
-
 } // namespace vesk

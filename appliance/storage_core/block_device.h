@@ -10,7 +10,6 @@
 #include <string>
 
 namespace vesk {
-
 // The path of the block device that a mounted filesystem sits on, or an empty text where it has
 // none. The mount's source is the path if it is a node of that very device; where it is not
 // ("/dev/root", a node missing from this namespace) the device number is looked up. Filesystems
@@ -27,5 +26,4 @@ dev_t BlockDeviceNumber(const std::string &devicePath);
 // Empty: no such value, or the device cannot be read or carries signatures that contradict each
 // other.
 std::string BlockDeviceProbe(const std::string &devicePath, const char *name);
-
 } // namespace vesk

@@ -10,15 +10,12 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 // Symbolic links, devices and directories have no extents to give, and opening a device can do
 // things. Filesystems that do not tell the type here are checked after opening.
 bool MayBeRegularFile(const dirent &entry) {
     return entry.d_type == DT_REG || entry.d_type == DT_UNKNOWN;
 }
-
 } // namespace
 
 void InodeSearchOffer(InodeSearch &search, uint64_t inode, const char *name) {
@@ -79,5 +76,4 @@ ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
     }
     return file;
 }
-
 } // namespace vesk

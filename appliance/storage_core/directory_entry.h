@@ -9,7 +9,6 @@
 #include <string>
 
 namespace vesk {
-
 // A search through the entries of one directory. The number looked for may be only the low 32 bits
 // of the file's: the entry with exactly this number is the result, else the one file whose low 32
 // bits equal it. Two files that share these bits are no result, either could be meant.
@@ -30,5 +29,4 @@ bool InodeSearchFound(const InodeSearch &search);
 // Opens the regular file with this inode number (or these low 32 bits of it) in a directory, for
 // reading, without following a symbolic link. Not open: no such file, or a failure.
 ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode);
-
 } // namespace vesk

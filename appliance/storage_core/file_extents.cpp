@@ -10,16 +10,13 @@
 #include <new>
 
 namespace vesk {
-
 namespace {
-
 constexpr uint64_t kSectorBytes = 512;
 constexpr uint32_t kBatchExtents = 128; // extents per question; about 7 KiB
 
 constexpr uint32_t kFlagsWithoutPlace = FIEMAP_EXTENT_UNKNOWN | FIEMAP_EXTENT_DELALLOC |
                                         FIEMAP_EXTENT_ENCODED | FIEMAP_EXTENT_NOT_ALIGNED |
                                         FIEMAP_EXTENT_DATA_INLINE | FIEMAP_EXTENT_DATA_TAIL;
-
 } // namespace
 
 bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry) {
@@ -70,5 +67,4 @@ bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
         start = last.fe_logical + last.fe_length;
     }
 }
-
 } // namespace vesk

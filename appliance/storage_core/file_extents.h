@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 // Turns one extent into sectors. False: the extent has no place of whole sectors on the device (not
 // allocated yet, kept in the inode, packed or compressed) and `entry` is left alone.
 bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry);
@@ -19,5 +18,4 @@ bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry);
 // written back first: what has no place on the device yet is left out. False: the kernel did not
 // answer; `entries` then holds what came before.
 bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries);
-
 } // namespace vesk

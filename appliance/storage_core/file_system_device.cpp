@@ -16,7 +16,6 @@
 using namespace vesk;
 
 namespace {
-
 class FiemapDevice final : public FileSystemDevice {
 public:
     explicit FiemapDevice(dev_t number) : number_(number) {}
@@ -77,7 +76,6 @@ MountEntry MountOfDevice(const std::string &devicePath, dev_t number) {
     unmounted.type = BlockDeviceProbe(devicePath, "TYPE");
     return unmounted;
 }
-
 } // namespace
 
 FileMappingTable::~FileMappingTable() = default;

@@ -7,9 +7,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 std::string TextOrEmpty(const char *text) {
     return text == nullptr ? "" : text;
 }
@@ -34,7 +32,6 @@ bool IsAtOrBelow(const std::string &path, const std::string &directory) {
     return path.compare(0, directory.size(), directory) == 0 &&
            (path.size() == directory.size() || path[directory.size()] == '/');
 }
-
 } // namespace
 
 bool MountTableRead(const char *path, std::vector<MountEntry> &entries) {
@@ -90,5 +87,4 @@ bool FileSystemIsMappable(const MountEntry &mount) {
     }
     return mount.type == "ext2" || mount.type == "ext3" || mount.type == "ext4";
 }
-
 } // namespace vesk

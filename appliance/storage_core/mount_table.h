@@ -9,7 +9,6 @@
 #include <vector>
 
 namespace vesk {
-
 // The table of the calling thread's mount namespace. Not the process's: a process whose first
 // thread has ended, as the pin service's can, has no readable table of its own.
 constexpr char kMountTablePath[] = "/proc/thread-self/mountinfo";
@@ -46,5 +45,4 @@ std::string MountOptionValue(const MountEntry &entry, const char *name);
 // Whether the addresses that the kernel gives for a file of this mounted filesystem are offsets on
 // its block device.
 bool FileSystemIsMappable(const MountEntry &mount);
-
 } // namespace vesk

@@ -11,9 +11,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 // A mount of a directory inside the filesystem (a bind mount) is not the space's top directory. A
 // btrfs subvolume is mounted by its path, too: it is whole when the mount shows just the subvolume.
 bool ShowsWholeFilesystem(const MountEntry &mount) {
@@ -46,7 +44,6 @@ SpaceInfoList InfoListMake(const std::vector<Space> &spaces) {
     }
     return list;
 }
-
 } // namespace
 
 std::vector<Space> SpaceListSelect(const std::vector<MountEntry> &mounts,
@@ -94,5 +91,4 @@ extern "C" void VESKSpaceInfoFree(VESKSpaceInfo *list) {
         list = first->next;
     }
 }
-
 } // namespace vesk

@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 // One storage space. Both texts fit their fields of VESKSpaceInfo with the NUL.
 struct Space {
     std::string devicePath;    // block device path
@@ -25,5 +24,4 @@ using SpaceDeviceLookup = std::function<std::string(const MountEntry &)>;
 // has paths that fit.
 std::vector<Space> SpaceListSelect(const std::vector<MountEntry> &mounts,
                                    const SpaceDeviceLookup &deviceOf);
-
 } // namespace vesk

@@ -5,7 +5,6 @@
 #include <exception>
 
 namespace vesk {
-
 extern "C" char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
     if (space == nullptr) {
         return nullptr;
@@ -19,5 +18,4 @@ extern "C" char *VESKSpaceUUIDGet(const VESKSpaceInfo *space) {
         return nullptr;
     }
 }
-
 } // namespace vesk

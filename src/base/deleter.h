@@ -5,9 +5,7 @@
 #include <memory>
 
 namespace vesk {
-
 template <auto release> struct Deleter {
     template <typename Object> void operator()(Object *object) const { release(object); }
 };
-
 } // namespace vesk

@@ -3,20 +3,17 @@
 #include <cerrno>
 #include <cstdarg>
 #include <cstdio>
-#include <cstring>
 #include <memory>
 #include <new>
 #include <sys/time.h>
 #include <syslog.h>
 
 namespace vesk {
-
 int LogToSyslog = 1;
 int LogLevel = 1;
 const char *ProgramName = nullptr;
 
 namespace {
-
 // Readers of the log know the program by this one file name, in whichever source file a message
 // stands.
 const char kSourceFileName[] = "veskcachepinfiletool.cpp";
@@ -81,7 +78,6 @@ void WriteOut(LogClass logClass, const LogPlace &place, const char *core) {
 }
 
 LogSink currentSink = WriteOut;
-
 } // namespace
 
 void LogSetSink(LogSink sink) {
@@ -104,7 +100,7 @@ void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
 
 void LogTraceMark(const char *mark, const LogPlace &place) {
     if (LogLevel > 1) {
-        LogWrite(LogClass::Notice, place, "%s", mark);
+        LogNoticeAt(place, "%s", mark);
     }
 }
 
@@ -117,5 +113,4 @@ const char *GetTimeString() {
              microseconds / 1000, microseconds);
     return text;
 }
-
 } // namespace vesk

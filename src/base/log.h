@@ -15,7 +15,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 extern int LogToSyslog;         // 1: system log, 0: standard output
 extern int LogLevel;            // 1 normal, 2 verbose, 3 debug
 extern const char *ProgramName; // begins every line on standard output; null until main sets it
@@ -31,13 +30,15 @@ struct LogPlace {
 #define LogHere() (vesk::LogPlace{__func__, __LINE__})
 
 // Writes one message, printf-like; verbose and debug ones only where the level asks for them. Use
-// the macros below, which add the calling place; LogWrite itself in a helper that was given one.
+// the macros below: they add the calling place, or take one where a helper was given it ("At").
 void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
     __attribute__((format(printf, 3, 4)));
 
 // Error and notice messages are always written, the error's long form carries a marker.
-#define LogError(...) vesk::LogWrite(vesk::LogClass::Error, LogHere(), __VA_ARGS__)
-#define LogNotice(...) vesk::LogWrite(vesk::LogClass::Notice, LogHere(), __VA_ARGS__)
+#define LogErrorAt(place, ...) vesk::LogWrite(vesk::LogClass::Error, place, __VA_ARGS__)
+#define LogError(...) LogErrorAt(LogHere(), __VA_ARGS__)
+#define LogNoticeAt(place, ...) vesk::LogWrite(vesk::LogClass::Notice, place, __VA_ARGS__)
+#define LogNotice(...) LogNoticeAt(LogHere(), __VA_ARGS__)
 
 // The arguments of verbose and debug messages are evaluated only when the level asks for them: some
 // of them log for themselves.
@@ -89,5 +90,4 @@ inline unsigned long long LogU64(uint64_t value) {
 // "sec=%ld msec=%ld usec=%ld" of the present time in a static 512-byte buffer that the next call
 // overwrites. usec repeats the whole sub-second part in microseconds.
 const char *GetTimeString();
-
 } // namespace vesk

@@ -8,9 +8,7 @@
 #include <memory>
 
 namespace vesk {
-
 using FreeDeleter = Deleter<std::free>;
 
 using MallocText = std::unique_ptr<char, FreeDeleter>;
-
 } // namespace vesk

@@ -1,6 +1,5 @@
-// A file descriptor that is closed when its scope ends, also on an error path.
-//
-// Thread rule: one owner at a time, no locking.
+// A file descriptor that is closed when its scope ends, also on an error path. Thread rule: one
+// owner at a time, no locking.
 #pragma once
 
 #include <unistd.h>
@@ -8,7 +7,6 @@
 #include <utility>
 
 namespace vesk {
-
 class ScopedFd {
 public:
     explicit ScopedFd(int fd = -1) noexcept : fd_(fd) {}
@@ -32,5 +30,4 @@ public:
 private:
     int fd_; // negative: nothing to close
 };
-
 } // namespace vesk

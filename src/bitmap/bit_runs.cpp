@@ -5,9 +5,7 @@
 #include <utility>
 
 namespace vesk {
-
 namespace {
-
 const size_t kStretchBytes = 4096;
 
 // How many bytes from `bytes` on are equal, `size` at most.
@@ -32,7 +30,6 @@ uint64_t CountEqualBits(const unsigned char *bytes, size_t size, unsigned within
     return within != 0 ? 8 - within
                        : uint64_t{CountEqualBytes(bytes, std::min(size, kStretchBytes))} * 8;
 }
-
 } // namespace
 
 bool BitScanStep(BitScan &scan, BitRun &run) {
@@ -72,5 +69,4 @@ std::vector<BitRun> BitRunsOf(const unsigned char *bytes, size_t size) {
 bool BitIsSet(const unsigned char *bytes, size_t size, uint64_t bit) {
     return bit >> 3 < size && (bytes[static_cast<size_t>(bit >> 3)] >> (bit & 7) & 1) != 0;
 }
-
 } // namespace vesk

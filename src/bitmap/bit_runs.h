@@ -12,7 +12,6 @@
 #include <vector>
 
 namespace vesk {
-
 struct BitRun {
     uint64_t first; // number of the first bit
     uint64_t count; // bits
@@ -36,5 +35,4 @@ std::vector<BitRun> BitRunsOf(const unsigned char *bytes, size_t size);
 
 // A bit past the end is not set.
 bool BitIsSet(const unsigned char *bytes, size_t size, uint64_t bit);
-
 } // namespace vesk

@@ -10,9 +10,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const int64_t kChunkBytes = 4096;
 
 // The file lies where a volume's users may write. A link planted in its place must not lead to
@@ -23,7 +21,6 @@ bool IsSpecial(int fd) {
     struct stat status {};
     return fstat(fd, &status) < 0 || !(S_ISREG(status.st_mode) || S_ISDIR(status.st_mode));
 }
-
 } // namespace
 
 int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
@@ -82,5 +79,4 @@ int BitmapWriteToFile(PinBitmap *bitmap, const char *path) {
     LogVerbose("Write to bitmap file (%s) size (%d) Finish", path, static_cast<int>(bitmap->size));
     return 0;
 }
-
 } // namespace vesk

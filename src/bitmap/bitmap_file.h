@@ -1,13 +1,10 @@
 // The bitmap file: the raw bitmap bytes, byte 0 first, without header or checksum. It is read and
-// written in chunks of 4096 bytes.
-//
-// Thread rule: no state; a bitmap belongs to one thread at a time.
+// written in chunks of 4096 bytes. Thread rule: no state; a bitmap belongs to one thread at a time.
 #pragma once
 
 #include "bitmap/pin_bitmap.h"
 
 namespace vesk {
-
 // Reads the file into the start of the bitmap's bytes; a file longer than the bitmap fills it
 // whole. A file that shrinks while it is read is read again and again until its bytes are there. 0,
 // or -1 after an error message (also for null arguments).
@@ -16,5 +13,4 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap);
 // Writes all bytes from offset 0; creates the file (0644) if missing and keeps the tail of a longer
 // one. 0, or -1 after an error message; then the file may be partly rewritten.
 int BitmapWriteToFile(PinBitmap *bitmap, const char *path);
-
 } // namespace vesk

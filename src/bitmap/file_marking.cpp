@@ -6,9 +6,7 @@
 #include <chrono>
 
 namespace vesk {
-
 namespace {
-
 // Times the extent lookup, for measurements on the appliance; off in every build that ships.
 const bool kTimeExtentLookup = false;
 
@@ -30,7 +28,6 @@ void ApplyExtents(const FileMappingTable &table, const std::string &filePath, Pi
         }
     }
 }
-
 } // namespace
 
 int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &filePath,
@@ -67,5 +64,4 @@ int UnsetBitmapAndAppendUnpinInfos(const char * /*cachePath*/, PinBitmap *bitmap
     ApplyExtents(table, filePath, bitmap, infos, LogHere());
     return 0;
 }
-
 } // namespace vesk

@@ -17,7 +17,6 @@
 #include <vector>
 
 namespace vesk {
-
 // Marks the file's blocks and copies its extents to `*tableOut`. 0, or -1 with the bitmap
 // untouched.
 int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &filePath,
@@ -28,5 +27,4 @@ int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &f
 int UnsetBitmapAndAppendUnpinInfos(const char *cachePath, PinBitmap *bitmap, const char *mountPath,
                                    const std::string &filePath, uint32_t inode,
                                    std::vector<UnpinInfo> *infos);
-
 } // namespace vesk

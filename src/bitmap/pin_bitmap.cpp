@@ -8,9 +8,7 @@
 #include <endian.h>
 
 namespace vesk {
-
 namespace {
-
 void ApplyMask(unsigned char *byte, unsigned mask, bool set) {
     *byte = static_cast<unsigned char>(set ? *byte | mask : *byte & ~mask);
 }
@@ -45,7 +43,6 @@ void ApplyBits(unsigned char *data, size_t size, uint64_t first, uint64_t last, 
     memset(data + firstByte + 1, set ? 0xFF : 0, lastByte - firstByte - 1);
     ApplyMask(data + lastByte, lastMask, set);
 }
-
 } // namespace
 
 void BitmapFree(PinBitmap *bitmap) {
@@ -82,5 +79,4 @@ int BitmapSetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors)
 int BitmapUnsetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors) {
     return BitmapOperation(bitmap, startSector, numSectors, 0);
 }
-
 } // namespace vesk

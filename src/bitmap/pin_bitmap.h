@@ -12,7 +12,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 const unsigned kBitmapSectorShift = 7; // sectors to blocks: 128 sectors of 512 bytes
 const unsigned kBitmapByteShift = 16;  // bytes to blocks: 64 KiB
 const unsigned kBitmapSizeShift = 19; // device bytes to bitmap bytes: 8 blocks a byte, rounded down
@@ -28,5 +27,4 @@ void BitmapFree(PinBitmap *bitmap);
 int BitmapOperation(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors, int op);
 int BitmapSetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors);
 int BitmapUnsetRange(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors);
-
 } // namespace vesk

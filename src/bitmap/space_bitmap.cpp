@@ -5,21 +5,17 @@
 #include "driver/device.h"
 #include "files/path.h"
 #include "space/space.h"
-#include "space/space_bitmap_path.h"
 #include "space/space_cache.h"
 
 #include <cstdlib>
 
 namespace vesk {
-
 namespace {
-
 // A record whose bytes were allocated is released here, and the caller's pointer says so.
 void ReleaseBitmap(PinBitmap **bitmap) {
     BitmapFree(*bitmap);
     *bitmap = nullptr;
 }
-
 } // namespace
 
 int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes) {
@@ -97,7 +93,7 @@ int VolumeBitmapLoad(VolumeBitmap *volume, const LogPlace &place) {
         BitmapAllocateAndInitialize(volume->uuid.get(), &loaded, &volume->sizeChanged);
     volume->bitmap.reset(loaded);
     if (result < 0) {
-        LogWrite(LogClass::Error, place, "Allocate bitmap failed");
+        LogErrorAt(place, "Allocate bitmap failed");
     }
     return result;
 }
@@ -115,14 +111,13 @@ int VolumeBitmapOpen(const char *mountPath, VolumeBitmap *volume, const LogPlace
 int BitmapWriteAndSend(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
                        const LogPlace &place) {
     if (bitmapPath != nullptr && BitmapWriteToFile(bitmap, bitmapPath) < 0) {
-        LogWrite(LogClass::Error, place, "Write bitmap failed");
+        LogErrorAt(place, "Write bitmap failed");
         return -1;
     }
     if (BitmapSendToDriver(bitmap, cachePath) < 0) {
-        LogWrite(LogClass::Error, place, "Can't send bitmap to driver");
+        LogErrorAt(place, "Can't send bitmap to driver");
         return -1;
     }
     return 0;
 }
-
 } // namespace vesk

@@ -1,7 +1,5 @@
 // The pin bitmap of a space: sized from the space's cache device, filled from the space's bitmap
-// file.
-//
-// Thread rule: no state; a bitmap belongs to one thread at a time.
+// file. Thread rule: no state; a bitmap belongs to one thread at a time.
 #pragma once
 
 #include "base/log.h"
@@ -12,7 +10,6 @@
 #include <memory>
 
 namespace vesk {
-
 // The bitmap size (bytes) that the cache device at `cachePath` needs. 0, or -1 after an error
 // message.
 int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes);
@@ -44,5 +41,4 @@ int VolumeBitmapOpen(const char *mountPath, VolumeBitmap *volume, const LogPlace
 // after an error message at the caller's place.
 int BitmapWriteAndSend(PinBitmap *bitmap, const char *bitmapPath, const char *cachePath,
                        const LogPlace &place);
-
 } // namespace vesk

@@ -3,19 +3,7 @@
 #include "base/log.h"
 #include "base/malloc_text.h"
 #include "cli/options.h"
-#include "cli/usage.h"
-#include "commands/check_bitmap_set.h"
-#include "commands/check_file_pin.h"
-#include "commands/delete_bitmap.h"
-#include "commands/files_request.h"
-#include "commands/get_bitmap_size.h"
-#include "commands/handle_mount.h"
-#include "commands/handle_umount.h"
-#include "commands/modify_bitmap.h"
-#include "commands/pending_space.h"
-#include "commands/send_bitmap.h"
-#include "commands/unpin_all.h"
-#include "commands/unpin_range.h"
+#include "commands/commands.h"
 #include "driver/bitmap_control.h"
 #include "request/tool_parameters.h"
 #include "service/start_service.h"
@@ -31,7 +19,6 @@
 using namespace vesk;
 
 namespace {
-
 const char kBuildStamp[] = "2018-06-08-15:24";
 
 const int kSuccess = 0; // exit values
@@ -41,8 +28,8 @@ const int kFailure = -1;
 #define AtMain() (LogPlace{"main", __LINE__})
 
 // The exit value behind the message that tells of it.
-#define Succeed(...) (LogWrite(LogClass::Notice, AtMain(), __VA_ARGS__), kSuccess)
-#define Fail(...) (LogWrite(LogClass::Error, AtMain(), __VA_ARGS__), kFailure)
+#define Succeed(...) (LogNoticeAt(AtMain(), __VA_ARGS__), kSuccess)
+#define Fail(...) (LogErrorAt(AtMain(), __VA_ARGS__), kFailure)
 
 int PrintAnswer(bool yes) {
     puts(yes ? "Yes" : "No");
@@ -50,32 +37,32 @@ int PrintAnswer(bool yes) {
 }
 
 int NoCommand(const ToolParameters & /*asked*/) {
-    LogWrite(LogClass::Error, AtMain(), "Invalid input");
+    LogErrorAt(AtMain(), "Invalid input");
     Usage();
     return kSuccess;
 }
 
 int RunPinFiles(const ToolParameters &asked) {
-    LogWrite(LogClass::Notice, AtMain(), "Send pin file request, files = %s", asked.files);
+    LogNoticeAt(AtMain(), "Send pin file request, files = %s", asked.files);
     return PinFilesRequest(&asked) < 0 ? Fail("Pin files failed")
                                        : Succeed("Send pin file request OK");
 }
 
 int RunUnpinFiles(const ToolParameters &asked) {
-    LogWrite(LogClass::Notice, AtMain(), "Send unpin file request, files = %s", asked.files);
+    LogNoticeAt(AtMain(), "Send unpin file request, files = %s", asked.files);
     return UnpinFilesRequest(&asked) < 0 ? Fail("Unpin files failed")
                                          : Succeed("Send unpin files request OK");
 }
 
 int RunSendBitmap(const ToolParameters &asked) {
-    LogWrite(LogClass::Notice, AtMain(), "Start to send bitmap for volume (%s)", asked.mountPath);
+    LogNoticeAt(AtMain(), "Start to send bitmap for volume (%s)", asked.mountPath);
     return SendBitmap(asked.mountPath) < 0
                ? Fail("Send bitmap to space (%s) failed", asked.mountPath)
                : Succeed("Send bitmap OK");
 }
 
 int RunStartService(const ToolParameters &asked) {
-    LogWrite(LogClass::Notice, AtMain(), "Service starts (Build time: %s)", kBuildStamp);
+    LogNoticeAt(AtMain(), "Service starts (Build time: %s)", kBuildStamp);
     return StartService(&asked) < 0 ? Fail("Can't start service") : kSuccess;
 }
 
@@ -137,7 +124,7 @@ int RunCheckPin(const ToolParameters &asked) {
 }
 
 int RunReloadPinBlocks(const ToolParameters &asked) {
-    LogWrite(LogClass::Notice, AtMain(), "Start to send reload block request");
+    LogNoticeAt(AtMain(), "Start to send reload block request");
     return ReloadPinBlocksRequest(&asked) < 0
                ? Fail("Reload blocks on volume (%s) failed", asked.mountPath)
                : Succeed("Send reload block request OK");
@@ -200,7 +187,6 @@ static_assert(std::size(kHandlers) == kCommandGetBitmapSizeByte + 1, "a handler 
 
 // Static: the service's worker reads it after the first thread may have ended.
 ToolParameters parameters;
-
 } // namespace
 
 int main(int argc, char *argv[]) try {

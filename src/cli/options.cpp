@@ -1,8 +1,7 @@
 #include "cli/options.h"
 
 #include "base/log.h"
-#include "cli/file_list.h"
-#include "cli/usage.h"
+#include "cli/required_parameters.h"
 #include "files/path.h"
 #include "space/space_cache.h"
 
@@ -14,9 +13,7 @@
 #include <iterator>
 
 namespace vesk {
-
 namespace {
-
 // An option where it was met on the command line; messages about it name that place.
 struct MetOption {
     char *argument;
@@ -45,7 +42,7 @@ bool KeepMountPath(const MetOption &met) {
 
 bool KeepSpaceUuid(const MetOption &met) {
     if (!SpaceHasCache(met.argument)) {
-        LogWrite(LogClass::Error, met.place, "Space UUID %s doesn't has cache", met.argument);
+        LogErrorAt(met.place, "Space UUID %s doesn't has cache", met.argument);
         return false;
     }
     return Keep<&ToolParameters::spaceUuid>(met);
@@ -53,7 +50,7 @@ bool KeepSpaceUuid(const MetOption &met) {
 
 bool KeepCheckPinFile(const MetOption &met) {
     if (!PathExists(met.argument)) {
-        LogWrite(LogClass::Error, met.place, "File (%s) doesn't exist", met.argument);
+        LogErrorAt(met.place, "File (%s) doesn't exist", met.argument);
         return false;
     }
     return Keep<&ToolParameters::checkPinFilePath>(met);
@@ -65,13 +62,13 @@ bool LogToStandardOutput(const MetOption & /*met*/) {
 }
 
 bool EnableVerbose(const MetOption &met) {
-    LogWrite(LogClass::Notice, met.place, "Verbose mode is enable");
+    LogNoticeAt(met.place, "Verbose mode is enable");
     met.parameters->verbose = 1;
     return true;
 }
 
 bool EnableDebug(const MetOption &met) {
-    LogWrite(LogClass::Notice, met.place, "Debug mode is enable");
+    LogNoticeAt(met.place, "Debug mode is enable");
     met.parameters->debug = 1;
     return true;
 }
@@ -163,7 +160,6 @@ bool ActOnOption(const OptionRow &row, RequiredParameters *required, const MetOp
     }
     return row.act == nullptr || row.act(met);
 }
-
 } // namespace
 
 const char *ToolCommandToString(int command) {
@@ -178,44 +174,6 @@ void StripTrailingSlash(char *text) {
     if (length > 1 && text[length - 1] == '/') {
         text[length - 1] = '\0';
     }
-}
-
-int CheckParameter(const RequiredParameters *required, const ToolParameters *parameters) {
-    if (required->cachePath != 0) {
-        if (parameters->cachePath == nullptr) {
-            LogError("Error: Cache path is not set");
-            return -1;
-        }
-        if (!PathExists(parameters->cachePath)) {
-            LogError("Error: Cache path (%s) doesn't exist", parameters->cachePath);
-            return -1;
-        }
-    }
-    if (required->spaceUuid != 0 && parameters->spaceUuid == nullptr) {
-        LogError("Space UUID must be set");
-        return -1;
-    }
-    if (required->configPath != 0 && parameters->configPath == nullptr) {
-        LogError("Config path must be set");
-        return -1;
-    }
-    if (required->mountPath != 0 && parameters->mountPath == nullptr) {
-        LogError("Mount path must be set");
-        return -1;
-    }
-    if (required->files != 0 && CheckFilesExist(parameters->files) != 0) {
-        LogError("Check file paths error");
-        return -1;
-    }
-    if (required->startSector != 0 && parameters->startSector == kSectorNotSet) {
-        LogError("Start sector is not set");
-        return -1;
-    }
-    if (required->numSectors != 0 && parameters->numSectors == kSectorNotSet) {
-        LogError("Num of sectors is not set");
-        return -1;
-    }
-    return 0;
 }
 
 int GetOptions(int argc, char *argv[], ToolParameters *parameters) {
@@ -261,5 +219,4 @@ int GetOptions(int argc, char *argv[], ToolParameters *parameters) {
     }
     return 0;
 }
-
 } // namespace vesk

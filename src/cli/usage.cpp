@@ -1,13 +1,11 @@
-#include "cli/usage.h"
+#include "cli/options.h"
 
 #include "base/log.h"
 
 #include <cstdio>
 
 namespace vesk {
-
 namespace {
-
 // Scripts and people compare this text, so its slips stay: "--check-bitmp", the parenthesis left
 // open, the trailing blanks. Every %s is the program's name.
 const char *const kUsageLines[] = {
@@ -49,7 +47,6 @@ const char *const kUsageLines[] = {
     "\tSet the bitmap file in volume (You can set to driver by --send-bitmap later)\n",
     "\t\t%s --set-bitmap --mount-path mount_path --start-sector start_sector --num-sectors num_sectors\n",
 };
-
 } // namespace
 
 void Usage() {
@@ -57,5 +54,4 @@ void Usage() {
         printf(line, ProgramName); // NOLINT: every line has one %s or none
     }
 }
-
 } // namespace vesk

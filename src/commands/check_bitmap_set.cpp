@@ -1,4 +1,4 @@
-#include "commands/check_bitmap_set.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
@@ -6,7 +6,6 @@
 #include "space/space_cache.h"
 
 namespace vesk {
-
 int CheckBitmapSet(const char *mountPath) {
     int result = 0;
     MallocText cachePath;
@@ -25,5 +24,4 @@ int CheckBitmapSet(const char *mountPath) {
     LogVerbose("Bitmap set state = %d", result);
     return result;
 }
-
 } // namespace vesk

@@ -1,4 +1,4 @@
-#include "commands/check_file_pin.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "config/config_document.h"
@@ -8,7 +8,6 @@
 #include <string>
 
 namespace vesk {
-
 PinCheck CheckFileIsPin(const char *configPath, const char *filePath) {
     if (!PathExists(configPath)) {
         LogError("Can't find config file (%s)", configPath);
@@ -37,5 +36,4 @@ PinCheck CheckFileIsPin(const char *configPath, const char *filePath) {
     return volumes[mountPath]["files"].isMember(std::to_string(inode)) ? PinCheck::Pinned
                                                                        : PinCheck::NotPinned;
 }
-
 } // namespace vesk

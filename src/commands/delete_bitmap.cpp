@@ -1,14 +1,13 @@
-#include "commands/delete_bitmap.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
 #include "files/path.h"
-#include "space/space_bitmap_path.h"
+#include "space/space.h"
 
 #include <unistd.h>
 
 namespace vesk {
-
 int DeleteBitmap(const char *mountPath) {
     const MallocText bitmapPath(BitmapGetPathByReferencePath(mountPath));
     if (!bitmapPath) {
@@ -25,5 +24,4 @@ int DeleteBitmap(const char *mountPath) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -1,9 +1,8 @@
-#include "commands/files_request.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
-#include "commands/client_message.h"
 #include "request/message_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "request/tool_parameters.h"
 #include "space/space_cache.h"
 
@@ -11,18 +10,9 @@
 #include <cstring>
 
 namespace vesk {
-
-namespace {
-
-bool IsFilesRequest(int requestType) {
-    return requestType == kRequestPinFiles || requestType == kRequestUnpinFiles;
-}
-
-} // namespace
-
 int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) {
     LogTraceScope();
-    if (!IsFilesRequest(requestType) && requestType != kRequestReloadPinBlocks) {
+    if (!RequestHasFiles(requestType) && requestType != kRequestReloadPinBlocks) {
         LogError("Unhandle request type = %s", RequestTypeForLog(requestType));
         return -1;
     }
@@ -36,7 +26,7 @@ int HandleFilesByRequestType(const ToolParameters *parameters, int requestType) 
         return -1;
     }
     LogVerbose("Server mesage queue id = %d", queueId);
-    const char *files = IsFilesRequest(requestType) ? parameters->files : nullptr;
+    const char *files = RequestHasFiles(requestType) ? parameters->files : nullptr;
     return SendRequest(queueId, requestType, parameters->mountPath, files, LogHere());
 }
 
@@ -51,5 +41,4 @@ int UnpinFilesRequest(const ToolParameters *parameters) {
 int ReloadPinBlocksRequest(const ToolParameters *parameters) {
     return HandleFilesByRequestType(parameters, kRequestReloadPinBlocks);
 }
-
 } // namespace vesk

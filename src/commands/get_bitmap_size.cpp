@@ -1,4 +1,4 @@
-#include "commands/get_bitmap_size.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
@@ -6,7 +6,6 @@
 #include "space/space_cache.h"
 
 namespace vesk {
-
 int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
     const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
     if (!cachePath) {
@@ -19,5 +18,4 @@ int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -1,16 +1,15 @@
-#include "commands/handle_mount.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
 #include "config/pinned_files.h"
 #include "files/path.h"
-#include "space/space_bitmap_path.h"
+#include "space/space.h"
 #include "space/space_cache.h"
 
 #include <unistd.h>
 
 namespace vesk {
-
 int HandleSpaceMount(const char *configPath, const char *mountPath) {
     if (SpaceHasCacheAndSupportPin(mountPath) == 1) {
         return 0;
@@ -34,5 +33,4 @@ int HandleSpaceMount(const char *configPath, const char *mountPath) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -1,15 +1,12 @@
-#include "commands/modify_bitmap.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "bitmap/space_bitmap.h"
 
 namespace vesk {
-
 namespace {
-
 const int kOpUnset = 0;
 const int kOpSet = 1;
-
 } // namespace
 
 int ModifyBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors, int op) {
@@ -44,5 +41,4 @@ int UnsetBitmap(const char *mountPath, uint64_t startSector, uint64_t numSectors
     }
     return 0;
 }
-
 } // namespace vesk

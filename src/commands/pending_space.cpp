@@ -1,16 +1,14 @@
-#include "commands/pending_space.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
-#include "commands/client_message.h"
 #include "request/message_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "space/space_cache.h"
 
 #include <cerrno>
 #include <cstring>
 
 namespace vesk {
-
 int SetSpaceStateRequest(const char *mountPath, int requestType) {
     LogTraceScope();
     if (!SpaceHasCacheAndSupportPin(mountPath)) {
@@ -41,5 +39,4 @@ int AddPendingSpaceRequest(const char *mountPath) {
 int RemovePendingSpaceRequest(const char *mountPath) {
     return SetSpaceStateRequest(mountPath, kRequestRemovePendigSpace);
 }
-
 } // namespace vesk

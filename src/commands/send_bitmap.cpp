@@ -1,15 +1,13 @@
-#include "commands/send_bitmap.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "bitmap/space_bitmap.h"
 #include "driver/bitmap_control.h"
 #include "files/path.h"
 #include "space/space.h"
-#include "space/space_bitmap_path.h"
 #include "space/space_cache.h"
 
 namespace vesk {
-
 int SendBitmap(const char *mountPath) {
     if (!SpaceHasCacheAndSupportPin(mountPath)) {
         LogError("Volume (%s) doesn't support pin", mountPath);
@@ -50,5 +48,4 @@ int SendBitmap(const char *mountPath) {
     return BitmapWriteAndSend(volume.bitmap.get(), volume.sizeChanged ? bitmapPath : nullptr,
                               cachePath, LogHere());
 }
-
 } // namespace vesk

@@ -1,14 +1,13 @@
-#include "commands/unpin_all.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
-#include "driver/device_ioctl.h"
+#include "driver/device.h"
 #include "driver/pin_interface.h"
 #include "request/tool_parameters.h"
 #include "space/space_cache.h"
 
 namespace vesk {
-
 int UnpinAllBlocksByCachePath(const char *cachePath) {
     if (cachePath == nullptr) {
         LogError("Incorrect parameter");
@@ -43,5 +42,4 @@ int UnpinAllBlocks(const ToolParameters *parameters) {
     LogNotice("Unpin all blocks of %s (%s) finish", kind, path);
     return 0;
 }
-
 } // namespace vesk

@@ -1,4 +1,4 @@
-#include "commands/unpin_range.h"
+#include "commands/commands.h"
 
 #include "base/log.h"
 #include "base/malloc_text.h"
@@ -6,7 +6,6 @@
 #include "space/space_cache.h"
 
 namespace vesk {
-
 int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors) {
     LogTraceScope();
     const MallocText cachePath(SpaceGetCachePathByMountPath(mountPath));
@@ -18,5 +17,4 @@ int UnpinRange(const char *mountPath, uint64_t startSector, uint64_t numSectors)
     list.ranges[0] = {startSector, numSectors};
     return SendUnpinList(cachePath.get(), &list, LogHere());
 }
-
 } // namespace vesk

@@ -6,36 +6,27 @@
 #include <algorithm>
 
 namespace vesk {
-
 namespace {
-
 bool IsText(const Json::Value &value) {
     return value.isConvertibleTo(Json::stringValue);
-}
-
-bool IsRequest(const Json::Value &request) {
-    if (request.isNull()) {
-        return true;
-    }
-    return request.isObject() && IsText(request["type"]) && IsText(request["mountPath"]) &&
-           IsText(request["data"]);
-}
-
-bool IsVolume(const Json::Value &volume) {
-    if (volume.isNull()) {
-        return true;
-    }
-    return volume.isObject() && (volume["files"].isNull() || volume["files"].isObject());
-}
-
-template <typename Test> bool AllMembers(const Json::Value &container, Test test) {
-    return std::all_of(container.begin(), container.end(), test);
 }
 
 bool IsNullOrObject(const Json::Value &value) {
     return value.isNull() || value.isObject();
 }
 
+bool IsRequest(const Json::Value &request) {
+    return request.isNull() || (request.isObject() && IsText(request["type"]) &&
+                                IsText(request["mountPath"]) && IsText(request["data"]));
+}
+
+bool IsVolume(const Json::Value &volume) {
+    return volume.isNull() || (volume.isObject() && IsNullOrObject(volume["files"]));
+}
+
+template <typename Test> bool AllMembers(const Json::Value &container, Test test) {
+    return std::all_of(container.begin(), container.end(), test);
+}
 } // namespace
 
 bool ConfigHasShape(const Json::Value &root) {
@@ -65,16 +56,16 @@ int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChan
     // it would lose every record.
     const bool absent = creates ? PathIsMissing(configPath) == 1 : PathExists(configPath) == 0;
     if (absent && missing == MissingConfig::Skipped) {
-        LogWrite(LogClass::Verbose, place, "No config file (%s), skip it", configPath);
+        LogVerboseAt(place, "No config file (%s), skip it", configPath);
         return 0;
     }
     if (absent && !creates) {
-        LogWrite(LogClass::Error, place, "Can't find config file (%s)", configPath);
+        LogErrorAt(place, "Can't find config file (%s)", configPath);
         return -1;
     }
     Json::Value root;
     if (!absent && ConfigReadDocument(configPath, &root) < 0) {
-        LogWrite(LogClass::Error, place, "Can't read data from config file (%s)", configPath);
+        LogErrorAt(place, "Can't read data from config file (%s)", configPath);
         return -1;
     }
     const char *failure = change(root);
@@ -84,7 +75,7 @@ int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChan
     if (failure[0] == '\0') {
         return 0;
     }
-    LogWrite(LogClass::Error, place, "%s", failure);
+    LogErrorAt(place, "%s", failure);
     return -1;
 }
 
@@ -94,11 +85,10 @@ int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig m
         return 0;
     }
     if (missing == MissingConfig::Created) {
-        LogWrite(LogClass::Error, place, "Can't write to files");
+        LogErrorAt(place, "Can't write to files");
     } else {
-        LogWrite(LogClass::Error, place, "Write json data to config (%s) failed", configPath);
+        LogErrorAt(place, "Write json data to config (%s) failed", configPath);
     }
     return -1;
 }
-
 } // namespace vesk

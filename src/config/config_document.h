@@ -14,7 +14,6 @@
 #include <json/value.h>
 
 namespace vesk {
-
 // Whether the operations on the document can work on it without a type error.
 bool ConfigHasShape(const Json::Value &root);
 
@@ -37,5 +36,4 @@ int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChan
 // of one that does not.
 int ConfigWrite(const Json::Value &root, const char *configPath, MissingConfig missing,
                 const LogPlace &place);
-
 } // namespace vesk

@@ -5,7 +5,6 @@
 #include <algorithm>
 
 namespace vesk {
-
 bool JsonArrayHasString(Json::Value array, const char *text) { // NOLINT(performance-*): by value
     if (!array.isArray()) {
         return false;
@@ -32,5 +31,4 @@ int JsonArrayRemoveString(Json::Value &array, const std::string &text) {
     array = std::move(kept);
     return 0;
 }
-
 } // namespace vesk

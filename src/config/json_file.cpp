@@ -14,9 +14,7 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 namespace {
-
 // jsoncpp throws on a document nested deeper than it is willing to follow. What only a lenient
 // reader takes for JSON counts as damaged: other readers of the file would refuse it.
 bool ParseStream(std::istream &stream, Json::Value *root) {
@@ -56,7 +54,6 @@ bool IsFifo(const std::string &path) {
     struct stat status {};
     return stat(path.c_str(), &status) == 0 && S_ISFIFO(status.st_mode);
 }
-
 } // namespace
 
 int ReadFileToJson(const std::string &path, Json::Value *root) {
@@ -84,5 +81,4 @@ int WriteJsonToFile(const Json::Value &root, const char *path) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -7,7 +7,6 @@
 #include <string>
 
 namespace vesk {
-
 // 0, or -1 after an error message when the file cannot be opened or is not JSON (an empty one is
 // not);
 // `*root` may hold a part of the document then. Never throws.
@@ -17,5 +16,4 @@ int ReadFileToJson(const std::string &path, Json::Value *root);
 // the file cannot be opened. A document that can be opened but not written whole (a full disk)
 // leaves the old one in place and is not reported: 0.
 int WriteJsonToFile(const Json::Value &root, const char *path);
-
 } // namespace vesk

@@ -4,18 +4,13 @@
 #include "config/config_document.h"
 #include "config/request_queue.h"
 #include "request/file_inode_list.h"
-#include "request/request_type.h"
-#include "state/service_state.h"
 
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 const int kVolumeAbsent = 1;
 const int kVolumeRemoved = 2;
-
 } // namespace
 
 int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
@@ -24,7 +19,7 @@ int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record) {
         RequestToString(&text, record);
         LogVerbose("mount path = %s request = %s", record->mountPath, text.c_str());
     }
-    if (record->type != kRequestPinFiles && record->type != kRequestUnpinFiles) {
+    if (!RequestHasFiles(record->type)) {
         LogVerbose("No need to update pin file list");
         return 0;
     }
@@ -88,8 +83,7 @@ int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
     const auto remove = [mountPath, &place, &outcome](Json::Value &root) {
         outcome = JsonRemovePinFileVolume(root, mountPath);
         if (outcome == kVolumeAbsent) {
-            LogWrite(LogClass::Verbose, place,
-                     "Volume (%s) deson't has pin files, no need to remove", mountPath);
+            LogVerboseAt(place, "Volume (%s) deson't has pin files, no need to remove", mountPath);
         }
         return outcome == kVolumeRemoved ? nullptr : "";
     };
@@ -104,5 +98,4 @@ int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
     LogNotice("Remove pin file volume (%s) from config file", mountPath);
     return 0;
 }
-
 } // namespace vesk

@@ -15,7 +15,6 @@
 #include <string>
 
 namespace vesk {
-
 // Applies a finished pin or unpin request to the volume's records; other types change nothing. 0,
 // or -1 after an error message; then the tree must not be written.
 int JsonUpdatePinFileInfo(Json::Value &root, const RequestRecord *record);
@@ -31,5 +30,4 @@ int ConfigUpdatedByFinishedRequest(const char *configPath, const RequestRecord *
 // Removes the volume's records from the file. A missing file or volume is success and writes
 // nothing. 0, or -1 after an error message with the file as it was.
 int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath);
-
 } // namespace vesk

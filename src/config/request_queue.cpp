@@ -4,16 +4,12 @@
 #include "config/config_document.h"
 #include "config/json_array.h"
 #include "request/file_inode_list.h"
-#include "request/request_type.h"
-#include "state/service_state.h"
 
 #include <cstdint>
 #include <cstdio>
 
 namespace vesk {
-
 namespace {
-
 const int64_t kRequestNumberModulus = 2147483646;
 
 // The number of the next request; the document's counter moves on.
@@ -22,7 +18,6 @@ int TakeRequestNumber(Json::Value &nextRequestNum) {
     nextRequestNum = static_cast<int>((static_cast<int64_t>(number) + 1) % kRequestNumberModulus);
     return number;
 }
-
 } // namespace
 
 int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
@@ -46,7 +41,7 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
     request["type"] = typeName;
     request["mountPath"] = record->mountPath;
     request["data"] = Json::Value();
-    if (record->type == kRequestPinFiles || record->type == kRequestUnpinFiles) {
+    if (RequestHasFiles(record->type)) {
         char list[kRequestDataBytes] = {};
         if (AbsolutePathsToFileInodeList(record->mountPath, record->data, list, sizeof(list)) < 0) {
             LogError("Get relative paths failed");
@@ -107,5 +102,4 @@ int ConfigDropErrorRequest(const char *configPath, const RequestRecord * /*recor
     };
     return ConfigUpdate(configPath, MissingConfig::IsAnError, remove, LogHere());
 }
-
 } // namespace vesk

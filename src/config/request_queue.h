@@ -15,7 +15,6 @@
 #include <string>
 
 namespace vesk {
-
 // Adds the request to the document in memory. The record's texts are NUL-terminated. 0, or -1 after
 // an error message; then the tree is half changed and must not be written.
 int JsonAddRequest(Json::Value &root, const RequestRecord *record);
@@ -38,5 +37,4 @@ int ConfigGetJsonAndNumRequest(const char *configPath, Json::Value *root, int *c
 // file as it was.
 int ConfigDropErrorRequest(const char *configPath, const RequestRecord *record,
                            const std::string &num) NEEDS_NO_LOCK(serviceLock);
-
 } // namespace vesk

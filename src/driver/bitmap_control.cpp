@@ -1,10 +1,9 @@
 #include "driver/bitmap_control.h"
 
 #include "base/log.h"
-#include "driver/device_ioctl.h"
+#include "driver/device.h"
 
 namespace vesk {
-
 static_assert(sizeof(void *) != 4 || sizeof(PinBitmap) == kPinBitmapDescriptorBytes,
               "the record is the descriptor that the driver of the 32-bit target reads");
 
@@ -37,5 +36,4 @@ int isAllBlocksUnpin(const char *cachePath, int *allUnpinned) {
     LogVerbose("Is all block unpin = %d", *allUnpinned);
     return 0;
 }
-
 } // namespace vesk

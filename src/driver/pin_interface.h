@@ -8,7 +8,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 const unsigned kPinIoctlSetBitmap = 0x0000FECF;        // payload: PinBitmap, the bitmap descriptor
 const unsigned kPinIoctlQueryBitmapSet = 0x8004FECF;   // payload: 32-bit int, filled by the driver
 const unsigned kPinIoctlUnpinRanges = 0x0000FED0;      // payload: a whole range list
@@ -40,5 +39,4 @@ struct UnpinList {
     UnpinInfo ranges[kUnpinListRecords];
 };
 static_assert(sizeof(UnpinList) == kUnpinListBytes, "the driver copies 16384 bytes");
-
 } // namespace vesk

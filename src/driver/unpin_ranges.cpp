@@ -1,11 +1,10 @@
 #include "driver/unpin_ranges.h"
 
-#include "driver/device_ioctl.h"
+#include "driver/device.h"
 
 #include <sys/types.h>
 
 namespace vesk {
-
 void DumpRanges(const UnpinInfo *ranges, size_t count) {
     for (size_t i = 0; i < count; ++i) {
         LogNotice("Unpin range [%zd] start sector = %llu num sectors = %llu",
@@ -48,5 +47,4 @@ int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &r
     }
     return 0;
 }
-
 } // namespace vesk

@@ -1,6 +1,5 @@
-// Telling the cache driver which sector ranges it may release.
-//
-// Thread rule: no state; every request opens the device anew.
+// Telling the cache driver which sector ranges it may release. Thread rule: no state; every request
+// opens the device anew.
 #pragma once
 
 #include "base/log.h"
@@ -10,7 +9,6 @@
 #include <vector>
 
 namespace vesk {
-
 // Logs each range, at every level.
 void DumpRanges(const UnpinInfo *ranges, size_t count);
 
@@ -21,5 +19,4 @@ int SendUnpinList(const char *cachePath, UnpinList *list, const LogPlace &place)
 // dropped: of 1025 ranges the last stays pinned, of 1026 the second list holds only the last. 0, or
 // -1 after an error message; lists sent before the failure stay sent.
 int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &ranges);
-
 } // namespace vesk

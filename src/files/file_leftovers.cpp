@@ -15,9 +15,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 // A process of another PID namespace looks gone while it is still at work, though not for this
 // long.
 const time_t kQuietSeconds = 60;
@@ -47,7 +45,6 @@ bool IsLeftover(int folder, const char *name) {
     return fstatat(folder, name, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(status.st_mode) &&
            status.st_mtime + kQuietSeconds < time(nullptr);
 }
-
 } // namespace
 
 void FileRemoveLeftovers(const char *path) {
@@ -65,5 +62,4 @@ void FileRemoveLeftovers(const char *path) {
         }
     }
 }
-
 } // namespace vesk

@@ -1,11 +1,8 @@
 // Removes what processes that died while they replaced a file (files/file_replace.h) left in its
-// folder, so that years of crashes do not fill it.
-//
-// Thread rule: no state.
+// folder, so that years of crashes do not fill it. Thread rule: no state.
 #pragma once
 
 namespace vesk {
-
 // The names of the temporary files through which a file is replaced:
 // ".veskcachepinfile." + process id + "." + a number + ".tmp".
 const char kTemporaryPrefix[] = ".veskcachepinfile.";
@@ -14,5 +11,4 @@ const char kTemporarySuffix[] = ".tmp";
 // Removes the temporary files beside `path` whose process is gone and that nobody has written to
 // for a minute; what cannot be removed stays. Never logs.
 void FileRemoveLeftovers(const char *path);
-
 } // namespace vesk

@@ -6,16 +6,12 @@
 
 #include <atomic>
 #include <cerrno>
-#include <cstdio>
 #include <fcntl.h>
-#include <string>
 #include <sys/stat.h>
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 enum class Attempt { Done, NotCreated, NotWritten, NotAllowed };
 
 bool WriteAll(int fd, const std::string &content) {
@@ -150,7 +146,6 @@ FileReplaceResult ReplaceExisting(const char *path, const struct stat &old,
     }
     return Replace(path, target.get(), &old, content);
 }
-
 } // namespace
 
 FileReplaceResult FileReplaceContent(const char *path, const std::string &content) {
@@ -165,5 +160,4 @@ FileReplaceResult FileReplaceContent(const char *path, const std::string &conten
     }
     return WriteInPlace(path, content);
 }
-
 } // namespace vesk

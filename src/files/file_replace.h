@@ -12,7 +12,6 @@
 #include <string>
 
 namespace vesk {
-
 enum class FileReplaceResult {
     Done,
     CannotOpen, // the file cannot be opened for writing or created; nothing changed
@@ -21,5 +20,4 @@ enum class FileReplaceResult {
 
 // Never blocks on a FIFO: a path that cannot be opened for writing at once is CannotOpen.
 FileReplaceResult FileReplaceContent(const char *path, const std::string &content);
-
 } // namespace vesk

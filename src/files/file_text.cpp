@@ -9,11 +9,8 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 using Stream = std::unique_ptr<FILE, Deleter<fclose>>;
-
 } // namespace
 
 int FileWriteString(const char *path, const char *text, OldContent old) {
@@ -52,5 +49,4 @@ int FileReadString(const char *path, std::string *text) {
     LogVerbose("Get text = %s", text->c_str());
     return 0;
 }
-
 } // namespace vesk

@@ -4,7 +4,6 @@
 #include <string>
 
 namespace vesk {
-
 // What becomes of the content of a file that is there already.
 enum class OldContent { Emptied, Kept };
 
@@ -15,5 +14,4 @@ int FileWriteString(const char *path, const char *text, OldContent old = OldCont
 // The first line of the file, with its line feed if it has one. 0, or -1 after an error message
 // when the file cannot be opened or is empty.
 int FileReadString(const char *path, std::string *text);
-
 } // namespace vesk

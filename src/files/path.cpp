@@ -6,21 +6,18 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 namespace {
-
 const mode_t kFileBit = 0x8000;
 const mode_t kDirectoryBit = 0x4000;
 
 int HasModeBit(const char *path, mode_t bit, const LogPlace &place) {
     struct stat status {};
     if (stat(path, &status) < 0) {
-        LogWrite(LogClass::Error, place, "Path (%s) doesn't exist", path);
+        LogErrorAt(place, "Path (%s) doesn't exist", path);
         return 0;
     }
     return (status.st_mode & bit) != 0 ? 1 : 0;
 }
-
 } // namespace
 
 int FileGetSizeByte(const char *path, uint64_t *sizeBytes) {
@@ -63,5 +60,4 @@ int PathIsFile(const char *path) {
 int PathIsDir(const char *path) {
     return HasModeBit(path, kDirectoryBit, LogHere());
 }
-
 } // namespace vesk

@@ -1,12 +1,10 @@
-// Questions about paths, answered by a stat that follows symbolic links.
-//
-// Thread rule: no state; callable from any thread.
+// Questions about paths, answered by a stat that follows symbolic links. Thread rule: no state;
+// callable from any thread.
 #pragma once
 
 #include <cstdint>
 
 namespace vesk {
-
 // The file's size in `*sizeBytes` (bytes). 0, or -1 after an error message.
 int FileGetSizeByte(const char *path, uint64_t *sizeBytes);
 
@@ -25,5 +23,4 @@ int PathIsMissing(const char *path);
 // not the whole file type: a socket counts as a file, a block device as a directory.
 int PathIsFile(const char *path);
 int PathIsDir(const char *path);
-
 } // namespace vesk

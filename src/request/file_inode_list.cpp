@@ -5,7 +5,6 @@
 #include "files/path.h"
 #include "space/relative_path.h"
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdint>
 #include <cstdio>
@@ -13,9 +12,7 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 const char kEntryFormat[] = "%s%s#%lu"; // separator, relative path, inode number
 
 // Fills the record from one entry; false when it is none. The entry is taken apart by hand: its
@@ -39,7 +36,6 @@ bool ParseEntry(const std::string &entry, FileInfo *info) {
     info->inodeNum = static_cast<unsigned long>(inode);
     return true;
 }
-
 } // namespace
 
 int AbsolutePathsToFileInodeList(const char *mountPath, const char *absolutePaths, char *out,
@@ -100,5 +96,4 @@ int RequestDataGetFileInfos(const char *data, std::vector<FileInfo> *infos) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -13,7 +13,6 @@
 #include <vector>
 
 namespace vesk {
-
 struct FileInfo {
     char szRelativePath[512]; // NUL-terminated, relative to the volume's mount path
     unsigned long inodeNum;   // 32 bits of it are used
@@ -33,5 +32,4 @@ void SplitString(const char *text, const char *delimiters, std::vector<std::stri
 // decimal number that fits in 32 bits; what follows the number is ignored. 0, or -1 after an error
 // message at the first entry that is none; those before it stay appended.
 int RequestDataGetFileInfos(const char *data, std::vector<FileInfo> *infos);
-
 } // namespace vesk

@@ -1,9 +1,7 @@
 #include "request/message_queue.h"
 
-#include "base/log.h"
 #include "files/file_text.h"
 #include "files/path.h"
-#include "request/request_type.h"
 
 #include <cerrno>
 #include <cstdio>
@@ -14,15 +12,12 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const int kKeyProject = 'x';
 const int kKeyReadTries = 3;
 const int kSendTries = 3;
 const int kAckTries = 3;
 static_assert((IPC_CREAT | IPC_EXCL | 0644) == 0x7A4, "creation flags");
-
 } // namespace
 
 int GetMsgKey(int *key, const char *path) {
@@ -119,6 +114,23 @@ int MsgQueueSend(int queueId, const RequestMessage *message, size_t size) {
     return -1;
 }
 
+int SendRequest(int queueId, int requestType, const char *mountPath, const char *files,
+                const LogPlace &place) {
+    RequestMessage message{};
+    message.messageType = kRequestMessageType;
+    RequestRecord &record = message.record;
+    record.type = requestType;
+    memcpy(record.mountPath, mountPath, strnlen(mountPath, sizeof(record.mountPath)));
+    if (files != nullptr) {
+        memcpy(record.data, files, strnlen(files, sizeof(record.data)));
+    }
+    if (MsgQueueSend(queueId, &message, kRequestMessageBytes) == -1) {
+        LogErrorAt(place, "Send message failed: %s", strerror(errno));
+        return -1;
+    }
+    return 0;
+}
+
 int WaitForAck(int queueId, long messageType) {
     LogTraceScope();
     RequestMessage message{};
@@ -142,5 +154,4 @@ int WaitForAck(int queueId, long messageType) {
     LogVerbose("Get ACK from servier");
     return 0;
 }
-
 } // namespace vesk

@@ -8,9 +8,30 @@
 // the file between its creation and the writing of the key fails.
 #pragma once
 
-#include "request/message.h"
+#include "base/log.h"
+#include "request/request_record.h"
+
+#include <cstddef>
 
 namespace vesk {
+// What clients send: the text is one request record. The header word is 4 bytes on the 32-bit
+// target and 8 on 64-bit hosts, and is not counted in the message size; the text is the same on
+// both.
+struct RequestMessage {
+    long messageType; // kRequestMessageType
+    RequestRecord record;
+};
+static_assert(offsetof(RequestMessage, record) == sizeof(long), "the text follows the header word");
+static_assert(sizeof(long) != 4 || sizeof(RequestMessage) == 1544, "message of the 32-bit target");
+
+const char kMessageKeyFile[] = "/var/run/veskcachepinfile-msg-server.key";
+const long kRequestMessageType = 1;
+const size_t kRequestMessageBytes = sizeof(RequestRecord); // 1540
+
+// How many requests the queue must hold, and its byte limit for that.
+const int kMessageQueueRequests = 1024;
+const unsigned long kMessageQueueBytes = kMessageQueueRequests * kRequestMessageBytes;
+static_assert(kMessageQueueBytes == 1576960, "0x181000 bytes");
 
 // The queue's key from the first line of the file. 0, or -1 after an error message when the file
 // cannot be read. A line that does not begin with a number throws std::invalid_argument or
@@ -29,8 +50,12 @@ int MsgQueueGet(const char *keyFile);
 // the last attempt.
 int MsgQueueSend(int queueId, const RequestMessage *message, size_t size);
 
+// Sends a request of this type for the volume, with `files` as its data unless null. A text that
+// fills its field has no NUL there. 0, or -1 after an error message at the caller's place.
+int SendRequest(int queueId, int requestType, const char *mountPath, const char *files,
+                const LogPlace &place);
+
 // Waits up to three seconds for an acknowledgement of this message type. 0, or -1 after an error
 // message. The service sends none, and no command waits.
 int WaitForAck(int queueId, long messageType);
-
 } // namespace vesk

@@ -1,5 +1,6 @@
 // The request record: what a client sends and what the worker hands to the handlers. It travels
-// byte for byte in the queue message. Thread rule: no state.
+// byte for byte in the queue message; the name of its type stands in the configuration file. Thread
+// rule: no state.
 #pragma once
 
 #include <cstddef>
@@ -7,6 +8,29 @@
 #include <string>
 
 namespace vesk {
+enum RequestType : int32_t {
+    kRequestUnknown = 0,
+    kRequestPinFiles = 1,
+    kRequestUnpinFiles = 2,
+    kRequestAck = 3,
+    kRequestAddPendingSpace = 4,
+    kRequestRemovePendigSpace = 5,
+    kRequestReloadPinBlocks = 6,
+};
+
+// The type's name; null after an error message for a value outside 0 to 6.
+const char *RequestTypeToString(int type);
+
+// The same for log lines: "(null)" where there is no name, so that no null is ever printed.
+const char *RequestTypeForLog(int type);
+
+// Whether requests of this type are about certain files.
+inline bool RequestHasFiles(int type) {
+    return type == kRequestPinFiles || type == kRequestUnpinFiles;
+}
+
+// The first type of this name, compared exactly; kRequestUnknown when there is none.
+int StringToRequestType(const std::string &name);
 
 const size_t kRequestMountPathBytes = 512;
 const size_t kRequestDataBytes = 1024;
@@ -22,5 +46,4 @@ static_assert(sizeof(RequestRecord) == 1540, "the record is 1540 bytes on every 
 
 // Sets `out` to "Request type=%s mountPath=%s data=%s", cut to 1023 characters; for log lines.
 void RequestToString(std::string *out, const RequestRecord *record);
-
 } // namespace vesk

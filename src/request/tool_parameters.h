@@ -7,7 +7,6 @@
 #include <cstdint>
 
 namespace vesk {
-
 enum ToolCommand : int {
     kCommandInvalid = 0,
     kCommandPinFiles = 1,
@@ -47,5 +46,4 @@ struct ToolParameters {
     int verbose = 0;
     ToolCommand command = kCommandInvalid; // the last one on the command line
 };
-
 } // namespace vesk

@@ -4,18 +4,13 @@
 #include "config/config_document.h"
 #include "config/request_queue.h"
 #include "files/path.h"
-#include "request/request_type.h"
 #include "space/space_cache.h"
-#include "state/service_state.h"
 
 #include <cstdio>
-#include <cstring>
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 // Copies text into a field, cut so that a NUL ends it.
 template <size_t size> void CopyText(char (&field)[size], const std::string &text) {
     snprintf(field, size, "%s", text.c_str());
@@ -27,17 +22,17 @@ int WaitForQueuedRequest(const char *configPath, Json::Value *root, const LogPla
     for (;;) {
         int count = 0;
         if (!PathExists(configPath)) {
-            LogWrite(LogClass::Verbose, place, "Config doesn't exist");
+            LogVerboseAt(place, "Config doesn't exist");
         } else if (ConfigGetJsonAndNumRequest(configPath, root, &count) < 0) {
-            LogWrite(LogClass::Error, place, "Get request from config file (%s) error", configPath);
+            LogErrorAt(place, "Get request from config file (%s) error", configPath);
             return -1;
         }
         if (count > 0) {
             return 0;
         }
-        LogWrite(LogClass::Verbose, place, "Go to block mode");
+        LogVerboseAt(place, "Go to block mode");
         ServiceWaitForRequest();
-        LogWrite(LogClass::Verbose, place, "Wake up");
+        LogVerboseAt(place, "Wake up");
     }
 }
 
@@ -46,18 +41,17 @@ int DropRequests(const std::vector<std::string> &numbers, Json::Value &root, con
                  const LogPlace &place) {
     for (const std::string &number : numbers) {
         if (JsonRemoveRequest(root, number) < 0) {
-            LogWrite(LogClass::Error, place, "Can't remove request (%s)", number.c_str());
+            LogErrorAt(place, "Can't remove request (%s)", number.c_str());
             return -1;
         }
-        LogWrite(LogClass::Verbose, place, "Remove request (%s)", number.c_str());
+        LogVerboseAt(place, "Remove request (%s)", number.c_str());
     }
     if (ConfigWrite(root, configPath, MissingConfig::Created, place) < 0) {
         return -1;
     }
-    LogWrite(LogClass::Notice, place, "Drop requests finish");
+    LogNoticeAt(place, "Drop requests finish");
     return 0;
 }
-
 } // namespace
 
 NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
@@ -119,5 +113,4 @@ NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, Reques
     }
     return found ? NextRequest::Taken : NextRequest::None;
 }
-
 } // namespace vesk

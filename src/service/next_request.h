@@ -13,7 +13,6 @@
 #include <string>
 
 namespace vesk {
-
 enum class NextRequest : int {
     None = 0,  // requests are queued, none may run now
     Taken = 2, // a request was taken; it stays in the file until it is done
@@ -24,5 +23,4 @@ enum class NextRequest : int {
 // limit, while the file is missing or the queue is empty.
 NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
                                                   std::string *num) NEEDS_NO_LOCK(serviceLock);
-
 } // namespace vesk

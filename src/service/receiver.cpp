@@ -2,9 +2,7 @@
 
 #include "base/log.h"
 #include "config/request_queue.h"
-#include "request/message_queue.h"
-#include "request/request_type.h"
-#include "service/message_check.h"
+#include "request/request_record.h"
 #include "service/receiver_rest.h"
 #include "service/signal_handler.h"
 #include "state/service_state.h"
@@ -17,11 +15,9 @@
 #include <unistd.h>
 
 namespace vesk {
-
 int ServerMsgQueueId = -1;
 
 namespace {
-
 // Whoever may write to the queue fills the record. Before anyone reads it, what a short message
 // left of the one before is cleared and the texts end inside their fields.
 void CompleteRecord(RequestRecord *record, size_t received) {
@@ -51,7 +47,7 @@ bool ReceiveMessage(RequestMessage *message, const LogPlace &place) {
         received = msgrcv(ServerMsgQueueId, message, kRequestMessageBytes, kRequestMessageType, 0);
     } while (received < 0 && errno == EINTR && ReceiverIsCalledToRest());
     if (received < 0) {
-        LogWrite(LogClass::Error, place, "Receive messaged failed: %s", strerror(errno));
+        LogErrorAt(place, "Receive messaged failed: %s", strerror(errno));
         return false;
     }
     CompleteRecord(&message->record, static_cast<size_t>(received));
@@ -64,7 +60,7 @@ bool AddPendingSpace(char *mountPath, const LogPlace &place) {
     if (ServiceIsPendingSpace(mountPath)) {
         LogVerboseAt(place, "Space (%s) is already in pending list", mountPath);
     } else if (DoPatiently([&] { return ServiceAddPendingSpaceAtomic(mountPath); }) < 0) {
-        LogWrite(LogClass::Error, place, "Add spend space error");
+        LogErrorAt(place, "Add spend space error");
         return false;
     }
     return true;
@@ -72,10 +68,9 @@ bool AddPendingSpace(char *mountPath, const LogPlace &place) {
 
 bool RemovePendingSpace(char *mountPath, const LogPlace &place) {
     if (!ServiceIsPendingSpace(mountPath)) {
-        LogWrite(LogClass::Notice, place, "Space (%s) is not in pending list. Could be a new space",
-                 mountPath);
+        LogNoticeAt(place, "Space (%s) is not in pending list. Could be a new space", mountPath);
     } else if (DoPatiently([&] { return ServiceRemovePendingSpaceAtomic(mountPath); }) < 0) {
-        LogWrite(LogClass::Error, place, "Remove pending space error");
+        LogErrorAt(place, "Remove pending space error");
         return false;
     }
     return true;
@@ -83,11 +78,11 @@ bool RemovePendingSpace(char *mountPath, const LogPlace &place) {
 
 bool StoreRequest(const char *configPath, const RequestMessage *message, const LogPlace &place) {
     if (CheckNormalMsg(message) < 0) {
-        LogWrite(LogClass::Error, place, "Get wrong message format");
+        LogErrorAt(place, "Get wrong message format");
         return false;
     }
     if (DoPatiently([&] { return ConfigAddRequest(configPath, &message->record); }) < 0) {
-        LogWrite(LogClass::Error, place, "Can't add request to config (%s)", configPath);
+        LogErrorAt(place, "Can't add request to config (%s)", configPath);
         return false;
     }
     LogVerboseAt(place, "Signal a new request is added");
@@ -103,8 +98,20 @@ bool DoMessage(const char *configPath, RequestMessage *message, const LogPlace &
     default: return StoreRequest(configPath, message, place);
     }
 }
-
 } // namespace
+
+int CheckNormalMsg(const RequestMessage *message) {
+    const RequestRecord &record = message->record;
+    if (record.mountPath[0] == '\0') {
+        LogError("Space UUID is not set");
+        return -1;
+    }
+    if (RequestHasFiles(record.type) && record.data[0] == '\0') {
+        LogError("Should provide file paths");
+        return -1;
+    }
+    return 0;
+}
 
 void GetRequests(const char *configPath) {
     {
@@ -124,5 +131,4 @@ void GetRequests(const char *configPath) {
     ServiceThreadEnds();
     pthread_exit(nullptr);
 }
-
 } // namespace vesk

@@ -8,11 +8,15 @@
 // configuration and pending-space operations.
 #pragma once
 
-namespace vesk {
+#include "request/message_queue.h"
 
+namespace vesk {
 extern int ServerMsgQueueId; // -1 until the receiver has opened the queue; used by its thread only
+
+// 0, or -1 after an error message when a request that is to be stored has no mount path, or a pin
+// or unpin request no files.
+int CheckNormalMsg(const RequestMessage *message);
 
 // Does not return: ends the calling thread.
 [[noreturn]] void GetRequests(const char *configPath);
-
 } // namespace vesk

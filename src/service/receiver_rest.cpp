@@ -6,9 +6,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const int kRestTries = 350;
 const useconds_t kTryMicroseconds = 1000;
 
@@ -19,7 +17,6 @@ std::atomic<bool> atRest{true};
 std::atomic<pthread_t> receiver{};
 
 void Interrupt(int /*signalNumber*/) {}
-
 } // namespace
 
 void ReceiverTakesNext() {
@@ -55,5 +52,4 @@ void ReceiverAwaitRest() {
         usleep(kTryMicroseconds);
     }
 }
-
 } // namespace vesk

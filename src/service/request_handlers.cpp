@@ -4,25 +4,16 @@
 #include "bitmap/file_marking.h"
 #include "bitmap/space_bitmap.h"
 #include "driver/unpin_ranges.h"
-#include "request/request_type.h"
 #include "warming/reload_blocks.h"
 #include "warming/warm_files.h"
 
 #include <string>
 
 namespace vesk {
-
 namespace {
-
-bool IsHandledType(int type) {
-    return type == kRequestPinFiles || type == kRequestUnpinFiles ||
-           type == kRequestReloadPinBlocks;
-}
-
 std::string FullPath(const char *mountPath, const FileInfo &file) {
     return std::string(mountPath) + "/" + file.szRelativePath;
 }
-
 } // namespace
 
 WorkResult HandleRequest(const RequestRecord *record) {
@@ -30,7 +21,7 @@ WorkResult HandleRequest(const RequestRecord *record) {
     VolumeBitmap volume;
     std::vector<FileInfo> files;
 
-    if (!IsHandledType(record->type)) {
+    if (!RequestHasFiles(record->type) && record->type != kRequestReloadPinBlocks) {
         LogError("Get unhandle request (%s)", RequestTypeForLog(record->type));
     } else if (VolumeBitmapOpen(record->mountPath, &volume, LogHere()) < 0) {
         // It has said what is missing.
@@ -103,5 +94,4 @@ WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bit
     }
     return WorkResult::Done;
 }
-
 } // namespace vesk

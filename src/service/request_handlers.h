@@ -16,7 +16,6 @@
 #include <vector>
 
 namespace vesk {
-
 // The record's texts are NUL-terminated.
 WorkResult HandleRequest(const RequestRecord *record);
 
@@ -27,5 +26,4 @@ WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitma
 // Clears the files, writes and sends the bitmap, then releases the files' ranges.
 WorkResult HandleUnpinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
                               const char *mountPath, const char *cachePath, const char *bitmapPath);
-
 } // namespace vesk

@@ -3,7 +3,6 @@
 #include "base/log.h"
 #include "config/pinned_files.h"
 #include "config/request_queue.h"
-#include "request/request_type.h"
 #include "request/tool_parameters.h"
 #include "service/next_request.h"
 #include "service/request_handlers.h"
@@ -14,9 +13,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 // Chooses one request and has it carried out. False when the choice has failed.
 bool DoNextRequest(const char *configPath, const LogPlace &place) {
     RequestRecord record{};
@@ -32,20 +29,17 @@ bool DoNextRequest(const char *configPath, const LogPlace &place) {
         }
         const char *typeName = RequestTypeToString(record.type);
         if (result == WorkResult::Interrupted) {
-            LogWrite(LogClass::Notice, place, "Handle request (%s). Get interrupted !",
-                     num.c_str());
-        } else if (record.type == kRequestPinFiles || record.type == kRequestUnpinFiles) {
-            LogWrite(LogClass::Notice, place, "Handle request (type=%s files=%s) OK ", typeName,
-                     record.data);
+            LogNoticeAt(place, "Handle request (%s). Get interrupted !", num.c_str());
+        } else if (RequestHasFiles(record.type)) {
+            LogNoticeAt(place, "Handle request (type=%s files=%s) OK ", typeName, record.data);
         } else {
-            LogWrite(LogClass::Notice, place, "Handle request (type=%s) OK ", typeName);
+            LogNoticeAt(place, "Handle request (type=%s) OK ", typeName);
         }
     }
     // Also what makes a held-back request run: the end of a pending state signals nothing.
     sleep(1);
     return true;
 }
-
 } // namespace
 
 void *DoRequests(void *options) {
@@ -91,5 +85,4 @@ WorkResult HandleRequestAndModifyConfig(const char *configPath, RequestRecord *r
     }
     return result;
 }
-
 } // namespace vesk

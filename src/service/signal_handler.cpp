@@ -12,9 +12,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const int kEndingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
 const suseconds_t kEndGraceMicroseconds = 500000;
 
@@ -75,7 +73,6 @@ bool StartWaiter() {
     pthread_detach(waiter);
     return true;
 }
-
 } // namespace
 
 int SetSignalHandler() {
@@ -110,5 +107,4 @@ void ServiceThreadEnds() {
         EndProcess();
     }
 }
-
 } // namespace vesk

@@ -8,7 +8,6 @@
 #pragma once
 
 namespace vesk {
-
 // Installs the handler and starts the thread that waits for the signals; to be called before any
 // other thread is started, which inherits the blocked signals. 0, or -1 after an error message;
 // then handlers already installed stay.
@@ -22,5 +21,4 @@ int SetSignalHandler();
 // with status 0, as it would without that thread. To be set before they are started.
 void SetServiceThreads(int count);
 void ServiceThreadEnds();
-
 } // namespace vesk

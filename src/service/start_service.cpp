@@ -13,7 +13,6 @@
 #include <pthread.h>
 
 namespace vesk {
-
 int StartService(const ToolParameters *parameters) {
     LogTraceEntry();
     if (SetSignalHandler() < 0) {
@@ -35,5 +34,4 @@ int StartService(const ToolParameters *parameters) {
     }
     GetRequests(parameters->configPath);
 }
-
 } // namespace vesk

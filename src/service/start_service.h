@@ -3,12 +3,10 @@
 #pragma once
 
 namespace vesk {
-
 struct ToolParameters;
 
 // Runs the service. `parameters` must outlive the process's threads. -1 after an error message when
 // it cannot start; otherwise it does not return: the receiver ends the calling thread, a signal the
 // process.
 int StartService(const ToolParameters *parameters);
-
 } // namespace vesk

@@ -9,9 +9,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const char kControlFile[] = "/tmp/veskcachepinfiletool.debug";
 
 // The whole file: a path with a second line behind it must not match. Anything longer than a path
@@ -37,7 +35,6 @@ bool ReadControlFile(std::string *content) {
     content->assign(buffer, length);
     return true;
 }
-
 } // namespace
 
 int FileSimulateGetMappingFailed(const std::string &filePath) {
@@ -53,5 +50,4 @@ int FileSimulateGetMappingFailed(const std::string &filePath) {
              result);
     return result;
 }
-
 } // namespace vesk

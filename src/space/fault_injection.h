@@ -9,9 +9,7 @@
 #include <string>
 
 namespace vesk {
-
 // 1 when the lookup of this file (full path, compared whole) shall fail, else 0. A control file
 // that is not a regular file counts as absent, and opening it never blocks.
 int FileSimulateGetMappingFailed(const std::string &filePath);
-
 } // namespace vesk

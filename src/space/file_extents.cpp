@@ -9,9 +9,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const int kLookupTries = 10;
 const uint32_t kFlagUninitialized = 1;
 
@@ -20,7 +18,6 @@ std::string DirectoryOf(const std::string &filePath) {
     strncpy(path, filePath.c_str(), sizeof(path) - 1);
     return dirname(path);
 }
-
 } // namespace
 
 FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path) {
@@ -89,5 +86,4 @@ int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,
     LogVerbose("Entry number = %zu", table->entries.size());
     return 0;
 }
-
 } // namespace vesk

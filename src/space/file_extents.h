@@ -1,8 +1,6 @@
 // Where a file's data lies on the volume's block device, as the platform's storage-core library
-// tells it.
-//
-// Thread rule: no state. A lookup can take about ten seconds: a file whose data has no place on the
-// device yet is waited for.
+// tells it. Thread rule: no state. A lookup can take about ten seconds: a file whose data has no
+// place on the device yet is waited for.
 #pragma once
 
 #include "vesk/storage_core.h"
@@ -11,7 +9,6 @@
 #include <string>
 
 namespace vesk {
-
 // The device object of the file system that holds `path`, owned by the caller (delete it), or null
 // after an error message.
 FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path);
@@ -22,5 +19,4 @@ FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path);
 // message, and the table is as the last try left it.
 int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,
                             const std::string &filePath, uint32_t inode);
-
 } // namespace vesk

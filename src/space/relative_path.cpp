@@ -8,9 +8,7 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 const char kWhiteSpace[] = " \t\n\v\f\r";
 const size_t kRelativePathMax = 511;
 const size_t kTopDirMax = 1023;
@@ -33,7 +31,6 @@ char *CopyFirstWord(const char *text) {
     }
     return strndup(start, length);
 }
-
 } // namespace
 
 char *FileGetRelativePathByMountPath(const char *mountPath, const char *filePath) {
@@ -69,5 +66,4 @@ int FileGetTopDir(const char *path, char *out, size_t outSize) {
     snprintf(out, outSize, "/%.*s", static_cast<int>(length), path + 1);
     return 0;
 }
-
 } // namespace vesk

@@ -9,7 +9,6 @@
 #include <cstddef>
 
 namespace vesk {
-
 // What stands in `filePath` behind `mountPath` and "/": leading white space is skipped, then the
 // text up to the next white space is taken; so "/volume1/dir a/f" gives "dir". A mount path that
 // ends in
@@ -24,5 +23,4 @@ char *FileGetRelativePath(const char *uuid, const char *filePath);
 // 0, or -1 after an error message when `path` does not begin with "/" and a component of at most
 // 1023 characters, or an argument is null or 0.
 int FileGetTopDir(const char *path, char *out, size_t outSize);
-
 } // namespace vesk

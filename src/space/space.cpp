@@ -4,13 +4,12 @@
 
 #include "vesk/storage_core.h"
 
+#include <cstdio>
 #include <cstring>
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 using SpaceList = std::unique_ptr<VESKSpaceInfo, Deleter<VESKSpaceInfoFree>>;
 
 // Shows the spaces to `visit` until it answers something else than NoSpace, which is the result.
@@ -21,7 +20,7 @@ SpaceCause Walk(const Visit &visit, SpaceList *spaces, SpaceCause *asked, const 
     const int result = VESKSpaceInfoEnum(1, &list);
     spaces->reset(list); // the library may set a list even when it fails
     if (result < 0) {
-        LogWrite(LogClass::Error, place, "Can't enum spaces");
+        LogErrorAt(place, "Can't enum spaces");
     }
     SpaceCause cause = result < 0 ? SpaceCause::CannotEnumerate : SpaceCause::NoSpace;
     for (; list != nullptr && cause == SpaceCause::NoSpace; list = list->next) {
@@ -30,7 +29,6 @@ SpaceCause Walk(const Visit &visit, SpaceList *spaces, SpaceCause *asked, const 
     SpaceTell(asked, cause);
     return cause;
 }
-
 } // namespace
 
 char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause) {
@@ -39,7 +37,7 @@ char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause) {
     const auto visit = [uuid, &place, &referencePath](const VESKSpaceInfo &space) {
         const MallocText spaceUuid(VESKSpaceUUIDGet(&space));
         if (!spaceUuid) {
-            LogWrite(LogClass::Error, place, "Get space uuid failed");
+            LogErrorAt(place, "Get space uuid failed");
         }
         if (!spaceUuid || strcmp(spaceUuid.get(), uuid) != 0) {
             return SpaceCause::NoSpace;
@@ -59,7 +57,7 @@ char *SpaceGetDevicePath(const char *referencePath, SpaceCause *cause) {
     char *devicePath = nullptr;
     const auto visit = [referencePath, &place, &devicePath](const VESKSpaceInfo &space) {
         if (space.referencePath[0] == '\0') {
-            LogWrite(LogClass::Error, place, "Reference path should not be null");
+            LogErrorAt(place, "Reference path should not be null");
             return SpaceCause::NoReferencePath;
         }
         if (strcmp(space.referencePath, referencePath) != 0) {
@@ -92,12 +90,29 @@ char *SpaceGetUUID(const char *referencePath, SpaceCause *cause) {
     return uuid;
 }
 
+char *SpaceGetBitmapPath(const char *uuid) {
+    MallocText referencePath;
+    MallocText bitmapPath;
+    if (SpaceTake(SpaceGetReferencePath(uuid), &referencePath, "Can't get reference path",
+                  LogHere())) {
+        SpaceTake(BitmapGetPathByReferencePath(referencePath.get()), &bitmapPath,
+                  "Can't get bitmap path", LogHere());
+    }
+    return bitmapPath.release();
+}
+
+char *BitmapGetPathByReferencePath(const char *referencePath) {
+    char path[512];
+    const int length =
+        snprintf(path, sizeof(path), "%s/%s", referencePath, "veskcachepinfile.bitmap");
+    return length < 0 ? nullptr : strdup(path);
+}
+
 bool SpaceTake(char *text, MallocText *owner, const char *failure, const LogPlace &place) {
     owner->reset(text);
     if (text == nullptr) {
-        LogWrite(LogClass::Error, place, "%s", failure);
+        LogErrorAt(place, "%s", failure);
     }
     return text != nullptr;
 }
-
 } // namespace vesk

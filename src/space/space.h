@@ -1,4 +1,4 @@
-// Storage spaces (volumes): UUID, reference path and block device path of each.
+// Storage spaces (volumes): UUID, reference path, block device path and bitmap file of each.
 //
 // A reference path is the mount path, the volume's top directory. Every lookup enumerates the
 // spaces afresh; nothing is kept between calls. A returned text is malloc'd for the caller (wrap it
@@ -12,7 +12,6 @@
 #include "base/malloc_text.h"
 
 namespace vesk {
-
 // Why a look-up here or in space/space_cache.h has come to its answer.
 enum class SpaceCause {
     Found, // an answer is null or 0 all the same when memory has run out; of pin support: there is
@@ -33,6 +32,12 @@ char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause = nullptr);
 char *SpaceGetDevicePath(const char *referencePath, SpaceCause *cause = nullptr);
 char *SpaceGetUUID(const char *referencePath, SpaceCause *cause = nullptr);
 
+// The space's bitmap file, veskcachepinfile.bitmap in its top directory.
+char *SpaceGetBitmapPath(const char *uuid);
+
+// The same below this reference path, cut to 511 characters. Null only when memory runs out.
+char *BitmapGetPathByReferencePath(const char *referencePath);
+
 // Tells the cause to a caller that has asked for it.
 inline void SpaceTell(SpaceCause *asked, SpaceCause cause) {
     if (asked != nullptr) {
@@ -43,5 +48,4 @@ inline void SpaceTell(SpaceCause *asked, SpaceCause cause) {
 // Gives the text of a look-up to its owner. Whether there is one: where not, `failure` is logged as
 // an error at the caller's place.
 bool SpaceTake(char *text, MallocText *owner, const char *failure, const LogPlace &place);
-
 } // namespace vesk

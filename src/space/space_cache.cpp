@@ -8,9 +8,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 const int kConfigBySpaceUuid = 2;
 const int kStatBySsdPath = 3;
 
@@ -21,7 +19,6 @@ struct StatDeleter {
     void operator()(VESKFlashCacheStat *stat) const { VESKFlashCacheStatFree(&stat); }
 };
 using CacheStat = std::unique_ptr<VESKFlashCacheStat, StatDeleter>;
-
 } // namespace
 
 VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid, SpaceCause *cause) {
@@ -133,5 +130,4 @@ int SpaceHasCacheAndSupportPinByUUID(const char *uuid, SpaceCause *cause) {
     }
     return canPin ? 1 : 0;
 }
-
 } // namespace vesk

@@ -12,7 +12,6 @@
 struct VESKFlashCacheConfig;
 
 namespace vesk {
-
 // The space's cache configuration (release it with VESKFlashCacheConfigFree), or null.
 VESKFlashCacheConfig *SpaceGetCacheConfig(const char *uuid, SpaceCause *cause = nullptr);
 
@@ -30,5 +29,4 @@ char *SpaceGetCachePathByMountPath(const char *mountPath, SpaceCause *cause = nu
 // created answers 0 without an error message.
 int SpaceHasCacheAndSupportPin(const char *mountPath, SpaceCause *cause = nullptr);
 int SpaceHasCacheAndSupportPinByUUID(const char *uuid, SpaceCause *cause = nullptr);
-
 } // namespace vesk

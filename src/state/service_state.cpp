@@ -10,11 +10,9 @@
 #include <vector>
 
 namespace vesk {
-
 ServiceLockName serviceLock;
 
 namespace {
-
 using PendingSpaces = std::vector<std::string>;
 
 // Never destroyed: a thread may still use the state while the process ends.
@@ -43,7 +41,6 @@ void PublishPending(PendingSpaces spaces) NEEDS_LOCK(serviceLock) {
 PendingSpaces CopyPending() {
     return *std::atomic_load(&State().pending);
 }
-
 } // namespace
 
 // There is one thread only.
@@ -76,16 +73,13 @@ void ServiceSignalRequest() {
 }
 
 int ServiceGetState() {
-    ServiceLock();
-    const int state = State().state;
-    ServiceUnlock();
-    return state;
+    const ServiceLockGuard lock;
+    return State().state;
 }
 
 void ServiceSetState(const int *state) {
-    ServiceLock();
+    const ServiceLockGuard lock;
     State().state = *state;
-    ServiceUnlock();
 }
 
 bool ServiceIsPendingSpace(const char *mountPath) {
@@ -139,5 +133,4 @@ int ServiceRemovePendingSpaceAtomic(char *mountPath) {
     LogVerbose("Remove pending space (%s)", mountPath);
     return 0;
 }
-
 } // namespace vesk

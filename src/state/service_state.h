@@ -14,7 +14,6 @@
 #include "state/thread_annotations.h"
 
 namespace vesk {
-
 // The service lock's name for the annotations below; the lock itself is nobody else's business.
 struct LOCK_KIND("service lock") ServiceLockName {};
 extern ServiceLockName serviceLock;
@@ -62,5 +61,4 @@ public:
     ServiceLockGuard(const ServiceLockGuard &) = delete;
     ServiceLockGuard &operator=(const ServiceLockGuard &) = delete;
 };
-
 } // namespace vesk

@@ -9,7 +9,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t lastSector) {
     const uint64_t bytesToRead = (lastSector + 1) << kSectorByteShift;
     LogVerbose("Read file (%s) to cache. last read sector = %llu bytes to read = %llu", filePath,
@@ -49,5 +48,4 @@ WorkResult FileReadToCache(const char *mountPath, const char *filePath, uint64_t
                LogU64(total));
     return WorkResult::Done;
 }
-
 } // namespace vesk

@@ -8,7 +8,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 WarmBuffer WarmBufferAllocate() {
     return WarmBuffer(static_cast<char *>(aligned_alloc(kWarmBufferAlignment, kWarmBufferBytes)));
 }
@@ -42,5 +41,4 @@ int ReadFdToNullByRange(int fd, const BitRun &range, char *buffer, size_t buffer
     return ReadFdToNull(fd, range.first << kBitmapByteShift, static_cast<uint32_t>(bytes), buffer,
                         bufferSize);
 }
-
 } // namespace vesk

@@ -14,7 +14,6 @@
 #include <memory>
 
 namespace vesk {
-
 const size_t kWarmBufferBytes = 65536;
 const size_t kWarmBufferAlignment = 4096;
 const unsigned kSectorByteShift = 9; // sectors to bytes
@@ -30,5 +29,4 @@ int ReadFdToNull(int fd, uint64_t offset, uint64_t count, char *buffer, size_t b
 
 // The same for blocks of 64 KiB, counted from the start of the device.
 int ReadFdToNullByRange(int fd, const BitRun &range, char *buffer, size_t bufferSize);
-
 } // namespace vesk

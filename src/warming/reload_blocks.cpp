@@ -9,7 +9,6 @@
 #include <fcntl.h>
 
 namespace vesk {
-
 WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevicePath,
                                   const char *mountPath) {
     const WarmBuffer buffer = WarmBufferAllocate();
@@ -47,5 +46,4 @@ WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevi
     }
     return WorkResult::Done;
 }
-
 } // namespace vesk

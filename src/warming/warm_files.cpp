@@ -10,11 +10,8 @@
 #include <fcntl.h>
 
 namespace vesk {
-
 namespace {
-
 const uint32_t kFlagUninitialized = 1;
-
 } // namespace
 
 WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm> &files) {
@@ -77,5 +74,4 @@ WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMap
     }
     return WorkResult::Done;
 }
-
 } // namespace vesk

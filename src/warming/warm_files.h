@@ -1,8 +1,6 @@
 // Warming after a pin request: every written extent of every pinned file is read through the cache
-// device.
-//
-// Thread rule: called on the worker's thread, without the service lock. Gives way before each file
-// and each extent when the volume is pending.
+// device. Thread rule: called on the worker's thread, without the service lock. Gives way before
+// each file and each extent when the volume is pending.
 #pragma once
 
 #include "vesk/storage_core.h"
@@ -13,7 +11,6 @@
 #include <vector>
 
 namespace vesk {
-
 struct FileToWarm {
     std::string path;       // full path, for messages
     FileMappingTable table; // extents on the volume's block device
@@ -25,5 +22,4 @@ WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm>
 // The same for one file's extents, from the open cache device.
 WorkResult ReadMappingRangesToCache(const char *mountPath, int fd, const FileMappingTable &table,
                                     char *buffer, size_t bufferSize);
-
 } // namespace vesk

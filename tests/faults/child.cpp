@@ -17,9 +17,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 using Clock = std::chrono::steady_clock;
 
 // What a thread waits for is told by the arguments of the call that it is in: a record's size,
@@ -85,7 +83,6 @@ int CountDescriptors(pid_t pid) {
     }
     return count;
 }
-
 } // namespace
 
 Child::Child(const Program &program, const std::vector<std::string> &arguments, const Fault &fault)
@@ -206,5 +203,4 @@ std::string Child::Report() const {
 std::string Child::Output() const {
     return WorldRead(kOutputPath);
 }
-
 } // namespace vesk

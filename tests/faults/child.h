@@ -8,7 +8,6 @@
 #include <vector>
 
 namespace vesk {
-
 class Child {
 public:
     // Starts it; messages go to its standard output.
@@ -40,5 +39,4 @@ private:
     bool IsQuiet() const;
     pid_t pid_ = -1;
 };
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <tuple>
 
 namespace vesk {
-
 namespace {
-
 // A file as programs see it, and as the disk is sure to have it.
 struct DiskFile {
     std::string content;
@@ -114,7 +112,6 @@ Files FilesOf(const Names &names, std::string (*content)(const DiskFile &)) {
     }
     return files;
 }
-
 } // namespace
 
 std::vector<CrashPoint> CrashPointsOf(const std::string &record, const Files &start,
@@ -148,5 +145,4 @@ std::vector<CrashPoint> CrashPointsOf(const std::string &record, const Files &st
     } while (Step(words, &disk));
     return points;
 }
-
 } // namespace vesk

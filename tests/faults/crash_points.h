@@ -6,7 +6,6 @@
 #include <vector>
 
 namespace vesk {
-
 using Files = std::map<std::string, std::string>; // path: content
 
 struct CrashPoint {
@@ -24,5 +23,4 @@ struct CrashPoint {
 // are listed once.
 std::vector<CrashPoint> CrashPointsOf(const std::string &record, const Files &start,
                                       const std::string &bitmapPath);
-
 } // namespace vesk

@@ -19,7 +19,6 @@
 using namespace vesk;
 
 namespace {
-
 const char kConfig[] = "/run/faults/config.json";
 const char kBitmapFile[] = "/volume1/veskcachepinfile.bitmap";
 const char kDeviceState[] = "/run/vesk1/cachedev_1.json";
@@ -172,7 +171,6 @@ void RunBeginning(const Program &recorded, const Program &program, bool withDocu
         }
     }
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

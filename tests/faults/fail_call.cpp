@@ -31,7 +31,6 @@ extern "C" void *__libc_calloc(size_t number, size_t size);
 extern "C" void *__libc_memalign(size_t alignment, size_t size);
 
 namespace {
-
 const int kReportFd = 9;
 
 std::atomic<bool> armed{false};
@@ -75,7 +74,6 @@ template <typename Call> ssize_t Transfer(const char *kind, size_t size, Call ca
     }
     return failingErrno == 0 ? call(size > 1 ? size / 2 : size) : -1;
 }
-
 } // namespace
 
 bool vesk::FailsNow(const char *kind) {

@@ -8,13 +8,11 @@
 using namespace vesk;
 
 namespace {
-
 const char kKind[] = "library";
 
 using DevicePathFunction = int (*)(const std::string &, std::string &, bool);
 using CreateFunction = FileSystemDevice *(*)(const std::string &);
 #define TEXT_REFERENCE "RKNSt7__cxx1112basic_stringIcSt11char_traitsIcESaIcEEE"
-
 } // namespace
 
 extern "C" {

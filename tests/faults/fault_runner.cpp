@@ -17,7 +17,6 @@
 using namespace vesk;
 
 namespace {
-
 struct Kind {
     const char *name;
     std::vector<int> errors; // 0: half the length
@@ -43,7 +42,6 @@ const Kind kKinds[] = {
     {"library", {EIO}},
 };
 const long kCallsMax = 100000; // a run that makes more of one kind does not end
-
 } // namespace
 
 int main(int argc, char *argv[]) {

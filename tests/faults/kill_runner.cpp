@@ -22,7 +22,6 @@
 using namespace vesk;
 
 namespace {
-
 using Clock = std::chrono::steady_clock;
 
 const char kConfig[] = "/run/faults/config.json";
@@ -48,7 +47,6 @@ long Milliseconds(Clock::duration duration) {
     return static_cast<long>(
         std::chrono::duration_cast<std::chrono::milliseconds>(duration).count());
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

@@ -23,7 +23,6 @@
 using namespace vesk;
 
 namespace {
-
 using Clock = std::chrono::steady_clock;
 
 const char kConfig[] = "/run/faults/config.json";
@@ -141,7 +140,6 @@ void Look(const Child &service, Figures *figures) {
         figures->descriptors = figures->descriptorsEnd;
     }
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

@@ -7,7 +7,6 @@
 #include <sys/types.h>
 
 namespace vesk {
-
 // The function of that (mangled) name that would have been called without this object.
 template <typename Function> Function RealFunction(const char *name) {
     return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
@@ -21,5 +20,4 @@ inline mode_t ModeOf(int flags, va_list arguments) {
 
 // In the object that lets calls fail: whether this is the call that must; sets errno then.
 bool FailsNow(const char *kind);
-
 } // namespace vesk

@@ -24,7 +24,6 @@
 using namespace vesk;
 
 namespace {
-
 const int kReportFd = 9;
 const unsigned long kSetBitmapRequest = 0xFECF;
 
@@ -65,7 +64,6 @@ void ReportOpen(int fd, bool existed, int flags) {
         Report("truncate " + path + "\n");
     }
 }
-
 } // namespace
 
 extern "C" {

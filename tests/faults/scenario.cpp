@@ -6,9 +6,7 @@
 #include <signal.h>
 
 namespace vesk {
-
 namespace {
-
 const char kConfig[] = "/run/faults/config.json";
 
 const Scenario kScenarios[] = {
@@ -79,7 +77,6 @@ std::string LossComplaint(const Outcome &outcome) {
     }
     return accounted < given ? "a request is lost" : "";
 }
-
 } // namespace
 
 const Scenario *ScenarioFind(const std::string &name) {
@@ -143,5 +140,4 @@ std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const O
     }
     return "";
 }
-
 } // namespace vesk

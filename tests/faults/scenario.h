@@ -6,7 +6,6 @@
 #include <vector>
 
 namespace vesk {
-
 struct Program {
     std::string tool;
     std::string preload; // the shared object that lets calls fail
@@ -48,5 +47,4 @@ Outcome ScenarioRun(const Program &program, const Scenario &scenario, const Faul
 
 // What the outcome has wrong, beside the run without a fault; empty: nothing.
 std::string ScenarioJudge(const Scenario &scenario, const Outcome &good, const Outcome &outcome);
-
 } // namespace vesk

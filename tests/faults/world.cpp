@@ -13,9 +13,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const char kKeyFile[] = "/run/veskcachepinfile-msg-server.key";
 const char kBitmapFile[] = "/volume1/veskcachepinfile.bitmap";
 const size_t kBitmapBytes = 128; // of the 64 MiB volume
@@ -72,7 +70,6 @@ long NextNumberIn(const std::string &text) {
     const size_t at = text.find(key);
     return at == std::string::npos ? 0 : strtol(text.c_str() + at + key.size(), nullptr, 10);
 }
-
 } // namespace
 
 std::string WorldDocument() {
@@ -190,5 +187,4 @@ bool WorldLeftovers(const std::string &path) {
     }
     return false;
 }
-
 } // namespace vesk

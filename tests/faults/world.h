@@ -6,7 +6,6 @@
 #include <vector>
 
 namespace vesk {
-
 // The known beginning: the document and the bitmap below, no queue; with messages a queue that
 // holds them: 'a' pins file a, 'c' file c, 'u' unpins file b, 'r' reloads, 'g' reloads a volume
 // that is not there.
@@ -42,5 +41,4 @@ void WorldWrite(const std::string &path, const std::string &content);
 
 // Whether anything but the file is in its folder, beside the runs' own output.
 bool WorldLeftovers(const std::string &path);
-
 } // namespace vesk

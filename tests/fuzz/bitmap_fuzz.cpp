@@ -13,9 +13,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 const uint64_t kBitmapBytesMax = 9000; // three chunks of a file
 
 struct Range {
@@ -46,7 +44,6 @@ std::vector<char> BitsOf(const PinBitmap *bitmap) {
     }
     return bits;
 }
-
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
@@ -89,5 +86,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     BitmapFree(bitmap);
     return 0;
 }
-
 } // namespace vesk

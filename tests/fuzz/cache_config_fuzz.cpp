@@ -4,7 +4,6 @@
 #include "flash_cache/cache_config.h"
 
 namespace vesk {
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     static const std::string path = FuzzPath("veskflashcache.json");
     FuzzWrite(path, std::string(reinterpret_cast<const char *>(data), size));
@@ -19,5 +18,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
-
 } // namespace vesk

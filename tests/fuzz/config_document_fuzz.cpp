@@ -9,7 +9,7 @@
 #include "config/config_document.h"
 #include "config/pinned_files.h"
 #include "config/request_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "service/next_request.h"
 #include "state/service_state.h"
 #include "tests/support/fake_appliance.h"
@@ -18,9 +18,7 @@
 #include <json/value.h>
 
 namespace vesk {
-
 namespace {
-
 const char kVolume[] = "/volume1";
 
 bool Prepare() {
@@ -73,7 +71,6 @@ void Select(const std::string &path, RequestRecord *record, std::string *number)
         *record = taken;
     }
 }
-
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
@@ -113,5 +110,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
-
 } // namespace vesk

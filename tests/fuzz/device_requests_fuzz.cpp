@@ -14,9 +14,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const uint64_t kBlocks = 10;
 const uint64_t kDeviceBytes = kBlocks * kBlockBytes;
 const uint32_t kSlots = 3;
@@ -94,7 +92,6 @@ void Step(Fixture &fixture, FuzzInput &input) {
     FuzzExpect(snapshot.cachedBlocks <= kSlots && snapshot.pinnedBlocks <= snapshot.cachedBlocks,
                "no more is pinned than cached, nor cached than there is room");
 }
-
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
@@ -108,5 +105,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
-
 } // namespace vesk

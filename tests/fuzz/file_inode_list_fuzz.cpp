@@ -9,7 +9,6 @@
 #include <vector>
 
 namespace vesk {
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     LogToSyslog = 0;
     LogLevel = 0;
@@ -41,5 +40,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -8,9 +8,7 @@
 #include <iterator>
 
 namespace vesk {
-
 namespace {
-
 struct Folder {
     std::string path = "/dev/shm/vesk-fuzz.XXXXXX";
     Folder() {
@@ -26,7 +24,6 @@ struct Folder {
     Folder(const Folder &) = delete;
     Folder &operator=(const Folder &) = delete;
 };
-
 } // namespace
 
 uint64_t FuzzInput::Number(size_t bytes) {
@@ -64,5 +61,4 @@ void FuzzExpect(bool holds, const char *what) {
         abort();
     }
 }
-
 } // namespace vesk

@@ -7,7 +7,6 @@
 #include <string>
 
 namespace vesk {
-
 // Every target defines this; always 0.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size);
 
@@ -34,5 +33,4 @@ std::string FuzzRead(const std::string &path);
 
 // Ends the process with a message unless `holds`.
 void FuzzExpect(bool holds, const char *what);
-
 } // namespace vesk

@@ -8,7 +8,6 @@
 #include <stdexcept>
 
 namespace vesk {
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     LogToSyslog = 0;
     LogLevel = 0;
@@ -24,5 +23,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     }
     return 0;
 }
-
 } // namespace vesk

@@ -13,9 +13,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 bool EndsTheProcess(const std::string &word) {
     if (word.rfind("--h", 0) == 0) {
         return true;
@@ -23,7 +21,6 @@ bool EndsTheProcess(const std::string &word) {
     return word.size() > 1 && word[0] == '-' && word[1] != '-' &&
            word.find_first_of("deh") != std::string::npos;
 }
-
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
@@ -59,5 +56,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     FuzzExpect(ToolCommandToString(parameters.command) != nullptr, "every command has a name");
     return 0;
 }
-
 } // namespace vesk

@@ -19,9 +19,7 @@
 #include <pthread.h>
 
 namespace vesk {
-
 namespace {
-
 bool Prepare() {
     EnterPrivateWorld();
     if (!PrivateWorldMissing().empty()) {
@@ -41,7 +39,6 @@ void *Receive(void *path) {
 std::string End() {
     return RecordBytes(6, "");
 }
-
 } // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
@@ -70,5 +67,4 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
                "the document can be used");
     return 0;
 }
-
 } // namespace vesk

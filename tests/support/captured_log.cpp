@@ -10,7 +10,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 std::string FirstOf(const std::vector<std::string> &texts) {
     return texts.empty() ? "(none)" : texts.front();
 }
@@ -78,5 +77,4 @@ int CapturedLog::Count(const std::string &message) {
     const std::vector<std::string> messages = Messages();
     return static_cast<int>(std::count(messages.begin(), messages.end(), message));
 }
-
 } // namespace vesk

@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 // The first and the last of some texts; "(none)" of none.
 std::string FirstOf(const std::vector<std::string> &texts);
 std::string LastOf(const std::vector<std::string> &texts);
@@ -38,5 +37,4 @@ private:
     ScopedFd savedStdout_;
     ScopedFd file_;
 };
-
 } // namespace vesk

@@ -14,12 +14,9 @@
 #include <thread>
 
 namespace vesk {
-
 namespace {
-
 // A private /tmp in memory, where making a file durable costs nothing.
 const bool kPrivateMounts = UsePrivateMounts();
-
 } // namespace
 
 const char kExampleDocument[] = R"({
@@ -103,5 +100,4 @@ std::string ConfigTest::CreateFile(const std::string &relativePath) const {
     EXPECT_EQ(stat(path.c_str(), &status), 0);
     return std::to_string(static_cast<uint32_t>(status.st_ino));
 }
-
 } // namespace vesk

@@ -11,14 +11,12 @@
 #include "tests/support/temp_dir.h"
 
 #include "request/request_record.h"
-#include "request/request_type.h"
 
 #include <gtest/gtest.h>
 #include <json/value.h>
 #include <string>
 
 namespace vesk {
-
 // The document that a text holds; a text that holds none fails the test.
 Json::Value ParseDocument(const std::string &text);
 
@@ -50,5 +48,4 @@ protected:
 
 // Two pins on /volume1 (0 is done, 1 is queued) and a reload request.
 extern const char kExampleDocument[];
-
 } // namespace vesk

@@ -8,7 +8,6 @@
 #include <cstring>
 
 namespace vesk {
-
 std::vector<FakeSpace> FakeAppliance::spaces;
 std::vector<FakeCache> FakeAppliance::caches;
 int FakeAppliance::enumResult = 0;
@@ -59,7 +58,6 @@ FileMappingEntry FakeExtent(uint64_t fileStart, uint64_t count, uint64_t deviceS
 }
 
 namespace {
-
 const FakeCache *FindBySsd(const char *ssdPath) {
     const auto &caches = FakeAppliance::caches;
     const auto found =
@@ -80,9 +78,7 @@ public:
                                        : -1;
     }
 };
-
 } // namespace
-
 } // namespace vesk
 
 using namespace vesk;

@@ -11,7 +11,6 @@
 #include <vector>
 
 namespace vesk {
-
 struct FakeSpace {
     std::string devicePath;
     std::string referencePath; // empty: missing
@@ -61,5 +60,4 @@ void FakeApplianceOneVolume(const std::string &cachePath,
 // An extent; sectors.
 FileMappingEntry FakeExtent(uint64_t fileStart, uint64_t count, uint64_t deviceStart,
                             uint32_t flag = 0);
-
 } // namespace vesk

@@ -17,9 +17,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 std::string Number(uint64_t value) {
     return std::to_string(value);
 }
@@ -74,7 +72,6 @@ const std::string &DirectReadsFolder() {
     static const std::string folder = FindDirectReadsFolder();
     return folder;
 }
-
 } // namespace
 
 std::string Hex(const std::string &bytes) {
@@ -160,5 +157,4 @@ void FakeCacheDevice::NoteRead(int fd, long long offset, size_t bytes) {
         onRead();
     }
 }
-
 } // namespace vesk

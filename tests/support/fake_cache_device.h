@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 // Bytes as two hexadecimal digits each.
 std::string Hex(const std::string &bytes);
 
@@ -46,5 +45,4 @@ private:
     std::string path_;
     uint64_t bytes_;
 };
-
 } // namespace vesk

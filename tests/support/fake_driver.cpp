@@ -23,9 +23,7 @@
 #include <utility>
 
 namespace vesk {
-
 namespace {
-
 constexpr unsigned kQueryAllUnpinned = 0x8004FED2;
 constexpr char kFile[] = "/cachedev";
 
@@ -74,7 +72,6 @@ int FakeIoctl(const char *, unsigned request, void *, fuse_file_info *, unsigned
     ready = ScopedFd();
     _exit(fuse_loop(server) == 0 ? 0 : 1);
 }
-
 } // namespace
 
 FakeDriver::FakeDriver(const std::string &name, bool hasPinInterface)
@@ -115,5 +112,4 @@ FakeDriver::~FakeDriver() {
     int status = 0;
     EXPECT_EQ(waitpid(server_, &status, 0), server_);
 }
-
 } // namespace vesk

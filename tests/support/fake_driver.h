@@ -8,7 +8,6 @@
 #include <string>
 
 namespace vesk {
-
 class FakeDriver {
 public:
     // Serves the file in a FUSE filesystem at /mnt/<name>. It knows the query-all-unpinned request
@@ -25,5 +24,4 @@ private:
     std::string mountPath_;
     pid_t server_ = -1; // process; negative: none
 };
-
 } // namespace vesk

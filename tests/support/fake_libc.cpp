@@ -15,7 +15,6 @@
 #include <sys/types.h>
 
 namespace vesk {
-
 int FakeLibc::sleeps = 0;
 int FakeLibc::alarmFactor = 1;
 int FakeLibc::pauseFactor = 1;
@@ -27,7 +26,6 @@ std::function<void(struct stat *)> FakeLibc::onStat;
 std::function<void(int, long long, size_t)> FakeLibc::onRead;
 
 namespace {
-
 struct Order {
     int calls = 0;
     int failAt = 0; // 0: never
@@ -83,7 +81,6 @@ void SetOrder(const std::string &function, int error, int nth, bool onwards) {
 template <typename Function> Function Real(const char *name) {
     return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
 }
-
 } // namespace
 
 void FakeLibc::Reset() {
@@ -140,7 +137,6 @@ int FakeLibc::Calls(const std::string &function) {
 
 using SignalAction = void (*)(int);
 struct msqid_ds;
-
 } // namespace vesk
 
 using namespace vesk;

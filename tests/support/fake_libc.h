@@ -12,7 +12,6 @@
 struct stat;
 
 namespace vesk {
-
 struct FakeLibc {
     static void Reset();
 
@@ -52,5 +51,4 @@ struct FakeLibc {
     // none), bytes asked for.
     static std::function<void(int, long long, size_t)> onRead;
 };
-
 } // namespace vesk

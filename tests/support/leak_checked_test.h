@@ -14,7 +14,6 @@
 #include <iterator>
 
 namespace vesk {
-
 inline long CountOpenDescriptors() {
     using Folder = std::filesystem::directory_iterator;
     return static_cast<long>(std::distance(Folder("/proc/self/fd"), Folder()));
@@ -41,5 +40,4 @@ protected:
 private:
     long descriptors_ = 0;
 };
-
 } // namespace vesk

@@ -9,7 +9,6 @@
 #include <vector>
 
 namespace vesk {
-
 // In order, as CapturedLog::Messages() gives them.
 inline std::vector<std::string> MessagesOf(CapturedLog &log, const std::string &function) {
     const std::string prefix = function + "() [N]";
@@ -21,5 +20,4 @@ inline std::vector<std::string> MessagesOf(CapturedLog &log, const std::string &
 }
 
 using Messages = std::vector<std::string>;
-
 } // namespace vesk

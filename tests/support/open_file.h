@@ -6,7 +6,6 @@
 #include <string>
 
 namespace vesk {
-
 // The status flags (fcntl F_GETFL) of a descriptor of this process on `path`, or -1 where it holds
 // none.
 inline int OpenFileFlags(const std::string &path) {
@@ -18,5 +17,4 @@ inline int OpenFileFlags(const std::string &path) {
     }
     return -1;
 }
-
 } // namespace vesk

@@ -5,7 +5,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 class OrdinaryUser {
 public:
     OrdinaryUser() {
@@ -21,5 +20,4 @@ public:
     OrdinaryUser(const OrdinaryUser &) = delete;
     OrdinaryUser &operator=(const OrdinaryUser &) = delete;
 };
-
 } // namespace vesk

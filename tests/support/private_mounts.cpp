@@ -11,9 +11,7 @@
 #include <utility>
 
 namespace vesk {
-
 namespace {
-
 std::string missing = "the private view of the mounts is not set up";
 
 std::string EnterPrivateMounts() {
@@ -42,7 +40,6 @@ public:
         }
     }
 };
-
 } // namespace
 
 bool UsePrivateMounts() {
@@ -75,5 +72,4 @@ ScopedMount::~ScopedMount() {
         umount2(target_.c_str(), MNT_DETACH);
     }
 }
-
 } // namespace vesk

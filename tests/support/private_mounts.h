@@ -9,7 +9,6 @@
 #include <string>
 
 namespace vesk {
-
 // Sets the private view up before the program's first test. Always true.
 bool UsePrivateMounts();
 
@@ -44,5 +43,4 @@ private:
     std::string target_;
     bool mounted_;
 };
-
 } // namespace vesk

@@ -13,9 +13,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 std::string missing = "the private world is not set up";
 
 std::string Because(const char *what) {
@@ -71,7 +69,6 @@ std::vector<int> QueueIds() {
     }
     return ids;
 }
-
 } // namespace
 
 void EnterPrivateWorld() {
@@ -132,5 +129,4 @@ std::string RecordBytes(int type, const std::string &mountPath, const std::strin
     bytes.resize(4 + 512 + 1024, '\0');
     return bytes;
 }
-
 } // namespace vesk

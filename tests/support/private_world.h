@@ -5,14 +5,13 @@
 // begins with SKIP_WITHOUT_PRIVATE_WORLD().
 #pragma once
 
-#include "request/message.h"
+#include "request/message_queue.h"
 
 #include <gtest/gtest.h>
 #include <string>
 #include <vector>
 
 namespace vesk {
-
 // Sets it up before the program's first test. Always true.
 bool UsePrivateWorld();
 
@@ -49,5 +48,4 @@ bool PutMessage(int queueId, long type, const std::string &text);
 
 // The text of a message: a request record byte for byte.
 std::string RecordBytes(int type, const std::string &mountPath, const std::string &data = "");
-
 } // namespace vesk

@@ -9,7 +9,6 @@
 #include "tests/support/temp_dir.h"
 
 namespace vesk {
-
 class QueueTest : public LeakCheckedTest {
 protected:
     void SetUp() override {
@@ -25,5 +24,4 @@ protected:
     const TempDir folder_;
     const std::string keyFile_ = folder_.Path("key");
 };
-
 } // namespace vesk

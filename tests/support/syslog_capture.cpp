@@ -6,21 +6,18 @@
 #include <cstdio>
 
 namespace vesk {
-
 std::vector<SyslogRecord> &SyslogRecords() {
     static std::vector<SyslogRecord> records;
     return records;
 }
 
 namespace {
-
 void Record(int priority, const char *format, va_list arguments) {
     char text[4096];
     vsnprintf(text, sizeof(text), format, arguments);
     SyslogRecords().push_back({priority, text});
     errno = ENOTCONN; // as the real one may leave it
 }
-
 } // namespace
 
 extern "C" {
@@ -42,5 +39,4 @@ void __syslog_chk(int priority, int /*flag*/, const char *format, ...) {
     va_end(arguments);
 }
 }
-
 } // namespace vesk

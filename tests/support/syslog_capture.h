@@ -6,7 +6,6 @@
 #include <vector>
 
 namespace vesk {
-
 struct SyslogRecord {
     int priority;
     std::string text; // formatted
@@ -14,5 +13,4 @@ struct SyslogRecord {
 
 // Everything since the last clear(), oldest first.
 std::vector<SyslogRecord> &SyslogRecords();
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <sstream>
 
 namespace vesk {
-
 TempDir::TempDir() : TempDir(std::filesystem::temp_directory_path().string()) {}
 
 TempDir::TempDir(const std::string &parent) : path_(parent + "/vesk-test-XXXXXX") {
@@ -34,5 +33,4 @@ std::string ReadWhole(const std::string &path) {
     content << std::ifstream(path, std::ios::binary).rdbuf();
     return content.str();
 }
-
 } // namespace vesk

@@ -4,7 +4,6 @@
 #include <string>
 
 namespace vesk {
-
 class TempDir {
 public:
     TempDir(); // below the machine's folder for such
@@ -25,5 +24,4 @@ private:
 // Whole files, binary. ReadWhole of a missing file gives the empty text.
 void WriteWhole(const std::string &path, const std::string &content);
 std::string ReadWhole(const std::string &path);
-
 } // namespace vesk

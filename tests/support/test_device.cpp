@@ -11,7 +11,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
     : backingPath(folder.Path("backing.img")), ssdPath(folder.Path("ssd.img")) {
     WriteWhole(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
@@ -98,5 +97,4 @@ bool TestHasCallerMemory() {
     const Caller self = {getpid(), sizeof(void *) == 4};
     return CallerRead(self, reinterpret_cast<uintptr_t>(&there), &here, 1) == 0 && here == there;
 }
-
 } // namespace vesk

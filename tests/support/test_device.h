@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 // An opened and started device. The backing image is filled with bytes that depend on their place.
 struct TestDevice {
     const TempDir folder;
@@ -47,5 +46,4 @@ std::vector<uint64_t> TestPinned(CacheDevice &device);
 
 // Whether this kernel lets a process read another one's memory; an emulated one may not.
 bool TestHasCallerMemory();
-
 } // namespace vesk

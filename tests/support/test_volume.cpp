@@ -26,9 +26,7 @@
 #include <sstream>
 
 namespace vesk {
-
 namespace {
-
 constexpr int kNoSuchCommand = 127;
 
 std::string WorldMake() {
@@ -88,7 +86,6 @@ pid_t CommandStart(std::vector<std::string> command, int output) {
     posix_spawn_file_actions_destroy(&actions);
     return error == 0 ? child : -error;
 }
-
 } // namespace
 
 std::string PrivateWorldEnter() {
@@ -234,5 +231,4 @@ std::vector<char> TestPattern(uint64_t offset, uint64_t length) {
 }
 
 TestFolder::TestFolder() : TempDir(PrivateWorldEnter().empty() ? kWorldPath : testing::TempDir()) {}
-
 } // namespace vesk

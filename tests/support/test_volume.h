@@ -17,7 +17,6 @@
 #include <vector>
 
 namespace vesk {
-
 // Where private filesystems are mounted.
 constexpr char kWorldPath[] = "/mnt";
 
@@ -96,5 +95,4 @@ class TestFolder : public TempDir {
 public:
     TestFolder();
 };
-
 } // namespace vesk

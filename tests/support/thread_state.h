@@ -7,7 +7,6 @@
 #include <sys/types.h>
 
 namespace vesk {
-
 // Whether this thread of this process waits for something: false while it runs, while it only waits
 // for a processor, and where there is none.
 inline bool ThreadSleeps(pid_t process, pid_t thread) {
@@ -16,5 +15,4 @@ inline bool ThreadSleeps(pid_t process, pid_t thread) {
     const std::string status((std::istreambuf_iterator<char>(file)), {});
     return status.rfind(") S") != std::string::npos;
 }
-
 } // namespace vesk

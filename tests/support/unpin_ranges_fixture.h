@@ -12,7 +12,6 @@
 #include <vector>
 
 namespace vesk {
-
 inline const char kDevice[] =
     "/dev/null"; // can be opened; what it is asked is answered by the test
 
@@ -56,5 +55,4 @@ protected:
     std::vector<std::string> sent;
     int refused = 0; // the number of the request that the driver refuses; 0: none
 };
-
 } // namespace vesk

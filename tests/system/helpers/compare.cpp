@@ -9,13 +9,11 @@
 #include <vector>
 
 namespace {
-
 bool Read(std::ifstream &file, long long start, std::vector<char> &bytes) {
     file.clear();
     file.seekg(start);
     return static_cast<bool>(file.read(bytes.data(), static_cast<std::streamsize>(bytes.size())));
 }
-
 } // namespace
 
 int main(int argc, char *argv[]) {

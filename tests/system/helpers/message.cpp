@@ -19,7 +19,6 @@
 #include <vector>
 
 namespace {
-
 constexpr size_t kTextBytes = 8192; // the largest message that Linux allows by default
 
 struct Message {
@@ -79,7 +78,6 @@ int PrintRecord(const char *type, const std::string &mountPath, const std::strin
     data.copy(&record[4 + 512], 1024);
     return fwrite(record.data(), 1, record.size(), stdout) == record.size() ? 0 : 1;
 }
-
 } // namespace
 
 int main(int argc, char **argv) {

@@ -14,7 +14,6 @@
 #include <unistd.h>
 
 namespace {
-
 volatile sig_atomic_t ending = 0;
 
 void End(int /*signalNumber*/) {
@@ -48,7 +47,6 @@ std::string LineOf(const char *bytes, size_t count) {
     }
     return line + "\n";
 }
-
 } // namespace
 
 int main(int argc, char **argv) {

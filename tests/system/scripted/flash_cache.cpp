@@ -8,7 +8,6 @@
 #include <new>
 
 namespace {
-
 template <typename Record> Record *Allocate() {
     auto *record = static_cast<Record *>(calloc(1, sizeof(Record)));
     if (record == nullptr) {
@@ -24,7 +23,6 @@ std::string Words(std::initializer_list<int32_t> words) {
     }
     return text;
 }
-
 } // namespace
 
 extern "C" int VESKFlashCacheConfigTmpGet(const VESKFlashCacheConfigQuery *query,

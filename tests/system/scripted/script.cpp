@@ -11,12 +11,10 @@
 using namespace vesk;
 
 namespace {
-
 std::string ScriptPath() {
     const char *path = getenv("VESK_SCRIPT");
     return path == nullptr ? "/nonexistent" : path;
 }
-
 } // namespace
 
 std::vector<ScriptLine> ScriptLines(const std::string &name) {

@@ -12,7 +12,6 @@
 using namespace vesk;
 
 namespace {
-
 std::atomic<unsigned> lookups{0}; // calls of GetMappingByInode so far, in this process
 
 void FreeList(VESKSpaceInfo *list) {
@@ -64,7 +63,6 @@ public:
         return ScriptNumber(answer, 0, -1);
     }
 };
-
 } // namespace
 
 extern "C" int VESKSpaceInfoEnum(int scope, VESKSpaceInfo **list) {

@@ -7,16 +7,13 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 int released = 0;
 
 void Release(int *object) {
     ++released;
     *object = 0;
 }
-
 } // namespace
 
 TEST(DeleterTest, GivesBackOnce) {
@@ -34,5 +31,4 @@ TEST(DeleterTest, CostsNoMemory) {
     const MallocText text(strdup("freed; the address sanitizer tells otherwise"));
     EXPECT_NE(text, nullptr);
 }
-
 } // namespace vesk

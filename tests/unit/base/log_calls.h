@@ -7,7 +7,6 @@
 #include <string>
 
 namespace vesk {
-
 inline std::string Line(int line) {
     return std::to_string(line);
 }
@@ -28,5 +27,4 @@ inline int ReportDebug() {
     LogDebug("Next read start = %d bytes=%d", 0, 1);
     return __LINE__ - 1;
 }
-
 } // namespace vesk

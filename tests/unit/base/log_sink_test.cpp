@@ -10,9 +10,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 std::vector<std::string> taken; // "class function line text"
 
 void Take(LogClass logClass, const LogPlace &place, const char *text) {
@@ -32,7 +30,6 @@ protected:
 
     using Taken = std::vector<std::string>;
 };
-
 } // namespace
 
 TEST_F(LogSinkTest, GetsClassPlaceAndTextWithoutTheMarkerAndNothingIsWritten) {
@@ -90,5 +87,4 @@ TEST_F(LogSinkTest, NullGoesBackToStandardOutput) {
     EXPECT_EQ(taken, Taken{});
     EXPECT_EQ(log.Text(), "tool: Invalid input 7\n");
 }
-
 } // namespace vesk

@@ -9,9 +9,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 class LogToSystemLog : public ::testing::Test {
 protected:
     void SetUp() override {
@@ -30,7 +28,6 @@ protected:
         return text;
     }
 };
-
 } // namespace
 
 TEST_F(LogToSystemLog, NothingGoesToStandardOutput) {
@@ -115,5 +112,4 @@ TEST_F(LogToSystemLog, LineFeedAtTheEndIsKept) {
     LogError("Can't open bitmap file (%s) \n", "f");
     EXPECT_EQ(Taken(), "veskcachepinfiletool.cpp:" + line + " Can't open bitmap file (f) \n");
 }
-
 } // namespace vesk

@@ -8,16 +8,13 @@
 #include <string>
 
 namespace vesk {
-
 namespace {
-
 // Taken before any test runs.
 const int kInitialLogToSyslog = LogToSyslog;
 const int kInitialLogLevel = LogLevel;
 const char *const kInitialProgramName = ProgramName;
 
 class LogToStdout : public ::testing::Test {};
-
 } // namespace
 
 TEST(LogSettings, BeginWithTheSystemLogAtLevel1AndNoProgramName) {
@@ -175,5 +172,4 @@ TEST(GetTimeString, RepeatsTheWholeSubSecondPartInMicroseconds) {
 TEST(GetTimeString, OverwritesOneBuffer) {
     EXPECT_EQ(GetTimeString(), GetTimeString());
 }
-
 } // namespace vesk

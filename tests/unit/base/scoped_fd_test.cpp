@@ -7,7 +7,6 @@
 #include <utility>
 
 namespace vesk {
-
 using ScopedFdTest = LeakCheckedTest;
 
 TEST_F(ScopedFdTest, ClosesItsDescriptorWithItsScope) {
@@ -48,5 +47,4 @@ TEST_F(ScopedFdTest, ClosesWhatItHeldWhenItIsGivenAnother) {
     EXPECT_FALSE(file.IsOpen());
     EXPECT_EQ(fcntl(number, F_GETFD), -1);
 }
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <string>
 
 namespace vesk {
-
 namespace {
-
 using Bytes = std::vector<unsigned char>;
 
 const size_t kStretchBytes = 4096; // what one step looks at, at the most
@@ -91,7 +89,6 @@ void ExpectStepsFit(const Bytes &bytes) {
     EXPECT_FALSE(BitScanStep(scan, run)) << "behind the end";
     EXPECT_EQ(run.count, 0U) << "behind the end";
 }
-
 } // namespace
 
 TEST(BitRunsTest, LeastSignificantBitComesFirst) {
@@ -156,5 +153,4 @@ TEST(BitRunsTest, AStepTakesWholeStretchesOfBytes) {
     EXPECT_EQ(steps, 8);
     EXPECT_EQ(run.count, bytes.size() * 8);
 }
-
 } // namespace vesk

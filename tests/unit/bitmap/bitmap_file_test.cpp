@@ -11,9 +11,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateMounts = UsePrivateMounts();
 
 using Messages = std::vector<std::string>;
@@ -52,7 +50,6 @@ protected:
 
 using BitmapInitByFileTest = BitmapFileTest;
 using BitmapWriteToFileTest = BitmapFileTest;
-
 } // namespace
 
 TEST_F(BitmapInitByFileTest, ReadsFilesOfEverySizeAroundAChunk) {
@@ -259,5 +256,4 @@ TEST_F(BitmapWriteToFileTest, FileThatCannotBeOpenedIsAnError) {
         (Messages{"BitmapWriteToFile() [N]: Bytes to write = 1",
                   "BitmapWriteToFile() [N] : ***** Can't open bitmap file (/no/such/file) ", ""}));
 }
-
 } // namespace vesk

@@ -6,9 +6,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 using Messages = std::vector<std::string>;
 
 const std::string kFile = "/volume1/photo/a.jpg";
@@ -48,7 +46,6 @@ protected:
 
 using BitmapAddFileTest = FileMarkingTest;
 using UnsetBitmapTest = FileMarkingTest;
-
 } // namespace
 
 TEST_F(BitmapAddFileTest, MarksEveryExtentTheUninitialisedOnesToo) {
@@ -195,5 +192,4 @@ TEST_F(UnsetBitmapTest, FailureHasTheErrorMarker) {
     EXPECT_EQ(LastOf(log.Messages()), "UnsetBitmapAndAppendUnpinInfos() [N] : ***** Get mapping "
                                       "table of file (/volume1/photo/a.jpg) failed");
 }
-
 } // namespace vesk

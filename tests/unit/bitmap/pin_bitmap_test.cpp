@@ -8,9 +8,7 @@
 #include <random>
 
 namespace vesk {
-
 namespace {
-
 using Bytes = std::vector<unsigned char>;
 using Messages = std::vector<std::string>;
 
@@ -60,7 +58,6 @@ PinBitmap *NewBitmap(unsigned char *data, uint32_t size) {
     *bitmap = {data, size};
     return bitmap;
 }
-
 } // namespace
 
 TEST_F(PinBitmapTest, BlockIsTheFirst128SectorsInTheLowestBit) {
@@ -201,5 +198,4 @@ TEST_F(PinBitmapTest, FreeOfNullBytesIsAnErrorAndReleasesTheRecord) {
     BitmapFree(NewBitmap(nullptr, 16));
     EXPECT_EQ(log.Messages(), Messages{"BitmapFree() [N] : ***** Warning: data is NULL for free"});
 }
-
 } // namespace vesk

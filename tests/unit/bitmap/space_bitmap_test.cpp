@@ -12,9 +12,7 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 namespace {
-
 using Messages = std::vector<std::string>;
 
 int callocsLeft = -1; // negative: memory never runs out
@@ -63,7 +61,6 @@ protected:
     PinBitmap *bitmap = nullptr;
     bool sizeChanged = true;
 };
-
 } // namespace
 
 // Takes the place of the C library's. Of malloc and memset the compiler would make a call of
@@ -322,5 +319,4 @@ TEST_F(SpaceBitmapTest, BitmapIsWrittenUnlessThereIsNoPathAndSent) {
     EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Write bitmap failed");
     EXPECT_EQ(sent, 3);
 }
-
 } // namespace vesk

@@ -8,9 +8,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 // Runs `daemon` in the background of a process of its own; the exit status of that process.
 int StatusOf(const std::function<void(Background &)> &daemon) {
     const pid_t child = fork();
@@ -26,7 +24,6 @@ int StatusOf(const std::function<void(Background &)> &daemon) {
     EXPECT_EQ(waitpid(child, &status, 0), child);
     return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
-
 } // namespace
 
 TEST(BackgroundTest, TheCommandEndsWellOnceTheDaemonIsReady) {
@@ -63,5 +60,4 @@ TEST(BackgroundTest, WithoutAParentNothingHappens) {
     BackgroundReady(background);
     EXPECT_FALSE(background.ready.IsOpen());
 }
-
 } // namespace vesk

@@ -3,9 +3,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 uint32_t Load(BlockCache &cache, uint64_t block) {
     const uint32_t slot = BlockCacheTake(cache);
     if (slot != kNoSlot) {
@@ -35,7 +33,6 @@ struct BlockCacheTest : testing::Test {
     BlockCacheTest() { BlockCacheInit(cache, 3); }
     bool Has(uint64_t block) const { return BlockCacheFind(cache, block) != kNoSlot; }
 };
-
 } // namespace
 
 TEST_F(BlockCacheTest, FillsFreeSlotsInOrder) {
@@ -175,5 +172,4 @@ TEST_F(BlockCacheTest, PinnedRunsAreMergedAndAscending) {
     EXPECT_EQ(runs[2].first, 8U);
     EXPECT_EQ(runs[2].count, 2U);
 }
-
 } // namespace vesk

@@ -10,9 +10,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 // Waits, within reason, until `count` ranges are held or awaited.
 void AwaitQueue(BlockRangeLock &lock, size_t count) {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
@@ -27,7 +25,6 @@ void AwaitQueue(BlockRangeLock &lock, size_t count) {
     }
     FAIL() << "the queue never got " << count << " ranges";
 }
-
 } // namespace
 
 TEST(BlockRangeLockTest, DistinctRangesAreHeldTogether) {
@@ -100,5 +97,4 @@ TEST(BlockRangeLockTest, OneHolderPerBlockAtATime) {
     }
     EXPECT_EQ(clashes, 0);
 }
-
 } // namespace vesk

@@ -22,9 +22,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 using Blocks = std::vector<uint64_t>;
 
 int64_t Write(CacheDevice &device, uint64_t offset, const std::string &bytes) {
@@ -66,7 +64,6 @@ void ExpectSlotsAgree(TestDevice &test) {
             << "block " << slots[slot] << " in slot " << slot;
     }
 }
-
 } // namespace
 
 TEST(CacheDeviceReadTest, AnyOffsetAndSizeGivesTheBackingBytes) {
@@ -307,5 +304,4 @@ TEST(CacheDeviceRandomTest, AgreesWithAPlainFile) {
         EXPECT_EQ(snapshot.counters.misses, snapshot.counters.backingReads);
     }
 }
-
 } // namespace vesk

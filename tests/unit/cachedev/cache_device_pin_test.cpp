@@ -8,9 +8,7 @@
 #include <cerrno>
 
 namespace vesk {
-
 namespace {
-
 using Blocks = std::vector<uint64_t>;
 
 struct CacheDevicePinTest : testing::Test {
@@ -22,7 +20,6 @@ struct CacheDevicePinTest : testing::Test {
 };
 
 constexpr uint64_t kLastSector = 32 * kBlockSectors - 1;
-
 } // namespace
 
 TEST_F(CacheDevicePinTest, AMarkedBlockIsPinnedWhenReadAndSurvivesAScan) {
@@ -181,5 +178,4 @@ TEST(CacheDeviceTailTest, ATinyDeviceHasAnEmptyBitmap) {
     EXPECT_EQ(TestRead(test.device, 0, 1000), TestBytes(0, 512));
     EXPECT_TRUE(CacheDeviceIsAllUnpinned(test.device));
 }
-
 } // namespace vesk

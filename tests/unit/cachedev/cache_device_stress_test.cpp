@@ -15,9 +15,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 constexpr size_t kBytes = kBlockBytes;
 constexpr size_t kBlocks = 40;
 constexpr size_t kDeviceBytes = (kBlocks - 1) * kBytes + 8192; // the last block is partial
@@ -144,7 +142,6 @@ void Watcher(Stress &stress) {
         std::this_thread::yield();
     }
 }
-
 } // namespace
 
 TEST(CacheDeviceStressTest, NobodySeesTornOrStaleData) {
@@ -188,5 +185,4 @@ TEST(CacheDeviceStressTest, NobodySeesTornOrStaleData) {
     EXPECT_GT(snapshot.requests.refused, 0U);
     EXPECT_GT(snapshot.requests.setBitmap, 0U);
 }
-
 } // namespace vesk

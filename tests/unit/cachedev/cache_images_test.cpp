@@ -9,9 +9,7 @@
 #include <filesystem>
 
 namespace vesk {
-
 namespace {
-
 struct CacheImagesTest : testing::Test {
     const TempDir folder;
     CacheImages images;
@@ -27,7 +25,6 @@ ImagePieces Piece(std::string &bytes) {
     ImagePiecesAdd(pieces, bytes.data(), bytes.size());
     return pieces;
 }
-
 } // namespace
 
 TEST_F(CacheImagesTest, SizesAreTaken) {
@@ -137,5 +134,4 @@ TEST_F(CacheImagesTest, SyncsSucceed) {
     EXPECT_EQ(CacheImagesSyncBacking(images), 0);
     EXPECT_EQ(CacheImagesSyncAll(images), 0);
 }
-
 } // namespace vesk

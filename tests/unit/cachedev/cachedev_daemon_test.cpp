@@ -19,9 +19,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 bool IsFolderEmpty() {
     const std::unique_ptr<DIR, Deleter<closedir>> folder(opendir(kDaemonFolder));
     int entries = 0;
@@ -71,7 +69,6 @@ void MountAndDetach(const std::string &loop, const std::string &options) {
     EXPECT_EQ(DaemonCommand({"mount", "-o", options, loop, "/run/m"}), 0) << DaemonErrors();
     EXPECT_EQ(DaemonCommand({"losetup", "-d", loop}), 0) << DaemonErrors();
 }
-
 } // namespace
 
 TEST(CachedevDaemonTest, ServesReadsAndWritesThroughTheCache) {
@@ -309,5 +306,4 @@ TEST(CachedevDaemonTest, OrderedFaults) {
         EXPECT_EQ(DaemonStop(), 0);
     });
 }
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 struct OptionsTest : testing::Test {
     CachedevOptions options;
     std::string error;
@@ -34,7 +32,6 @@ struct OptionsTest : testing::Test {
         return Parse(arguments);
     }
 };
-
 } // namespace
 
 TEST_F(OptionsTest, TheUsualOnes) {
@@ -131,5 +128,4 @@ TEST_F(OptionsTest, WhatIsUnknownIsNamed) {
     EXPECT_FALSE(ParseMore({"stray"}));
     EXPECT_EQ(error, "unexpected argument stray");
 }
-
 } // namespace vesk

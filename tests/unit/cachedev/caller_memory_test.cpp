@@ -13,9 +13,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const Caller kSelf = {getpid(), sizeof(void *) == 4};
 
 uint64_t AddressOf(const void *memory) {
@@ -29,7 +27,6 @@ struct CallerMemoryTest : testing::Test {
         }
     }
 };
-
 } // namespace
 
 TEST_F(CallerMemoryTest, ReadsAndWritesAnotherProcess) {
@@ -119,5 +116,4 @@ TEST(DescriptorDecodeTest, The32BitForm) {
     EXPECT_EQ(descriptor.address, 0xF1234567U);
     EXPECT_EQ(descriptor.length, length);
 }
-
 } // namespace vesk

@@ -7,7 +7,6 @@
 #include <stdexcept>
 
 namespace vesk {
-
 TEST(OpenStatesTest, AnOpenFileKeepsShowingItsMoment) {
     TestDevice test(4 * kBlockBytes, 2);
     OpenStates states;
@@ -44,5 +43,4 @@ TEST(OpenStatesTest, ShowsALengthWithoutMakingATextEachTime) {
     TestTouch(test.device, {0, 1});
     EXPECT_EQ(OpenStatesBytes(states, test.device), first);
 }
-
 } // namespace vesk

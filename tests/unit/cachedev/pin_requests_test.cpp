@@ -10,9 +10,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 using Blocks = std::vector<uint64_t>;
 
 constexpr bool kIs32Bit = sizeof(void *) == 4;
@@ -61,7 +59,6 @@ struct PinRequestsTest : testing::Test {
 
     RequestCounters Counts() { return CacheDeviceSnapshot(device).requests; }
 };
-
 } // namespace
 
 TEST_F(PinRequestsTest, TheNumbersAreTheDrivers) {
@@ -246,5 +243,4 @@ TEST_F(PinRequestsTest, CountsByKind) {
     EXPECT_EQ(counts.getSize, 1U);
     EXPECT_EQ(counts.refused, 0U);
 }
-
 } // namespace vesk

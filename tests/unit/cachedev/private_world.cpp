@@ -14,9 +14,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 constexpr int kFailed = 1;
 constexpr int kSkipped = 77;
 
@@ -56,7 +54,6 @@ int StatusOf(pid_t child) {
     }
     _exit(first < 0 ? kFailed : StatusOf(first));
 }
-
 } // namespace
 
 void SkipWorld(const char *reason) {
@@ -87,5 +84,4 @@ void RunInPrivateWorld(const std::function<void()> &body) {
     }
     EXPECT_EQ(status, 0) << "failed in its private world, see above";
 }
-
 } // namespace vesk

@@ -5,7 +5,6 @@
 #include <functional>
 
 namespace vesk {
-
 // Runs `body` in a child process that is the first process of a new PID namespace. Its test
 // failures become one failure of the calling test, which is skipped when such a world cannot be
 // made (no root, no /dev/fuse, no namespaces) or when the body skips.
@@ -13,5 +12,4 @@ void RunInPrivateWorld(const std::function<void()> &body);
 
 // Ends the body of the running world as skipped, with the reason on standard output.
 [[noreturn]] void SkipWorld(const char *reason);
-
 } // namespace vesk

@@ -9,9 +9,7 @@
 #include <sstream>
 
 namespace vesk {
-
 namespace {
-
 Json::Value Parse(const std::string &text) {
     Json::Value value;
     std::istringstream stream(text);
@@ -27,7 +25,6 @@ std::string Text(const Json::Value &value) {
     writer["indentation"] = "";
     return Json::writeString(writer, value);
 }
-
 } // namespace
 
 TEST(StateJsonTest, AFreshDevice) {
@@ -97,5 +94,4 @@ TEST(StateJsonTest, BigNumbersAreExact) {
     EXPECT_EQ(Text(state["slotBlocks"]), "[8589934595,-1]");
     EXPECT_EQ(state["lastUnpin"][0][0].asUInt64(), UINT64_MAX - 1);
 }
-
 } // namespace vesk

@@ -19,9 +19,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 constexpr const char *kOutput = "/run/output";
 constexpr const char *kErrors = "/run/errors";
 
@@ -55,7 +53,6 @@ bool RunsTheDaemon(pid_t process) {
            stat(VESKCACHEDEV, &program) == 0 && running.st_dev == program.st_dev &&
            running.st_ino == program.st_ino;
 }
-
 } // namespace
 
 ScopedFd TestOpen(const char *path, int flags) {
@@ -167,5 +164,4 @@ std::string TestReadAt(int fd, uint64_t offset, uint64_t size) {
     return got < 0 ? "error " + std::to_string(errno)
                    : std::string(buffer.get(), static_cast<size_t>(got));
 }
-
 } // namespace vesk

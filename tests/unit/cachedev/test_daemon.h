@@ -12,7 +12,6 @@
 #include <vector>
 
 namespace vesk {
-
 constexpr const char *kDaemonFolder = "/run/vesk";
 constexpr const char *kDaemonDevice = "/run/vesk/cachedev_0";
 constexpr const char *kDaemonState = "/run/vesk/cachedev_0.json";
@@ -61,5 +60,4 @@ int DaemonQuery(unsigned long number);
 
 // Reads with an aligned buffer; "error N" when that fails.
 std::string TestReadAt(int fd, uint64_t offset, uint64_t size);
-
 } // namespace vesk

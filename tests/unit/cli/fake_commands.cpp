@@ -1,29 +1,17 @@
 #include "tests/unit/cli/fake_commands.h"
 
 #include "base/log.h"
-#include "commands/check_bitmap_set.h"
-#include "commands/check_file_pin.h"
-#include "commands/delete_bitmap.h"
-#include "commands/files_request.h"
-#include "commands/get_bitmap_size.h"
-#include "commands/handle_mount.h"
-#include "commands/handle_umount.h"
-#include "commands/modify_bitmap.h"
-#include "commands/pending_space.h"
-#include "commands/send_bitmap.h"
-#include "commands/unpin_all.h"
+#include "commands/commands.h"
 #include "request/tool_parameters.h"
 #include "service/start_service.h"
 
 #include <cstdio>
 
 namespace vesk {
-
 int FakeCommands::result = 0;
 uint64_t FakeCommands::bitmapSize = 0;
 
 namespace {
-
 int Answer(const char *operation, const char *first, const char *second = nullptr) {
     printf("[%s %s", operation, first == nullptr ? "-" : first);
     printf(second == nullptr ? "]\n" : " %s]\n", second);
@@ -34,7 +22,6 @@ int AnswerRange(const char *operation, const char *mountPath, uint64_t start, ui
     printf("[%s %s %llu %llu]\n", operation, mountPath, LogU64(start), LogU64(count));
     return FakeCommands::result;
 }
-
 } // namespace
 
 int PinFilesRequest(const ToolParameters *parameters) {
@@ -86,5 +73,4 @@ int GetBitmapSizeByte(const char *mountPath, uint64_t *size) {
     *size = FakeCommands::bitmapSize;
     return Answer("GetBitmapSizeByte", mountPath);
 }
-
 } // namespace vesk

@@ -5,10 +5,8 @@
 #include <cstdint>
 
 namespace vesk {
-
 struct FakeCommands {
     static int result;          // of every operation
     static uint64_t bitmapSize; // bytes; what GetBitmapSizeByte finds
 };
-
 } // namespace vesk

@@ -2,9 +2,7 @@
 #include "tests/unit/cli/main_fixture.h"
 
 namespace vesk {
-
 namespace {
-
 struct CommandCase {
     const char *name;
     Arguments arguments;
@@ -177,7 +175,6 @@ const CommandCase kCommandCases[] = {
 std::string CaseName(const ::testing::TestParamInfo<CommandCase> &info) {
     return info.param.name;
 }
-
 } // namespace
 
 TEST_P(MainCommandTest, RunsItsOperation) {
@@ -188,5 +185,4 @@ TEST_P(MainCommandTest, RunsItsOperation) {
 }
 
 INSTANTIATE_TEST_SUITE_P(All, MainCommandTest, ::testing::ValuesIn(kCommandCases), CaseName);
-
 } // namespace vesk

@@ -17,7 +17,6 @@
 #include <vector>
 
 namespace vesk {
-
 extern "C" int ToolMain(int argc, char *argv[]); // the tool's main
 
 const Arguments kMount = {"--mount-path", "/volume1"};
@@ -115,5 +114,4 @@ protected:
         return Tool(arguments);
     }
 };
-
 } // namespace vesk

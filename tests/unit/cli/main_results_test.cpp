@@ -3,7 +3,6 @@
 #include "tests/unit/cli/main_fixture.h"
 
 namespace vesk {
-
 TEST_F(MainTest, BitmapSizeIsANumberAndALineFeed) {
     FakeCommands::bitmapSize = 18446744073709551615ULL;
     const Outcome run = Tool(Arguments{"--get-bitmap-size-byte"} + kMount);
@@ -78,5 +77,4 @@ TEST_F(MainTest, UnpinRangeReportsTheRange) {
     ASSERT_GE(run.output.size(), last.size());
     EXPECT_EQ(run.output.substr(run.output.size() - last.size()), last);
 }
-
 } // namespace vesk

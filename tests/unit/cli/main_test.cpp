@@ -1,19 +1,16 @@
 // What main does around every command: the program's name, the log level and the exit status.
 #include "tests/unit/cli/main_fixture.h"
 
-#include "cli/usage.h"
+#include "cli/options.h"
 #include "tests/support/captured_log.h"
 
 namespace vesk {
-
 namespace {
-
 std::string UsageText() {
     CapturedLog output;
     Usage();
     return output.Text();
 }
-
 } // namespace
 
 TEST_F(MainTest, WithoutOptionsSaysInvalidInputInTheSystemLogPrintsTheUsageAndSucceeds) {
@@ -95,5 +92,4 @@ TEST_F(MainTest, ResultsGoToStandardOutputAlsoWhenMessagesGoToTheSystemLog) {
     EXPECT_EQ(run.output, "[CheckBitmapSet /volume1]\nYes\n");
     EXPECT_EQ(run.systemLog, "");
 }
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 const Arguments kMount = {"--mount-path", "/volume1"};
 const Arguments kConfig = {"--config-path", "/etc/pin.json"};
 const Arguments kStart = {"--start-sector", "128"};
@@ -129,7 +127,6 @@ const MissingCase kMissingCases[] = {
 template <typename Case> std::string CaseName(const ::testing::TestParamInfo<Case> &info) {
     return info.param.name;
 }
-
 } // namespace
 
 TEST_P(CommandOptionTest, ChoosesTheCommandWithoutAMessage) {
@@ -150,5 +147,4 @@ TEST_P(MissingParameterTest, FailsWithItsMessage) {
 
 INSTANTIATE_TEST_SUITE_P(All, MissingParameterTest, ::testing::ValuesIn(kMissingCases),
                          CaseName<MissingCase>);
-
 } // namespace vesk

@@ -8,14 +8,11 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 using OptionsDeathTest = OptionsTest;
 
 const ::testing::ExitedWithCode kSuccess(0);
 const ::testing::KilledBySignal kAborted(SIGABRT);
-
 } // namespace
 
 TEST_F(OptionsDeathTest, ShortOptionThatNothingHandlesAbortsAfterItsMessage) {
@@ -66,5 +63,4 @@ TEST_F(OptionsDeathTest, HelpBehindAFailedCheckIsNotReached) {
     EXPECT_EQ(Parse({"--check-pin", "/no/such", "--help"}), -1);
     EXPECT_EQ(log.Text(), "tool: File (/no/such) doesn't exist\n");
 }
-
 } // namespace vesk

@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 using Arguments = std::vector<std::string>;
 
 inline Arguments operator+(Arguments left, const Arguments &right) {
@@ -43,5 +42,4 @@ protected:
 private:
     Arguments words_;
 };
-
 } // namespace vesk

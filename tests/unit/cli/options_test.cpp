@@ -7,13 +7,15 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 const Arguments kMount = {"--mount-path", "/volume1"};
 const Arguments kStart = {"--start-sector", "128"};
 const Arguments kCount = {"--num-sectors", "256"};
 
+std::string Stripped(std::string text) {
+    StripTrailingSlash(&text[0]);
+    return text.c_str();
+}
 } // namespace
 
 TEST_F(OptionsTest, ParametersBeginUnset) {
@@ -229,4 +231,36 @@ TEST_F(OptionsTest, LongFormNamesTheOperationAndItsFunction) {
                                         "GetOptions() [N] : ***** Check parameter failed"}));
 }
 
+TEST(ToolCommandToString, NamesTheCommandsInOrder) {
+    const char *const names[] = {
+        "invalid",      "pinFiles",        "unpinFiles",         "sendBitmap",
+        "startService", "handleMount",     "handleUmount",       "supportPin",
+        "checkBitmap",  "addPendingSpace", "removePendingSpace", "getUUID",
+        "deleteBitmap", "checkPin",        "reloadPinBlocks",    "unpinAllBlocks"};
+    for (int command = 0; command < 16; ++command) {
+        EXPECT_STREQ(ToolCommandToString(command), names[command]);
+    }
+}
+
+TEST(ToolCommandToString, IsShiftedByOneFromIsAllUnpinOn) {
+    EXPECT_STREQ(ToolCommandToString(kCommandIsAllUnpin), "setBitmap");
+    EXPECT_STREQ(ToolCommandToString(kCommandSetBitmap), "unsetBitmap");
+    EXPECT_STREQ(ToolCommandToString(kCommandUnsetBitmap), "unpinRange");
+    EXPECT_STREQ(ToolCommandToString(kCommandUnpinRange), "get-bitmap-size-byte");
+    EXPECT_STREQ(ToolCommandToString(kCommandGetBitmapSizeByte), "pin-files");
+}
+
+TEST(StripTrailingSlash, TakesOneSlashOffTheEnd) {
+    EXPECT_EQ(Stripped("/volume1/"), "/volume1");
+    EXPECT_EQ(Stripped("/volume1//"), "/volume1/");
+    EXPECT_EQ(Stripped("//"), "/");
+    EXPECT_EQ(Stripped("a/"), "a");
+}
+
+TEST(StripTrailingSlash, LeavesEverythingElseAlone) {
+    EXPECT_EQ(Stripped("/volume1"), "/volume1");
+    EXPECT_EQ(Stripped("/"), "/");
+    EXPECT_EQ(Stripped(""), "");
+    StripTrailingSlash(nullptr);
+}
 } // namespace vesk

@@ -1,4 +1,4 @@
-#include "cli/usage.h"
+#include "cli/options.h"
 
 #include "base/log.h"
 #include "tests/support/captured_log.h"
@@ -6,9 +6,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 const char kExpectedUsage[] =
     "Usage:\n"
     "\tStart service:\n"
@@ -49,7 +47,6 @@ const char kExpectedUsage[] =
     "\tSet the bitmap file in volume (You can set to driver by --send-bitmap later)\n"
     "\t\ttool --set-bitmap --mount-path mount_path --start-sector start_sector --num-sectors "
     "num_sectors\n";
-
 } // namespace
 
 TEST(Usage, IsThisTextWithTheProgramNameInItsExamples) {
@@ -79,5 +76,4 @@ TEST(Usage, PercentSignsInTheProgramNameAreText) {
     EXPECT_NE(output.Text().find("\t\t%s%n --start-service --config-path conf_path\n"),
               std::string::npos);
 }
-
 } // namespace vesk

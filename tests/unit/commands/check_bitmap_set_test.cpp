@@ -1,9 +1,8 @@
-#include "commands/check_bitmap_set.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 namespace vesk {
-
 class CheckBitmapSetTest : public CommandsTest {};
 
 TEST_F(CheckBitmapSetTest, CheckBitmapAnswersTheDriversState) {
@@ -57,5 +56,4 @@ TEST_F(CheckBitmapSetTest, CheckBitmapThatTheDriverRefusesIs0) {
                   "CheckBitmapSet() [N]: Bitmap set state = 0",
               }));
 }
-
 } // namespace vesk

@@ -1,12 +1,11 @@
 // Whether one file is pinned.
-#include "commands/check_file_pin.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <sys/stat.h>
 
 namespace vesk {
-
 class CheckFilePinTest : public CommandsTest {
 protected:
     void SetUp() override {
@@ -118,5 +117,4 @@ TEST_F(CheckFilePinTest, AFileThatHasGoneIsAnErrorOnAVolumeWithRecords) {
               "CheckFileIsPin() [N] : ***** Can't get inode number of file (" + file_ + ")");
     EXPECT_TRUE(log.Has("FileGetInodeNumber() [N] : ***** Stat file " + file_ + " error"));
 }
-
 } // namespace vesk

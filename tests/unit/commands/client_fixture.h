@@ -5,13 +5,12 @@
 #include "tests/unit/commands/commands_fixture.h"
 
 #include "request/message_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "request/tool_parameters.h"
 
 #include <filesystem>
 
 namespace vesk {
-
 class ClientRequestsTest : public CommandsTest {
 protected:
     void SetUp() override {
@@ -40,5 +39,4 @@ protected:
         EXPECT_FALSE(std::filesystem::exists(kMessageKeyFile));
     }
 };
-
 } // namespace vesk

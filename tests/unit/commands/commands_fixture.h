@@ -14,7 +14,6 @@
 #include <memory>
 
 namespace vesk {
-
 using Events = std::vector<std::string>;
 
 class CommandsTest : public LeakCheckedTest {
@@ -32,5 +31,4 @@ protected:
     const std::string bitmapFile_ = volume_ + "/veskcachepinfile.bitmap";
     std::unique_ptr<FakeCacheDevice> device_;
 };
-
 } // namespace vesk

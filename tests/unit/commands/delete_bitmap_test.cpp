@@ -1,9 +1,8 @@
-#include "commands/delete_bitmap.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/volume_events_fixture.h"
 
 namespace vesk {
-
 TEST_F(VolumeEventsTest, DeleteBitmapDeletesTheFileAndNothingElse) {
     WriteWhole(bitmapFile_, "ab");
     CapturedLog log(2);
@@ -37,5 +36,4 @@ TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {
     EXPECT_EQ(DeleteBitmap(Volume()), -1);
     EXPECT_EQ(log.Messages(), Messages{"Can't delete bitmap (" + bitmapFile_ + ")"});
 }
-
 } // namespace vesk

@@ -1,14 +1,10 @@
-#include "commands/files_request.h"
-#include "commands/pending_space.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/client_fixture.h"
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateWorld = UsePrivateWorld();
-
 } // namespace
 
 TEST_F(ClientRequestsTest, APinSendsTheFilesAsTyped) {
@@ -131,5 +127,4 @@ TEST_F(ClientRequestsTest, AFullQueueFailsAfterThreeSeconds) {
     EXPECT_EQ(FakeLibc::sleeps, 3);
     EXPECT_EQ(CountMessages(queueId), 1024);
 }
-
 } // namespace vesk

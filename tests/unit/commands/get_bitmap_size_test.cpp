@@ -1,9 +1,8 @@
-#include "commands/get_bitmap_size.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 namespace vesk {
-
 class GetBitmapSizeTest : public CommandsTest {};
 
 TEST_F(GetBitmapSizeTest, TheBitmapSizeIsThatOfTheCacheDevice) {
@@ -35,5 +34,4 @@ TEST_F(GetBitmapSizeTest, TheBitmapSizeNeedsTheDevice) {
                                   "Get bitmap size for cache (/missing/device) failed",
                               }));
 }
-
 } // namespace vesk

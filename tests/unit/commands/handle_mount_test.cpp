@@ -1,4 +1,4 @@
-#include "commands/handle_mount.h"
+#include "commands/commands.h"
 
 #include "tests/support/ordinary_user.h"
 #include "tests/unit/commands/volume_events_fixture.h"
@@ -8,9 +8,7 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 namespace {
-
 Json::Value Parse(const std::string &text) {
     Json::Value root;
     std::string errors;
@@ -23,7 +21,6 @@ class HandleMountTest : public VolumeEventsTest {
 protected:
     int Mount() const { return HandleSpaceMount(config_.c_str(), Volume()); }
 };
-
 } // namespace
 
 TEST_F(HandleMountTest, MountOfAVolumeThatSupportsPinningTouchesNothing) {
@@ -124,5 +121,4 @@ TEST_F(HandleMountTest, MountOfAnUnknownVolumeRemovesItsRecords) {
                                   recordsRemoved_,
                               }));
 }
-
 } // namespace vesk

@@ -1,9 +1,8 @@
-#include "commands/handle_umount.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/volume_events_fixture.h"
 
 namespace vesk {
-
 TEST_F(VolumeEventsTest, UmountChangesNothing) {
     WriteWhole(bitmapFile_, "ab");
     CapturedLog log;
@@ -24,5 +23,4 @@ TEST_F(VolumeEventsTest, UmountOfAVolumeWithoutPinningIsANotice) {
     EXPECT_EQ(MessagesOf(log, "HandleSpaceUmount"),
               Messages{"HandleSpaceUmount() [N] : Space (" + volume_ + ") doesn't support pin"});
 }
-
 } // namespace vesk

@@ -1,11 +1,10 @@
-#include "commands/modify_bitmap.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <cerrno>
 
 namespace vesk {
-
 class ModifyBitmapTest : public CommandsTest {};
 
 TEST_F(ModifyBitmapTest, SettingARangeWritesTheFileThenSendsTheBitmap) {
@@ -130,5 +129,4 @@ TEST_F(ModifyBitmapTest, ADriverThatRefusesLeavesTheFileChanged) {
               Messages{"ModifyBitmap() [N] : ***** Can't send bitmap to driver"});
     EXPECT_EQ(Hex(ReadWhole(bitmapFile_)), "0100");
 }
-
 } // namespace vesk

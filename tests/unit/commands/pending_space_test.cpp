@@ -1,9 +1,8 @@
-#include "commands/pending_space.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/client_fixture.h"
 
 namespace vesk {
-
 TEST_F(ClientRequestsTest, PendingSpaceRequestsAlwaysFailAfterThreeSeconds) {
     for (const auto &request : {AddPendingSpaceRequest, RemovePendingSpaceRequest}) {
         FakeLibc::sleeps = 0;
@@ -60,5 +59,4 @@ TEST_F(ClientRequestsTest, OtherPendingSpaceTypesAreRefusedBehindTheVolume) {
     EXPECT_EQ(FakeLibc::sleeps, 0);
     ExpectUntouchedQueue();
 }
-
 } // namespace vesk

@@ -1,11 +1,10 @@
-#include "commands/send_bitmap.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include <cerrno>
 
 namespace vesk {
-
 class SendBitmapTest : public CommandsTest {};
 
 TEST_F(SendBitmapTest, SendBitmapSendsTheStoredBitmapAsItIs) {
@@ -135,5 +134,4 @@ TEST_F(SendBitmapTest, SendBitmapThatTheDriverRefusesFails) {
     EXPECT_EQ(MessagesOf(log, "SendBitmap"),
               Messages{"SendBitmap() [N] : ***** Can't send bitmap to driver"});
 }
-
 } // namespace vesk

@@ -1,11 +1,10 @@
-#include "commands/unpin_all.h"
+#include "commands/commands.h"
 
 #include "tests/unit/commands/commands_fixture.h"
 
 #include "request/tool_parameters.h"
 
 namespace vesk {
-
 class UnpinAllTest : public CommandsTest {
 protected:
     static int Unpin(const char *mountPath, const char *cachePath) {
@@ -107,5 +106,4 @@ TEST_F(UnpinAllTest, ANullPathIsAnIncorrectParameter) {
     EXPECT_EQ(log.Messages(),
               Messages{"UnpinAllBlocksByCachePath() [N] : ***** Incorrect parameter"});
 }
-
 } // namespace vesk

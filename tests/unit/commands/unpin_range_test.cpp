@@ -1,13 +1,10 @@
-#include "commands/unpin_range.h"
+#include "commands/commands.h"
 
 #include "tests/support/unpin_ranges_fixture.h"
 
 namespace vesk {
-
 namespace {
-
 using UnpinRangeTest = UnpinRangesTest;
-
 } // namespace
 
 TEST_F(UnpinRangeTest, SendsOneRecordToTheVolumesCache) {
@@ -43,5 +40,4 @@ TEST_F(UnpinRangeTest, FailureMessageHasTheErrorMarker) {
     EXPECT_EQ(UnpinRange("/volume9", 0, 1), -1);
     EXPECT_TRUE(log.Has("UnpinRange() [N] : ***** Can't get cache path of volume (/volume9)"));
 }
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <string>
 
 namespace vesk {
-
 class VolumeEventsTest : public CommandsTest {
 protected:
     void SetUp() override {
@@ -22,5 +21,4 @@ protected:
                      "/volume2" : {"files" : {"2" : "b"}}}})";
     const std::string recordsRemoved_ = "Remove pin file volume (" + volume_ + ") from config file";
 };
-
 } // namespace vesk

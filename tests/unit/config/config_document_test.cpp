@@ -5,7 +5,6 @@
 #include <cerrno>
 
 namespace vesk {
-
 class ConfigDocumentTest : public ConfigTest {};
 
 TEST_F(ConfigDocumentTest, DocumentedShapesAreAccepted) {
@@ -87,7 +86,6 @@ TEST_F(ConfigDocumentTest, ReadingReportsNothingItselfAboutAShape) {
 }
 
 namespace {
-
 const LogPlace kCaller{"Caller", 1};
 
 const char *AddMember(Json::Value &root) {
@@ -99,7 +97,6 @@ const char *NotReached(Json::Value & /*root*/) {
     ADD_FAILURE() << "there was nothing to change";
     return nullptr;
 }
-
 } // namespace
 
 TEST_F(ConfigDocumentTest, AnUpdateReadsChangesAndWrites) {
@@ -176,5 +173,4 @@ TEST_F(ConfigDocumentTest, AFailedWriteNamesTheFileUnlessItMayHaveBeenCreated) {
     EXPECT_EQ(MessagesOf(log, "Caller"),
               (Messages{"Caller() [N] : ***** Can't write to files", named, named}));
 }
-
 } // namespace vesk

@@ -3,7 +3,6 @@
 #include "tests/support/config_fixture.h"
 
 namespace vesk {
-
 class JsonArrayTest : public ConfigTest {};
 
 TEST_F(JsonArrayTest, HasStringFindsAnEqualElement) {
@@ -70,5 +69,4 @@ TEST_F(JsonArrayTest, RemovingTheLastElementLeavesAnEmptyValue) {
     EXPECT_EQ(JsonArrayRemoveString(array, "3"), 0);
     EXPECT_TRUE(array.isNull());
 }
-
 } // namespace vesk

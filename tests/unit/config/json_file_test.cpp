@@ -6,7 +6,6 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 class JsonFileTest : public ConfigTest {};
 
 TEST_F(JsonFileTest, TheExampleDocumentRoundTrips) {
@@ -189,5 +188,4 @@ TEST_F(JsonFileTest, AtLevel2BothAreTraced) {
                   "WriteJsonToFile() [N] : -----",
               }));
 }
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 class PinnedFilesCycleTest : public ConfigTest {
 protected:
     int Finish(const RequestRecord &record, const std::string &num) const {
@@ -181,5 +180,4 @@ TEST_F(PinnedFilesCycleTest, RemovingAVolumeFromAFileThatCannotBeWrittenFails) {
                               }));
     EXPECT_EQ(Stored(), kExampleDocument);
 }
-
 } // namespace vesk

@@ -3,7 +3,6 @@
 #include "tests/support/config_fixture.h"
 
 namespace vesk {
-
 class PinnedFilesTest : public ConfigTest {
 protected:
     static int Update(Json::Value &root, int type, const std::string &data) {
@@ -122,5 +121,4 @@ TEST_F(PinnedFilesTest, ANullVolumeCountsAsAbsent) {
     Json::Value root = ParseDocument(R"({"volumes" : {"/volume1" : null}})");
     EXPECT_EQ(JsonRemovePinFileVolume(root, "/volume1"), 1);
 }
-
 } // namespace vesk

@@ -5,7 +5,6 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 class RequestRemovalTest : public ConfigTest {};
 
 TEST_F(RequestRemovalTest, RemovingTakesQueueEntryAndRequest) {
@@ -157,5 +156,4 @@ TEST_F(RequestRemovalTest, DroppingFromAFileThatCannotBeWrittenFails) {
                               }));
     EXPECT_EQ(Stored(), kExampleDocument);
 }
-
 } // namespace vesk

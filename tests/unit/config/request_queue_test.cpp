@@ -5,7 +5,6 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 class RequestQueueTest : public ConfigTest {
 protected:
     int Add(const RequestRecord &record) const { return ConfigAddRequest(path_.c_str(), &record); }
@@ -192,5 +191,4 @@ TEST_F(RequestQueueTest, AtLevel2FailuresNameTheirFunctions) {
     EXPECT_EQ(MessagesOf(log, "ConfigAddRequest"),
               Messages{"ConfigAddRequest() [N] : ***** Can't add request to json"});
 }
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 using Messages = std::vector<std::string>;
 
 const char kDevice[] = "/dev/null"; // can be opened; what it is asked is answered by the test
@@ -33,7 +31,6 @@ protected:
     unsigned char bytes[4] = {0x01, 0x80, 0xFF, 0x00};
     PinBitmap bitmap = {bytes, sizeof(bytes)};
 };
-
 } // namespace
 
 TEST_F(BitmapControlTest, SendHandsOverTheRecordItself) {
@@ -172,5 +169,4 @@ TEST_F(BitmapControlTest, AllUnpinnedFailsWhenTheDriverRefuses) {
     EXPECT_EQ(messages.at(messages.size() - 2), "isAllBlocksUnpin() [N] : ***** Ioctl error");
     EXPECT_EQ(LastOf(messages), "isAllBlocksUnpin() [N] : -----");
 }
-
 } // namespace vesk

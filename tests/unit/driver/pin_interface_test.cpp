@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 TEST(PinInterface, RequestNumbersAreTheDrivers) {
     EXPECT_EQ(kPinIoctlSetBitmap, 65231U);
     EXPECT_EQ(kPinIoctlQueryBitmapSet, 2147811023U);
@@ -27,5 +26,4 @@ TEST(PinInterface, RangeListIs1024RecordsIn16384Bytes) {
     const auto *bytes = reinterpret_cast<const char *>(&list);
     EXPECT_EQ(reinterpret_cast<const char *>(&list.ranges[1023]) - bytes, 16368);
 }
-
 } // namespace vesk

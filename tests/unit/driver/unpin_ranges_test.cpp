@@ -3,9 +3,7 @@
 #include "tests/support/unpin_ranges_fixture.h"
 
 namespace vesk {
-
 namespace {
-
 using SendUnpinInfoToDriverTest = UnpinRangesTest;
 
 int Send(uint64_t count) {
@@ -15,7 +13,6 @@ int Send(uint64_t count) {
     }
     return SendUnpinInfoToDriver(kDevice, ranges);
 }
-
 } // namespace
 
 TEST_F(SendUnpinInfoToDriverTest, SendsNothingForAnEmptyList) {
@@ -166,5 +163,4 @@ TEST_F(SendUnpinInfoToDriverTest, OneListThatIsRefusedFailsAtTheCallersPlace) {
     EXPECT_EQ(SendUnpinList(kDevice, &list, {"Caller", 1}), -1);
     EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Send unpin inctl to driver failed");
 }
-
 } // namespace vesk

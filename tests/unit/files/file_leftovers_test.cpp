@@ -9,9 +9,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 class FileLeftoversTest : public LeakCheckedTest {
 protected:
     // A process id that is nobody's, nor will be: the first that is too large.
@@ -33,7 +31,6 @@ protected:
     TempDir folder;
     const std::string config = folder.Path("config.json");
 };
-
 } // namespace
 
 TEST_F(FileLeftoversTest, OldFilesOfGoneProcessesGo) {
@@ -86,5 +83,4 @@ TEST_F(FileLeftoversTest, AFolderThatIsNotThereIsNoMatter) {
     FileRemoveLeftovers("/no/such/config.json");
     FileRemoveLeftovers("");
 }
-
 } // namespace vesk

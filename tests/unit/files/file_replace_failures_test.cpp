@@ -9,9 +9,7 @@
 #include <fcntl.h>
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateMounts = UsePrivateMounts();
 
 class FileReplaceFailureTest : public FileReplaceTest {
@@ -27,7 +25,6 @@ protected:
         EXPECT_EQ(Names(), onlyTheFile);
     }
 };
-
 } // namespace
 
 TEST_F(FileReplaceFailureTest, FailedWriteLeavesTheOldContent) {
@@ -258,5 +255,4 @@ TEST_F(FileReplaceFailureTest, FullDiskLeavesTheOldContent) {
     EXPECT_EQ(FileReplaceContent(disk.Path("file").c_str(), fresh), FileReplaceResult::Done);
     EXPECT_EQ(ReadWhole(disk.Path("file")), fresh);
 }
-
 } // namespace vesk

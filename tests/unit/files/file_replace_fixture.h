@@ -15,7 +15,6 @@
 #include <vector>
 
 namespace vesk {
-
 const uid_t kNobody = 65534;
 
 class FileReplaceTest : public LeakCheckedTest {
@@ -96,5 +95,4 @@ private:
         GTEST_SKIP() << "acting for another user needs root";                                      \
     }                                                                                              \
     static_assert(true, "a semicolon follows")
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <fcntl.h>
 
 namespace vesk {
-
 TEST_F(FileReplaceTest, ReplacesTheContentWhole) {
     for (const std::string &content :
          {fresh, std::string(), std::string("a\0b", 3), std::string(1000000, 'x')}) {
@@ -130,5 +129,4 @@ TEST_F(FileReplaceTest, InterruptedWriteIsRepeated) {
     EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::Done);
     EXPECT_EQ(ReadWhole(path), fresh);
 }
-
 } // namespace vesk

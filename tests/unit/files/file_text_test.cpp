@@ -9,9 +9,7 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 namespace {
-
 class FileTextTest : public LeakCheckedTest {
 protected:
     // The text that FileReadString finds in a file with this content.
@@ -24,7 +22,6 @@ protected:
     TempDir folder;
     const std::string path = folder.Path("file");
 };
-
 } // namespace
 
 TEST_F(FileTextTest, WritesTheTextAndNothingElse) {
@@ -118,5 +115,4 @@ TEST_F(FileTextTest, ReadFailsOnAnEmptyFileAndOnAFolder) {
         EXPECT_EQ(log.Text(), "tool: Can't get a line from file (" + unreadable + ")\n");
     }
 }
-
 } // namespace vesk

@@ -11,9 +11,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 class PathTest : public LeakCheckedTest {
 protected:
     std::string Make(mode_t type, dev_t device = 0) {
@@ -29,7 +27,6 @@ protected:
     TempDir folder;
     const std::string missing = folder.Path("missing");
 };
-
 } // namespace
 
 TEST_F(PathTest, SizeIsThatOfTheFile) {
@@ -181,5 +178,4 @@ TEST_F(PathTest, NothingIsNeitherAndSaysSo) {
               (std::vector<std::string>{"PathIsFile() [N] : ***** Path (/no/such) doesn't exist",
                                         "PathIsDir() [N] : ***** Path (/no/such) doesn't exist"}));
 }
-
 } // namespace vesk

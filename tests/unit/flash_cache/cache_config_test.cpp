@@ -10,9 +10,7 @@
 #include <filesystem>
 
 namespace vesk {
-
 namespace {
-
 constexpr char kOne[] =
     R"({"caches":[{"spaceUuid":"u1","ssdPath":"/dev/ssd1","cachePath":"/dev/cache1"}]})";
 
@@ -115,7 +113,5 @@ TEST(CacheConfigPath, FollowsTheEnvironment) {
     ASSERT_EQ(unsetenv("VESK_FLASHCACHE_CONFIG"), 0);
     EXPECT_EQ(CacheConfigPath(), "/etc/veskflashcache.json");
 }
-
 } // namespace
-
 } // namespace vesk

@@ -8,9 +8,7 @@
 #include <sys/stat.h>
 
 namespace vesk {
-
 namespace {
-
 TEST(CacheDeviceAsk, PinInterface) {
     for (const bool hasPinInterface : {true, false}) {
         const FakeDriver driver("driver", hasPinInterface);
@@ -52,7 +50,5 @@ TEST(CacheDeviceAsk, NoCacheDevice) {
         EXPECT_FALSE(state.supportsPin) << path;
     }
 }
-
 } // namespace
-
 } // namespace vesk

@@ -11,9 +11,7 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 // Configures one cache each for the spaces "u1" and "u2", with the SSDs "ssd1" and "ssd2".
 class FlashCache : public testing::Test {
 protected:
@@ -180,7 +178,5 @@ TEST_F(FlashCache, FirstOfTwoEntriesCounts) {
                   R"({"spaceUuid":"u","ssdPath":"b","cachePath":"d"}]})");
     EXPECT_EQ(ConfigGet("u"), "1 a");
 }
-
 } // namespace
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <stdexcept>
 
 namespace vesk {
-
 std::string DocExample(const std::string &name) {
     const std::string page = ReadWhole(VESK_DOCS "/formats.md");
     const size_t mark = page.find(" " + name + "\n");
@@ -28,5 +27,4 @@ std::string DocExampleBytes(const std::string &name) {
     }
     return bytes;
 }
-
 } // namespace vesk

@@ -6,7 +6,7 @@
 #include "tests/unit/formats/doc_examples.h"
 
 #include "bitmap/bitmap_file.h"
-#include "commands/files_request.h"
+#include "commands/commands.h"
 #include "config/config_document.h"
 #include "config/json_file.h"
 #include "config/pinned_files.h"
@@ -15,16 +15,14 @@
 #include "files/file_text.h"
 #include "request/file_inode_list.h"
 #include "request/message_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "request/tool_parameters.h"
 
 #include <cstring>
 #include <sys/ipc.h>
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateWorld = UsePrivateWorld();
 
 std::string WithoutLineFeed(std::string text) {
@@ -34,7 +32,6 @@ std::string WithoutLineFeed(std::string text) {
 
 // Any existing file serves as a device that requests are sent to.
 const char kAnyDevice[] = "/dev/null";
-
 } // namespace
 
 class FormatsTest : public LeakCheckedTest {
@@ -149,5 +146,4 @@ TEST_F(FormatsTest, TheRangeListBeginsAsShownAndIsSentWhole) {
     EXPECT_EQ(sent.substr(0, shown.size()), shown);
     EXPECT_EQ(sent.find_first_not_of('\0', shown.size()), std::string::npos);
 }
-
 } // namespace vesk

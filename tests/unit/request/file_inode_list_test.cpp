@@ -5,7 +5,6 @@
 #include <filesystem>
 
 namespace vesk {
-
 class FileInodeListTest : public ConfigTest {
 protected:
     // Of the absolute paths on the test's volume, into a buffer of this size.
@@ -182,5 +181,4 @@ TEST_F(FileInodeListTest, APathOf511CharactersFits) {
     ASSERT_EQ(infos.size(), 1U);
     EXPECT_EQ(infos[0].szRelativePath, std::string(511, 'p'));
 }
-
 } // namespace vesk

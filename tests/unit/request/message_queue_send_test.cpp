@@ -3,12 +3,15 @@
 
 #include "tests/support/queue_fixture.h"
 
-#include "request/request_type.h"
+#include "request/request_record.h"
 
 #include <cerrno>
 #include <cstring>
 
 namespace vesk {
+namespace {
+const LogPlace kCaller{"Caller", 1};
+} // namespace
 
 class MessageQueueSendTest : public QueueTest {
 protected:
@@ -156,4 +159,26 @@ TEST_F(MessageQueueSendTest, AnyOtherAnswerIsWrong) {
     EXPECT_EQ(CountMessages(queueId_), 1);
 }
 
+TEST_F(MessageQueueSendTest, ARequestIsSentWithItsFilesIfItHasAny) {
+    EXPECT_EQ(SendRequest(queueId_, 2, "/volume1", "/volume1/a", kCaller), 0);
+    EXPECT_EQ(TakeMessage(queueId_).text, RecordBytes(2, "/volume1", "/volume1/a"));
+    EXPECT_EQ(SendRequest(queueId_, 4, "/volume1", nullptr, kCaller), 0);
+    EXPECT_EQ(TakeMessage(queueId_).text, RecordBytes(4, "/volume1"));
+    EXPECT_EQ(CountMessages(queueId_), 0);
+}
+
+TEST_F(MessageQueueSendTest, TextsThatFillTheirFieldsHaveNoNul) {
+    const std::string longText(3000, 'x');
+    EXPECT_EQ(SendRequest(queueId_, 1, longText.c_str(), longText.c_str(), kCaller), 0);
+    const RawMessage message = TakeMessage(queueId_);
+    EXPECT_EQ(message.type, 1);
+    EXPECT_EQ(message.text, std::string("\1\0\0\0", 4) + std::string(512 + 1024, 'x'));
+}
+
+TEST_F(MessageQueueSendTest, ARequestThatCannotBeSentFailsAtTheCallersPlace) {
+    CapturedLog log(2);
+    EXPECT_EQ(SendRequest(-1, 1, "/volume1", nullptr, kCaller), -1);
+    ASSERT_FALSE(log.Messages().empty());
+    EXPECT_EQ(log.Messages().back(), "Caller() [N] : ***** Send message failed: Invalid argument");
+}
 } // namespace vesk

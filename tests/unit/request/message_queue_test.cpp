@@ -11,11 +11,8 @@
 #include <thread>
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateWorld = UsePrivateWorld();
-
 } // namespace
 
 class MessageQueueTest : public QueueTest {};
@@ -263,5 +260,4 @@ TEST_F(MessageQueueTest, NothingOnTheWayCatchesWhatAKeyFileWithoutANumberThrows)
     WriteWhole(keyFile_, "abc");
     EXPECT_THROW(MsgQueueGet(KeyFile()), std::invalid_argument);
 }
-
 } // namespace vesk

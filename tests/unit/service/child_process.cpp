@@ -22,12 +22,10 @@
 #include <unistd.h>
 
 namespace vesk {
-
 // Writes the counts of a build that measures coverage; only such a build has it.
 extern "C" void __gcov_dump() __attribute__((weak));
 
 namespace {
-
 using Clock = std::chrono::steady_clock;
 
 const int kStretched = 100;
@@ -98,7 +96,6 @@ void *RunBody(void *argument) {
     WriteCoverage();
     _exit(body.result);
 }
-
 } // namespace
 
 ChildProcess::ChildProcess(const Setup &setup, const std::function<int()> &body) {
@@ -209,5 +206,4 @@ std::vector<std::string> ChildProcess::Messages() {
     }
     return messages;
 }
-
 } // namespace vesk

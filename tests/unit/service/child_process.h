@@ -14,7 +14,6 @@
 #include <vector>
 
 namespace vesk {
-
 // The thread sanitizer holds signals back until the thread calls something that it knows, and calls
 // a handler's output an error: what is meant to end a process inside such a call cannot be shown.
 #ifdef __SANITIZE_THREAD__
@@ -78,5 +77,4 @@ private:
     int result_ = -1; // of AwaitEnd, once it has ended
     std::string text_;
 };
-
 } // namespace vesk

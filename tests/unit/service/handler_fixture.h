@@ -11,7 +11,6 @@
 #include "tests/support/temp_dir.h"
 
 #include "request/request_record.h"
-#include "request/request_type.h"
 #include "state/service_state.h"
 
 #include <cstdio>
@@ -21,7 +20,6 @@
 #include <memory>
 
 namespace vesk {
-
 using Events = std::vector<std::string>;
 
 class HandlerTest : public LeakCheckedTest {
@@ -69,5 +67,4 @@ protected:
         {2, {FakeExtent(0, 8, 384), FakeExtent(8, 16, 1152)}},
     };
 };
-
 } // namespace vesk

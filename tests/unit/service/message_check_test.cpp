@@ -1,4 +1,4 @@
-#include "service/message_check.h"
+#include "service/receiver.h"
 
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
@@ -8,16 +8,13 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 int Check(int type, const std::string &mountPath, const std::string &data) {
     RequestMessage message{};
     const std::string bytes = RecordBytes(type, mountPath, data);
     memcpy(&message.record, bytes.data(), bytes.size());
     return CheckNormalMsg(&message);
 }
-
 } // namespace
 
 class MessageCheckTest : public LeakCheckedTest {};
@@ -56,5 +53,4 @@ TEST_F(MessageCheckTest, PinAndUnpinNeedFiles) {
     EXPECT_EQ(Check(2, "/volume1", ""), -1);
     EXPECT_EQ(log.Messages(), Messages{"CheckNormalMsg() [N] : ***** Should provide file paths"});
 }
-
 } // namespace vesk

@@ -7,7 +7,6 @@
 #include <thread>
 
 namespace vesk {
-
 // The selection on a thread of its own; it ends when it has found something.
 class NextRequestBlockingTest : public ConfigTest {
 protected:
@@ -81,5 +80,4 @@ TEST_F(NextRequestBlockingTest, AFileThatIsDamagedMeanwhileEndsTheWaitWithAnErro
     selection_.join();
     EXPECT_EQ(result_, NextRequest::Error);
 }
-
 } // namespace vesk

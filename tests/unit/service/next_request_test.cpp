@@ -7,11 +7,8 @@
 #include <thread>
 
 namespace vesk {
-
 namespace {
-
 const char kPinA[] = R"({"type" : "pinFiles", "mountPath" : "/volume1", "data" : "a#1"})";
-
 } // namespace
 
 class NextRequestTest : public ConfigTest {
@@ -267,5 +264,4 @@ TEST_F(NextRequestTest, LongTextsAreCutToTheRecordsFields) {
     EXPECT_EQ(record_.mountPath, mountPath.substr(0, 511));
     EXPECT_EQ(record_.data, std::string(1023, 'd'));
 }
-
 } // namespace vesk

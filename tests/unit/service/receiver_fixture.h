@@ -5,7 +5,7 @@
 #include "tests/support/thread_state.h"
 
 #include "request/message_queue.h"
-#include "request/request_type.h"
+#include "request/request_record.h"
 #include "service/receiver.h"
 #include "state/service_state.h"
 
@@ -20,7 +20,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 inline Json::Value ParseJson(const std::string &text) {
     Json::Value root;
     std::string errors;
@@ -82,5 +81,4 @@ protected:
     const std::string volume_ = folder_.Path("volume1");
     int queueId_ = -1;
 };
-
 } // namespace vesk

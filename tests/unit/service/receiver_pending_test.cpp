@@ -6,7 +6,6 @@
 #include <thread>
 
 namespace vesk {
-
 using ReceiverPendingTest = ReceiverTest;
 
 TEST_F(ReceiverPendingTest, PendingSpaceMessagesChangeTheListAndNothingElse) {
@@ -98,5 +97,4 @@ TEST_F(ReceiverPendingTest, ASpaceThatEntersTheListMeanwhileStopsIt) {
     EXPECT_TRUE(ServiceIsPendingSpace("/volume1"));
     ASSERT_EQ(ServiceStateInitialize(), 0); // its lock was kept
 }
-
 } // namespace vesk

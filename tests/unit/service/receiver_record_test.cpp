@@ -6,7 +6,6 @@
 #include <climits>
 
 namespace vesk {
-
 using ReceiverRecordTest = ReceiverTest;
 
 TEST_F(ReceiverRecordTest, ATypeWithoutANameStopsIt) {
@@ -80,5 +79,4 @@ TEST_F(ReceiverRecordTest, AMessageThatIsTooLongStopsIt) {
         log.Has("GetRequests() [N] : ***** Receive messaged failed: Argument list too long"));
     EXPECT_EQ(CountMessages(queueId_), 1);
 }
-
 } // namespace vesk

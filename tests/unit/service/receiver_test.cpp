@@ -6,11 +6,8 @@
 #include <sys/msg.h>
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateWorld = UsePrivateWorld();
-
 } // namespace
 
 TEST_F(ReceiverTest, RequestsAreStoredInTheOrderOfTheQueue) {
@@ -155,5 +152,4 @@ TEST_F(ReceiverDeathTest, AKeyFileWithoutANumberEndsTheProcess) {
     WriteWhole(kMessageKeyFile, "abc");
     EXPECT_EXIT(RunReceiver(), ::testing::KilledBySignal(SIGABRT), "invalid_argument");
 }
-
 } // namespace vesk

@@ -6,7 +6,6 @@
 #include <cerrno>
 
 namespace vesk {
-
 class RequestHandlersCommonTest : public HandlerTest {
 protected:
     WorkResult Handle(int type, const std::string &data = "") {
@@ -161,5 +160,4 @@ TEST_F(RequestHandlersCommonTest, AReloadWhoseReadFailsFails) {
                                   "Handle request failed",
                               }));
 }
-
 } // namespace vesk

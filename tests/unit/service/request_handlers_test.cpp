@@ -5,7 +5,6 @@
 #include <cerrno>
 
 namespace vesk {
-
 class RequestHandlersTest : public HandlerTest {
 protected:
     WorkResult Handle(int type, const std::string &data = "") {
@@ -208,5 +207,4 @@ TEST_F(RequestHandlersTest, AnUnpinIsNotInterrupted) {
     SetPending();
     EXPECT_EQ(Handle(kRequestUnpinFiles, "a#1"), WorkResult::Done);
 }
-
 } // namespace vesk

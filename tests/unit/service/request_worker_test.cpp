@@ -10,9 +10,7 @@
 #include <thread>
 
 namespace vesk {
-
 namespace {
-
 std::string Compact(const std::string &text) {
     Json::Value root;
     std::string errors;
@@ -20,7 +18,6 @@ std::string Compact(const std::string &text) {
     EXPECT_TRUE(Json::parseFromStream(Json::CharReaderBuilder(), stream, &root, &errors)) << errors;
     return root.toStyledString();
 }
-
 } // namespace
 
 class RequestWorkerTest : public HandlerTest {
@@ -262,5 +259,4 @@ TEST_F(RequestWorkerTest, ASelectionErrorEndsTheThread) {
                               }));
     EXPECT_EQ(FakeLibc::sleeps, 0);
 }
-
 } // namespace vesk

@@ -11,9 +11,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const int kEndingSignals[] = {SIGINT, SIGTERM, SIGQUIT};
 
 // Which of the ending signals have the handler (bits 0 to 2) and which are blocked (bits 3 to 5).
@@ -37,7 +35,6 @@ void RefuseThreads() {
     pthread_attr_setstacksize(&attributes, SIZE_MAX / 4 * 3 & ~size_t{0xFFFF});
     pthread_setattr_default_np(&attributes);
 }
-
 } // namespace
 
 class SignalHandlerTest : public LeakCheckedTest {};
@@ -144,5 +141,4 @@ TEST_F(SignalHandlerTest, TheLastServiceThreadEndsTheProcess) {
     EXPECT_EQ(child.AwaitEnd(), 0);
     EXPECT_EQ(child.Messages(), Messages{"one is left"});
 }
-
 } // namespace vesk

@@ -21,7 +21,6 @@
 #include <unistd.h>
 
 namespace vesk {
-
 // The whole service in a process of its own.
 class StartServiceTest : public HandlerTest {
 protected:
@@ -300,5 +299,4 @@ TEST_F(StartServiceTest, WithoutItsWorkerItDoesNotStart) {
                   "StartService() [N] : ***** Can't create thread: Cannot allocate memory",
               }));
 }
-
 } // namespace vesk

@@ -10,9 +10,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 struct Operation {
     const char *name;
     int failure;
@@ -53,7 +51,6 @@ std::string Nested(const std::string &open, const std::string &close) {
     }
     return text;
 }
-
 } // namespace
 
 class WrongDocumentsTest : public ConfigTest {
@@ -168,5 +165,4 @@ TEST_F(WrongDocumentsTest, InvalidUtf8ThrowsNothing) {
         EXPECT_NO_THROW(operation.run(path_.c_str())) << operation.name;
     }
 }
-
 } // namespace vesk

@@ -12,9 +12,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 const bool kPrivateMounts = UsePrivateMounts();
 const char kControlFile[] = "/tmp/veskcachepinfiletool.debug";
 const char kFile[] = "/volume1/photo/a.jpg";
@@ -37,7 +35,6 @@ protected:
         return FileSimulateGetMappingFailed(path);
     }
 };
-
 } // namespace
 
 TEST_F(FileSimulateGetMappingFailedTest, NothingFailsWithoutAControlFile) {
@@ -160,5 +157,4 @@ TEST_F(FileSimulateGetMappingFailedTest, ComparisonIsToldAtLevel3) {
                   "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
                   "failed failed=/other ret=0"}));
 }
-
 } // namespace vesk

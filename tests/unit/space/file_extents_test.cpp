@@ -8,9 +8,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 using Messages = std::vector<std::string>;
 
 const std::string kFile = "/volume1/photo/a.jpg";
@@ -51,7 +49,6 @@ protected:
 };
 
 using FileExtentsFaultTest = FileExtentsTest;
-
 } // namespace
 
 TEST_F(FileExtentsTest, AsksTheMountPathsDeviceForTheInodeInTheFilesFolder) {
@@ -238,5 +235,4 @@ TEST_F(FileExtentsFaultTest, SimulatedFailureFailsTheLookupThatSucceeded) {
     std::filesystem::remove("/tmp/veskcachepinfiletool.debug");
     EXPECT_EQ(Lookup(), 0);
 }
-
 } // namespace vesk

@@ -8,12 +8,9 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 using Messages = std::vector<std::string>;
 using CreateDeviceTest = LeakCheckedTest;
-
 } // namespace
 
 TEST_F(CreateDeviceTest, AsksForTheDeviceOfThePathAndGivesAnOwnedObject) {
@@ -57,5 +54,4 @@ TEST_F(CreateDeviceTest, EveryOtherResultGoesOn) {
     }
     EXPECT_EQ(log.Text(), "");
 }
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 const char kRefused[] = "(refused)";
 
 std::string Relative(const std::string &mountPath, const std::string &filePath) {
@@ -33,7 +31,6 @@ std::string TopDir(const std::string &path, size_t size = 512) {
 
 using RelativePathTest = LeakCheckedTest;
 using TopDirTest = LeakCheckedTest;
-
 } // namespace
 
 TEST_F(RelativePathTest, IsWhatStandsBehindTheMountPathAndASlash) {
@@ -155,5 +152,4 @@ TEST_F(TopDirTest, MissingArgumentsAreRefused) {
     EXPECT_EQ(log.Count("FileGetTopDir() [N] : ***** Incorrect parameter"), 3);
     EXPECT_EQ(log.Lines().size(), 3U);
 }
-
 } // namespace vesk

@@ -1,4 +1,4 @@
-#include "space/space_bitmap_path.h"
+#include "space/space.h"
 
 #include "base/malloc_text.h"
 #include "tests/support/captured_log.h"
@@ -9,9 +9,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 int copiesLeft = -1; // negative: memory never runs out
 
 class SpaceBitmapPathTest : public LeakCheckedTest {
@@ -25,7 +23,6 @@ protected:
 std::string PathBelow(const std::string &referencePath) {
     return MallocText(BitmapGetPathByReferencePath(referencePath.c_str())).get();
 }
-
 } // namespace
 
 // Takes the place of the C library's.
@@ -80,5 +77,4 @@ TEST_F(SpaceBitmapPathTest, RunningOutOfMemoryIsAnError) {
     copiesLeft = -1;
     EXPECT_EQ(log.Text(), "tool: Can't get bitmap path\n");
 }
-
 } // namespace vesk

@@ -9,9 +9,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 using Messages = std::vector<std::string>;
 
 class SpaceCacheTest : public LeakCheckedTest {
@@ -27,7 +25,6 @@ std::string Text(char *text) {
     const MallocText owner(text);
     return text == nullptr ? "(none)" : text;
 }
-
 } // namespace
 
 TEST_F(SpaceCacheTest, ConfigHoldsTheSsdPath) {
@@ -249,7 +246,6 @@ TEST_F(SpaceCacheTest, CacheThatVanishesWhileItIsAskedForIsAnErrorAndHasNoPinSup
 }
 
 namespace {
-
 SpaceCause CauseOfCachePath(const char *mountPath = "/volume1") {
     SpaceCause cause = SpaceCause::NoPinSupport;
     const bool found = Text(SpaceGetCachePathByMountPath(mountPath, &cause)) != "(none)";
@@ -263,7 +259,6 @@ SpaceCause CauseOfPinSupport(const char *mountPath = "/volume1") {
     EXPECT_EQ(supportPin, cause == SpaceCause::Found ? 1 : 0);
     return cause;
 }
-
 } // namespace
 
 TEST_F(SpaceCacheTest, LookUpsTellTheCauseOfTheStepThatDecided) {
@@ -318,5 +313,4 @@ TEST_F(SpaceCacheTest, EveryLookUpByUuidTellsItsCause) {
     EXPECT_EQ(SpaceHasCacheAndSupportPinByUUID("uuid-1", &cause), 1);
     EXPECT_EQ(cause, SpaceCause::Found);
 }
-
 } // namespace vesk

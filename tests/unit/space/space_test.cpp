@@ -8,9 +8,7 @@
 #include <gtest/gtest.h>
 
 namespace vesk {
-
 namespace {
-
 const char kNone[] = "(none)";
 
 std::string Taken(char *text) {
@@ -37,7 +35,6 @@ protected:
                                  {"/dev/space2", "/volume2", "uuid-2"}};
     }
 };
-
 } // namespace
 
 TEST_F(SpaceTest, IsFoundByUuidAndByReferencePath) {
@@ -214,5 +211,4 @@ TEST_F(SpaceTest, TakenTextHasAnOwnerAndAMissingOneAMessageAtTheCallersPlace) {
     EXPECT_EQ(owner, nullptr);
     EXPECT_EQ(log.Messages(), std::vector<std::string>{"Caller() [N] : ***** No text"});
 }
-
 } // namespace vesk

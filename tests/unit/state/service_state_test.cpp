@@ -14,9 +14,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 int Add(std::string path) {
     return ServiceAddPendingSpaceAtomic(&path[0]);
 }
@@ -29,7 +27,6 @@ int Remove(std::string path) {
 void GiveBackWhatTheAdditionKept() NOT_ANALYSED {
     ServiceUnlock();
 }
-
 } // namespace
 
 class ServiceStateTest : public LeakCheckedTest {
@@ -195,5 +192,4 @@ TEST_F(ServiceStateTest, ReadersWithoutTheLockSeeWholeLists) {
     }
     EXPECT_EQ(missed, 0);
 }
-
 } // namespace vesk

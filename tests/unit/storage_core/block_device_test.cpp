@@ -9,9 +9,7 @@
 #include <unistd.h>
 
 namespace vesk {
-
 namespace {
-
 class BlockDevice : public testing::Test {
 protected:
     static void SetUpTestSuite() { volume = new TestVolume("blockdev", kMakeExt4, kExt4Bytes); }
@@ -98,7 +96,5 @@ TEST_F(BlockDevice, ProbeTellsTypeAndUuid) {
     EXPECT_EQ(BlockDeviceProbe("/nonexistent", "UUID"), "");
     EXPECT_EQ(BlockDeviceProbe("", "UUID"), "");
 }
-
 } // namespace
-
 } // namespace vesk

@@ -13,9 +13,7 @@
 #include <vector>
 
 namespace vesk {
-
 namespace {
-
 using Listing = std::vector<std::pair<uint64_t, const char *>>;
 
 // The name that a search over these entries ends with, "(none)" where it finds no single file.
@@ -147,7 +145,5 @@ TEST(DirectoryOpenFile, FindsRealFilesByTheLow32Bits) {
     }
     FAIL() << "no two files with the same low bits";
 }
-
 } // namespace
-
 } // namespace vesk

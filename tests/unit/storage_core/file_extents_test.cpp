@@ -27,9 +27,7 @@ std::ostream &operator<<(std::ostream &out, const FileMappingEntry &entry) {
 }
 
 namespace vesk {
-
 namespace {
-
 using Entries = std::vector<FileMappingEntry>;
 
 constexpr uint64_t kBlock = 4096;
@@ -322,7 +320,5 @@ TEST_P(FileExtentsInline, HasNoPlace) {
 
 INSTANTIATE_TEST_SUITE_P(Real, FileExtentsInline, testing::Values("inline"),
                          [](const auto &test) { return std::string(test.param); });
-
 } // namespace
-
 } // namespace vesk

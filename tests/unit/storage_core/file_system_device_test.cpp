@@ -14,9 +14,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 MountEntry Mount(const std::string &type, const std::string &options) {
     MountEntry mount;
     mount.type = type;
@@ -229,7 +227,5 @@ TEST_F(FileSystem, RefusesAFileOfAnotherDevice) {
     EXPECT_EQ(own->GetMappingByInode(xfs.mountPath, file.Inode(), table), 0);
     EXPECT_EQ(table.entries.size(), 1U);
 }
-
 } // namespace
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <sys/sysmacros.h>
 
 namespace vesk {
-
 namespace {
-
 // The table that this text gives.
 std::vector<MountEntry> TableOf(const std::string &text) {
     const TestFolder folder;
@@ -102,7 +100,5 @@ TEST(MountTable, OptionValues) {
     EXPECT_EQ(MountOptionValue(entries[5], "rtdev"), "");
     EXPECT_EQ(MountOptionValue(MountEntry(), "subvol"), "");
 }
-
 } // namespace
-
 } // namespace vesk

@@ -15,9 +15,7 @@
 #include <memory>
 
 namespace vesk {
-
 namespace {
-
 // Stands for the machine's device nodes: every source in /dev exists but /dev/root, which is vda.
 std::string FakeDeviceOf(const MountEntry &mount) {
     if (mount.source == "/dev/root") {
@@ -194,7 +192,5 @@ TEST(VESKSpaceInfoEnum, NullArguments) {
     EXPECT_LT(VESKSpaceInfoEnum(1, nullptr), 0);
     VESKSpaceInfoFree(nullptr);
 }
-
 } // namespace
-
 } // namespace vesk

@@ -7,9 +7,7 @@
 #include <cstring>
 
 namespace vesk {
-
 namespace {
-
 // The UUID of the space on this device, "(null)" where there is none.
 std::string UuidOf(const std::string &devicePath) {
     VESKSpaceInfo space = {};
@@ -44,7 +42,5 @@ TEST(VESKSpaceUUIDGet, PathFieldWithoutNulStaysInBounds) {
     std::memset(space.referencePath, 'y', sizeof(space.referencePath));
     EXPECT_EQ(VESKSpaceUUIDGet(&space), nullptr);
 }
-
 } // namespace
-
 } // namespace vesk

@@ -6,11 +6,9 @@
 #include <regex>
 
 namespace vesk {
-
 using Events = std::vector<std::string>;
 
 namespace {
-
 // The messages with the time of day taken out.
 Messages WithoutTimes(const Messages &messages) {
     static const std::regex time("sec=[0-9]+ msec=[0-9]+ usec=[0-9]+");
@@ -20,7 +18,6 @@ Messages WithoutTimes(const Messages &messages) {
     }
     return result;
 }
-
 } // namespace
 
 class ReadFileTest : public WarmingTest {
@@ -120,5 +117,4 @@ TEST_F(ReadFileTest, WhatIsReadWholeIsDoneEvenOnAPendingVolume) {
     SetPending();
     EXPECT_EQ(Read(127), WorkResult::Done);
 }
-
 } // namespace vesk

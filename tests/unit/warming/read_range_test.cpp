@@ -10,7 +10,6 @@
 #include <vector>
 
 namespace vesk {
-
 using Events = std::vector<std::string>;
 
 class ReadRangeTest : public WarmingTest {
@@ -148,5 +147,4 @@ TEST_F(ReadRangeTest, ABlockRangePastTheEndFails) {
     EXPECT_EQ(ReadBits(1, 1), -1);
     EXPECT_EQ(log.Messages(), Messages{"Read block error (seek = 65536 num bytes = 65536"});
 }
-
 } // namespace vesk

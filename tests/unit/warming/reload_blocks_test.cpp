@@ -6,11 +6,9 @@
 #include <random>
 
 namespace vesk {
-
 using Events = std::vector<std::string>;
 
 namespace {
-
 struct ExpectedRead {
     uint64_t start, length; // bits
 };
@@ -68,7 +66,6 @@ std::string RandomBitmap(std::mt19937 &random, size_t size) {
     }
     return bytes;
 }
-
 } // namespace
 
 class ReloadBlocksTest : public WarmingTest {
@@ -252,5 +249,4 @@ TEST_F(ReloadBlocksTest, WithoutADeviceItFails) {
     EXPECT_EQ(ReloadPinBlocksToCache(&bitmap, "/missing/device", "/volume1"), WorkResult::Failed);
     EXPECT_EQ(log.Messages(), Messages{"Can't open file (/missing/device)"});
 }
-
 } // namespace vesk

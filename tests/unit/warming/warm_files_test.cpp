@@ -7,17 +7,14 @@
 #include <cerrno>
 
 namespace vesk {
-
 using Events = std::vector<std::string>;
 
 namespace {
-
 FileToWarm MakeFile(const std::string &path, const std::vector<FileMappingEntry> &extents) {
     FileToWarm file{path, {}};
     file.table.entries = extents;
     return file;
 }
-
 } // namespace
 
 class WarmFilesTest : public WarmingTest {
@@ -199,5 +196,4 @@ TEST_F(WarmFilesTest, AnExtentOf4GiBIsCutTo32Bits) {
               WorkResult::Done);
     EXPECT_EQ(device_->events, Events{"read 0+4096"});
 }
-
 } // namespace vesk

@@ -14,7 +14,6 @@
 #include <memory>
 
 namespace vesk {
-
 class WarmingTest : public LeakCheckedTest {
 protected:
     void SetUp() override {
@@ -39,5 +38,4 @@ protected:
                         "reads";                                                                   \
     }                                                                                              \
     static_assert(true, "a semicolon follows")
-
 } // namespace vesk
