@@ -6,13 +6,14 @@
 
 #include <atomic>
 #include <cerrno>
+#include <cstdint>
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 namespace vesk {
 namespace {
-enum class Attempt { Done, NotCreated, NotWritten, NotAllowed };
+enum class Attempt { Done, NotMade, NoRoom, Failed };
 
 bool WriteAll(int fd, const std::string &content) {
     size_t written = 0;
@@ -21,26 +22,16 @@ bool WriteAll(int fd, const std::string &content) {
         if (result < 0 && errno == EINTR) {
             continue;
         }
-        if (result <= 0) {
+        if (result < 0) {
+            return false;
+        }
+        if (result == 0) {
+            errno = ENOSPC;
             return false;
         }
         written += static_cast<size_t>(result);
     }
     return true;
-}
-
-// Errors that say "not in this folder" or "not over this file", as opposed to a full disk or a lack
-// of descriptors, after which writing in place would only destroy the old content.
-bool IsFolderRefusal(int error) {
-    return error == EACCES || error == EPERM || error == EROFS || error == EBUSY || error == EXDEV;
-}
-
-// A full disk is as unreported here as it is when the content is written.
-Attempt AttemptFromErrno() {
-    if (errno == ENOSPC || errno == EDQUOT) {
-        return Attempt::NotWritten;
-    }
-    return IsFolderRefusal(errno) ? Attempt::NotAllowed : Attempt::NotCreated;
 }
 
 // A new file in the folder under a name that nobody else uses. Negative with errno on failure.
@@ -75,9 +66,12 @@ bool CopyOwnerAndMode(int fd, const struct stat &old) {
 // Writes the temporary file, whole and durable. `old` is null where there is no file yet.
 Attempt FillTemporary(int fd, const struct stat *old, const std::string &content) {
     if (old != nullptr && !CopyOwnerAndMode(fd, *old)) {
-        return Attempt::NotAllowed;
+        return Attempt::NotMade;
     }
-    return WriteAll(fd, content) && fsync(fd) == 0 ? Attempt::Done : Attempt::NotWritten;
+    if (WriteAll(fd, content) && fsync(fd) == 0) {
+        return Attempt::Done;
+    }
+    return errno == ENOSPC || errno == EDQUOT ? Attempt::NoRoom : Attempt::Failed;
 }
 
 Attempt ReplaceByRename(const std::string &target, const struct stat *old,
@@ -88,18 +82,18 @@ Attempt ReplaceByRename(const std::string &target, const struct stat *old,
 
     const ScopedFd folder(open(folderPath.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     if (!folder.IsOpen()) {
-        return AttemptFromErrno();
+        return Attempt::NotMade;
     }
     std::string name;
     const mode_t mode = old == nullptr ? 0666 : 0600;
     const ScopedFd temporary(CreateTemporary(folder.Get(), mode, &name));
     if (!temporary.IsOpen()) {
-        return AttemptFromErrno();
+        return Attempt::NotMade;
     }
     Attempt attempt = FillTemporary(temporary.Get(), old, content);
     if (attempt == Attempt::Done &&
         renameat(folder.Get(), name.c_str(), folder.Get(), base.c_str()) < 0) {
-        attempt = AttemptFromErrno();
+        attempt = Attempt::NotMade;
     }
     if (attempt != Attempt::Done) {
         unlinkat(folder.Get(), name.c_str(), 0);
@@ -111,23 +105,68 @@ Attempt ReplaceByRename(const std::string &target, const struct stat *old,
     return Attempt::Done;
 }
 
-FileReplaceResult WriteInPlace(const char *path, const std::string &content) {
-    const int flags = O_WRONLY | O_CREAT | O_TRUNC | O_NONBLOCK | O_CLOEXEC;
-    const ScopedFd file(open(path, flags, 0666));
-    if (!file.IsOpen()) {
-        return FileReplaceResult::CannotOpen;
+// Grows the file with blanks, which mean nothing behind a document, to the size of what will be
+// written: the room for that is the file's own then. Without it the file is as it was.
+bool TakeRoom(int fd, off_t present, size_t needed) {
+    const auto missing = static_cast<int64_t>(needed) - present;
+    if (missing <= 0) {
+        return true;
     }
-    return WriteAll(file.Get(), content) ? FileReplaceResult::Done : FileReplaceResult::NotWritten;
+    if (lseek(fd, present, SEEK_SET) == present &&
+        WriteAll(fd, std::string(static_cast<size_t>(missing), ' '))) {
+        return true;
+    }
+    if (ftruncate(fd, present) < 0) {
+        // With some blanks left behind it the document is whole all the same.
+    }
+    return false;
 }
 
-// By rename, or in place where the folder does not allow that.
+bool Overwrite(int fd, const std::string &content) {
+    return lseek(fd, 0, SEEK_SET) == 0 && WriteAll(fd, content) &&
+           ftruncate(fd, static_cast<off_t>(content.size())) == 0;
+}
+
+// For what was created and could not be filled: an empty document would be a damaged one.
+void RemoveCreated(const char *path) {
+    const MallocText target(realpath(path, nullptr));
+    if (target) {
+        unlink(target.get());
+    }
+}
+
+FileReplaceResult WriteInPlace(const char *path, const std::string &content) {
+    const int flags = O_WRONLY | O_NONBLOCK | O_CLOEXEC;
+    ScopedFd file(open(path, flags));
+    const bool created = !file.IsOpen() && errno == ENOENT;
+    if (created) {
+        file = ScopedFd(open(path, flags | O_CREAT, 0666));
+    }
+    struct stat status {};
+    if (!file.IsOpen() || fstat(file.Get(), &status) < 0) {
+        return FileReplaceResult::CannotOpen;
+    }
+    if (!S_ISREG(status.st_mode)) {
+        return WriteAll(file.Get(), content) ? FileReplaceResult::Done
+                                             : FileReplaceResult::NotWritten;
+    }
+    if (TakeRoom(file.Get(), status.st_size, content.size()) && Overwrite(file.Get(), content)) {
+        return FileReplaceResult::Done;
+    }
+    if (created) {
+        RemoveCreated(path);
+    }
+    return FileReplaceResult::CannotOpen;
+}
+
+// By rename, or in place where there can be no other file.
 FileReplaceResult Replace(const char *path, const std::string &target, const struct stat *old,
                           const std::string &content) {
     switch (ReplaceByRename(target, old, content)) {
     case Attempt::Done: return FileReplaceResult::Done;
-    case Attempt::NotCreated: return FileReplaceResult::CannotOpen;
-    case Attempt::NotWritten: return FileReplaceResult::NotWritten;
-    case Attempt::NotAllowed: break;
+    case Attempt::NoRoom: return FileReplaceResult::NotWritten;
+    case Attempt::Failed: return FileReplaceResult::CannotOpen;
+    case Attempt::NotMade: break;
     }
     return WriteInPlace(path, content);
 }

@@ -2,8 +2,10 @@
 // a temporary file in the same folder is written, synced and renamed over the target. The target's
 // owner and mode are kept, and a symbolic link is followed to its target and stays a link.
 //
-// Where the folder does not allow that, or the path is not a regular file, the file is written in
-// place (opened with truncation), and a crash or a full disk can leave it cut.
+// Where there can be no other file (the folder does not allow it, or has no room for one more), or
+// the path is not a regular file, the file itself is written, a regular one only after its room is
+// known to be there: it is grown with blanks first, which change no document. A crash can then
+// leave old and new content mixed.
 //
 // Thread rule: no state but a counter of names; two callers that replace the same file at once each
 // leave a whole file, the later rename wins.
@@ -14,8 +16,8 @@
 namespace vesk {
 enum class FileReplaceResult {
     Done,
-    CannotOpen, // the file cannot be opened for writing or created; nothing changed
-    NotWritten, // it can be opened, but not all bytes were written
+    CannotOpen, // the file cannot be opened for writing, created or kept whole; nothing changed
+    NotWritten, // there is no room for the content; nothing changed but in what is no regular file
 };
 
 // Never blocks on a FIFO: a path that cannot be opened for writing at once is CannotOpen.

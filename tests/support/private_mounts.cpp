@@ -58,8 +58,9 @@ bool MakeCharacterDevice(const std::string &path, unsigned major, unsigned minor
 ScopedMount::ScopedMount(std::string target, bool mounted)
     : target_(std::move(target)), mounted_(mounted) {}
 
-ScopedMount ScopedMount::Tmpfs(const std::string &target, size_t bytes) {
-    const std::string options = "mode=0755,size=" + std::to_string(bytes);
+ScopedMount ScopedMount::Tmpfs(const std::string &target, size_t bytes, unsigned inodes) {
+    const std::string options =
+        "mode=0755,size=" + std::to_string(bytes) + ",nr_inodes=" + std::to_string(inodes);
     return {target, mount("tmpfs", target.c_str(), "tmpfs", 0, options.c_str()) == 0};
 }
 

@@ -29,8 +29,9 @@ bool MakeCharacterDevice(const std::string &path, unsigned major, unsigned minor
 // Something mounted for the length of a scope. Only in the private view.
 class ScopedMount {
 public:
-    // A tmpfs of this size (bytes), or `source` bound over `target`.
-    static ScopedMount Tmpfs(const std::string &target, size_t bytes);
+    // A tmpfs of this size (bytes) and, unless 0, of so many inodes, its root's included; or
+    // `source` bound over `target`.
+    static ScopedMount Tmpfs(const std::string &target, size_t bytes, unsigned inodes = 0);
     static ScopedMount Bind(const std::string &source, const std::string &target);
     ~ScopedMount();
     ScopedMount(const ScopedMount &) = delete;

@@ -103,6 +103,64 @@ END
 END
 }
 
+@test "on a full disk a document that was not there is not made" {
+    mount -t tmpfs -o size=64k tmpfs "$FOLDER"
+    dd if=/dev/zero of="$FOLDER/filler" bs=4k status=none 2>/dev/null || true
+    start_service
+    tool --reload-blocks --mount-path /volume1
+    wait_until waiting_is 0
+    wait_until service_rests
+    same filler "$(ls -A "$FOLDER")"
+    rm "$FOLDER/filler"
+    pin 1 /volume1/a
+    same 1 "$(config .nextRequestNum)"
+    stop_service
+}
+
+@test "without an inode for another file the document is written in place, and every request stored" {
+    mount -t tmpfs -o size=64k,nr_inodes=2 tmpfs "$FOLDER"
+    put_config '{"nextRequestNum":7}'
+    start_service
+    pin 1 /volume1/a
+    stop_service
+    same 8 "$(config .nextRequestNum)"
+    check_pinned /volume1/a
+    same "${CONF##*/}" "$(ls -A "$FOLDER")"
+}
+
+@test "without an inode and without room the document stays whole, and the refusal is told" {
+    mount -t tmpfs -o size=8k,nr_inodes=3 tmpfs "$FOLDER"
+    put_config '{"nextRequestNum":7}'
+    dd if=/dev/zero of="$FOLDER/filler" bs=4k count=1 status=none
+    # The document nearly fills its page: what comes needs another one.
+    jq -c --arg long "$(head -c 4000 /dev/zero | tr '\0' x)" '.volumes["/other"].files["1"] = $long' "$CONF" >/tmp/long
+    cat /tmp/long >"$CONF"
+    start_service
+    tool --reload-blocks --mount-path /volume1
+    wait_until waiting_is 0
+    wait_until service_rests
+    same "$(cat /tmp/long)" "$(cat "$CONF")"
+    service_said <<END
+: Can't open config file ($CONF)
+: Can't write to files
+: Can't add request to config ($CONF)
+END
+}
+
+@test "without an inode a document that was not there cannot be made, and the refusal is told" {
+    mount -t tmpfs -o size=64k,nr_inodes=1 tmpfs "$FOLDER"
+    start_service
+    tool --reload-blocks --mount-path /volume1
+    wait_until waiting_is 0
+    wait_until service_rests
+    same "" "$(ls -A "$FOLDER")"
+    service_said <<END
+: Can't open config file ($CONF)
+: Can't write to files
+: Can't add request to config ($CONF)
+END
+}
+
 @test "a folder that is missing is not made" {
     rm -rf "$FOLDER"
     start_service

@@ -1,5 +1,5 @@
 // FileReplaceContent where something goes wrong: the old content stays whole, or the file is
-// written in place where only the folder stands in the way.
+// written in place where there can be no other.
 #include "files/file_replace.h"
 
 #include "tests/support/private_mounts.h"
@@ -28,9 +28,14 @@ protected:
 } // namespace
 
 TEST_F(FileReplaceFailureTest, FailedWriteLeavesTheOldContent) {
-    for (const int error : {ENOSPC, EIO, EDQUOT, EFBIG}) {
+    for (const int error : {ENOSPC, EDQUOT}) {
         FakeLibc::Fail("write", error);
         EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::NotWritten);
+        ExpectOldWhole();
+    }
+    for (const int error : {EIO, EFBIG}) {
+        FakeLibc::Fail("write", error);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::CannotOpen);
         ExpectOldWhole();
     }
 }
@@ -51,7 +56,8 @@ TEST_F(FileReplaceFailureTest, WriteThatGivesNothingLeavesTheOldContent) {
 TEST_F(FileReplaceFailureTest, FailedSyncLeavesTheOldContent) {
     for (const int error : {EIO, ENOSPC}) {
         FakeLibc::Fail("fsync", error);
-        EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::NotWritten);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), fresh),
+                  error == EIO ? FileReplaceResult::CannotOpen : FileReplaceResult::NotWritten);
         ExpectOldWhole();
     }
 }
@@ -62,17 +68,8 @@ TEST_F(FileReplaceFailureTest, FolderThatCannotBeSyncedIsLeftToItsOwnWays) {
     EXPECT_EQ(ReadWhole(path), fresh);
 }
 
-TEST_F(FileReplaceFailureTest, FailedRenameLeavesTheOldContent) {
-    for (const int error : {ENOSPC, EIO, ENOMEM}) {
-        FakeLibc::Fail("rename", error);
-        EXPECT_EQ(FileReplaceContent(path.c_str(), fresh),
-                  error == ENOSPC ? FileReplaceResult::NotWritten : FileReplaceResult::CannotOpen);
-        ExpectOldWhole();
-    }
-}
-
-TEST_F(FileReplaceFailureTest, RenameThatIsNotAllowedIsFollowedByWritingInPlace) {
-    for (const int error : {EACCES, EPERM, EROFS, EBUSY, EXDEV}) {
+TEST_F(FileReplaceFailureTest, RenameThatFailsIsFollowedByWritingInPlace) {
+    for (const int error : {EACCES, EPERM, EROFS, EBUSY, EXDEV, ENOSPC, EDQUOT, EIO, ENOMEM}) {
         WriteWhole(path, old);
         const ino_t before = Status(path).st_ino;
         FakeLibc::Fail("rename", error);
@@ -94,10 +91,33 @@ TEST_F(FileReplaceFailureTest, OwnerThatCannotBeGivenIsFollowedByWritingInPlace)
 
 TEST_F(FileReplaceFailureTest, FailedWriteInPlaceIsReported) {
     FakeLibc::Fail("rename", EACCES);
-    FakeLibc::Fail("write", ENOSPC, 2);
-    EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::NotWritten);
-    EXPECT_EQ(ReadWhole(path), ""); // cut: nothing else could be done
-    EXPECT_EQ(Names(), onlyTheFile);
+    FakeLibc::Fail("write", EIO, 2);
+    EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::CannotOpen);
+    ExpectOldWhole();
+}
+
+TEST_F(FileReplaceFailureTest, LongerContentIsNotWrittenInPlaceWithoutItsRoom) {
+    const std::string longer(10000, 'x');
+    const ino_t before = Status(path).st_ino;
+    for (const int nth : {2, 3}) { // of the blanks, none is written, or some
+        FakeLibc::Fail("rename", EACCES);
+        FakeLibc::Limit("write", 100, 2);
+        FakeLibc::Fail("write", ENOSPC, nth);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), longer), FileReplaceResult::CannotOpen);
+        ExpectOldWhole();
+    }
+    FakeLibc::Fail("rename", EACCES);
+    EXPECT_EQ(FileReplaceContent(path.c_str(), longer), FileReplaceResult::Done);
+    EXPECT_EQ(ReadWhole(path), longer);
+    EXPECT_EQ(Status(path).st_ino, before);
+}
+
+TEST_F(FileReplaceFailureTest, CrashBeforeTheContentIsWrittenInPlaceLeavesBlanksBehindTheOld) {
+    const std::string longer(old.size() + 5, 'x');
+    FakeLibc::Fail("rename", EACCES);
+    FakeLibc::Fail("write", EIO, 3);
+    EXPECT_EQ(FileReplaceContent(path.c_str(), longer), FileReplaceResult::CannotOpen);
+    EXPECT_EQ(ReadWhole(path), old + "     ");
 }
 
 TEST_F(FileReplaceFailureTest, NewFileThatCannotBeWrittenIsNotLeftBehind) {
@@ -106,13 +126,14 @@ TEST_F(FileReplaceFailureTest, NewFileThatCannotBeWrittenIsNotLeftBehind) {
     EXPECT_EQ(FileReplaceContent(created.c_str(), fresh), FileReplaceResult::NotWritten);
     EXPECT_EQ(Names(), onlyTheFile);
     FakeLibc::Fail("fsync", EIO);
-    EXPECT_EQ(FileReplaceContent(created.c_str(), fresh), FileReplaceResult::NotWritten);
+    EXPECT_EQ(FileReplaceContent(created.c_str(), fresh), FileReplaceResult::CannotOpen);
     EXPECT_EQ(Names(), onlyTheFile);
 }
 
 TEST_F(FileReplaceFailureTest, NewFileThatCannotBeRenamedIsWrittenInPlaceOrNotAtAll) {
     const std::string created = folder.Path("new");
     FakeLibc::Fail("rename", EIO);
+    FakeLibc::Fail("write", ENOSPC, 2);
     EXPECT_EQ(FileReplaceContent(created.c_str(), fresh), FileReplaceResult::CannotOpen);
     EXPECT_EQ(Names(), onlyTheFile);
     FakeLibc::Fail("rename", EPERM);
@@ -121,13 +142,13 @@ TEST_F(FileReplaceFailureTest, NewFileThatCannotBeRenamedIsWrittenInPlaceOrNotAt
     EXPECT_EQ(Names(), (std::vector<std::string>{"file", "new"}));
 }
 
-TEST_F(FileReplaceFailureTest, GivesUpAfterAHundredTemporaryNamesThatAreTaken) {
-    TakeTemporaryNames(200);
-    EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::CannotOpen);
-    EXPECT_EQ(ReadWhole(path), old);
-    EXPECT_EQ(FileReplaceContent(folder.Path("new").c_str(), fresh), FileReplaceResult::CannotOpen);
-    EXPECT_EQ(Names().size(), 201U);
+TEST_F(FileReplaceFailureTest, AHundredTemporaryNamesThatAreTakenAreFollowedByWritingInPlace) {
+    TakeTemporaryNames(100);
+    const ino_t before = Status(path).st_ino;
     EXPECT_EQ(FileReplaceContent(path.c_str(), fresh), FileReplaceResult::Done);
+    EXPECT_EQ(ReadWhole(path), fresh);
+    EXPECT_EQ(Status(path).st_ino, before);
+    EXPECT_EQ(Names().size(), 101U);
 }
 
 TEST_F(FileReplaceFailureTest, FileThatHasNoNameAnyMoreIsWrittenInPlace) {
@@ -254,5 +275,43 @@ TEST_F(FileReplaceFailureTest, FullDiskLeavesTheOldContent) {
     // With nothing left over there is room for what fits.
     EXPECT_EQ(FileReplaceContent(disk.Path("file").c_str(), fresh), FileReplaceResult::Done);
     EXPECT_EQ(ReadWhole(disk.Path("file")), fresh);
+}
+
+TEST_F(FileReplaceFailureTest, DiskWithoutInodesKeepsOneFileAndMakesNone) {
+    SKIP_WITHOUT_PRIVATE_MOUNTS();
+    TempDir disk;
+    const ScopedMount tiny = ScopedMount::Tmpfs(disk.Path(), 65536, 2); // its root and one file
+    ASSERT_TRUE(tiny.IsMounted());
+    const std::string only = disk.Path("file");
+    const std::string link = folder.Path("link");
+    ASSERT_EQ(symlink(disk.Path("new").c_str(), link.c_str()), 0);
+    WriteWhole(only, old);
+    const ino_t before = Status(only).st_ino;
+    for (const std::string &content : {fresh, std::string(50000, 'x'), std::string()}) {
+        EXPECT_EQ(FileReplaceContent(only.c_str(), content), FileReplaceResult::Done);
+        EXPECT_EQ(ReadWhole(only), content);
+        EXPECT_EQ(Status(only).st_ino, before);
+    }
+    WriteWhole(only, old);
+    EXPECT_EQ(FileReplaceContent(only.c_str(), std::string(100000, 'x')),
+              FileReplaceResult::CannotOpen);
+    EXPECT_EQ(ReadWhole(only), old);
+    EXPECT_EQ(FileReplaceContent(disk.Path("new").c_str(), fresh), FileReplaceResult::CannotOpen);
+    EXPECT_EQ(FileReplaceContent(link.c_str(), fresh), FileReplaceResult::CannotOpen);
+    EXPECT_FALSE(std::filesystem::exists(disk.Path("new")));
+}
+
+TEST_F(FileReplaceFailureTest, TargetOfALinkThatCannotBeFilledIsNotLeftBehind) {
+    SKIP_WITHOUT_PRIVATE_MOUNTS();
+    TempDir disk;
+    const ScopedMount tiny = ScopedMount::Tmpfs(disk.Path(), 65536);
+    ASSERT_TRUE(tiny.IsMounted());
+    const std::string link = folder.Path("link");
+    ASSERT_EQ(symlink(disk.Path("new").c_str(), link.c_str()), 0);
+    EXPECT_EQ(FileReplaceContent(link.c_str(), std::string(100000, 'x')),
+              FileReplaceResult::CannotOpen);
+    EXPECT_FALSE(std::filesystem::exists(disk.Path("new")));
+    EXPECT_EQ(FileReplaceContent(link.c_str(), fresh), FileReplaceResult::Done);
+    EXPECT_EQ(ReadWhole(disk.Path("new")), fresh);
 }
 } // namespace vesk
