@@ -185,6 +185,19 @@ int (*const kHandlers[])(const ToolParameters &asked) = {
 };
 static_assert(std::size(kHandlers) == kCommandGetBitmapSizeByte + 1, "a handler for every command");
 
+int OutOfMemory() {
+    return Fail("Out of memory");
+}
+
+int RunCommand(const ToolParameters &asked) try {
+    const auto command = static_cast<size_t>(asked.command);
+    return command < std::size(kHandlers) ? kHandlers[command](asked) : kSuccess;
+} catch (const std::bad_alloc &) {
+    return OutOfMemory();
+} catch (const Json::RuntimeError &) { // so the JSON library says that it gets no memory
+    return OutOfMemory();
+}
+
 // Static: the service's worker reads it after the first thread may have ended.
 ToolParameters parameters;
 } // namespace
@@ -202,11 +215,9 @@ int main(int argc, char *argv[]) try {
         LogLevel = 2;
     }
     LogTraceEntry();
-    const int exitValue = kHandlers[parameters.command](parameters);
+    const int exitValue = RunCommand(parameters);
     LogTraceExit();
     return exitValue;
 } catch (const std::bad_alloc &) {
-    return Fail("Out of memory");
-} catch (const Json::Exception &) { // which the JSON library throws for want of memory, too
-    return Fail("Out of memory");
+    return OutOfMemory();
 }

@@ -20,7 +20,7 @@ PinCheck CheckFileIsPin(const char *configPath, const char *filePath) {
     }
     LogVerbose("Mount path = %s", mountPath);
     Json::Value root;
-    if (ConfigReadDocument(configPath, &root) < 0) {
+    if (ConfigReadDocument(configPath, &root, ConfigHasVolumesShape) < 0) {
         LogError("Can't read data from config file (%s)", configPath);
         return PinCheck::Error;
     }

@@ -30,27 +30,30 @@ template <typename Test> bool AllMembers(const Json::Value &container, Test test
 } // namespace
 
 bool ConfigHasShape(const Json::Value &root) {
-    if (!IsNullOrObject(root)) {
+    if (!ConfigHasVolumesShape(root)) {
         return false;
     }
     const Json::Value &queue = root["requestQueue"];
     const Json::Value &requests = root["requests"];
-    const Json::Value &volumes = root["volumes"];
     return root["nextRequestNum"].isConvertibleTo(Json::intValue) &&
            (queue.isNull() || queue.isArray()) && AllMembers(queue, IsText) &&
-           IsNullOrObject(requests) && AllMembers(requests, IsRequest) && IsNullOrObject(volumes) &&
-           AllMembers(volumes, IsVolume);
+           IsNullOrObject(requests) && AllMembers(requests, IsRequest);
 }
 
-int ConfigReadDocument(const char *configPath, Json::Value *root) {
+bool ConfigHasVolumesShape(const Json::Value &root) {
+    return IsNullOrObject(root) && IsNullOrObject(root["volumes"]) &&
+           AllMembers(root["volumes"], IsVolume);
+}
+
+int ConfigReadDocument(const char *configPath, Json::Value *root, ConfigShape hasShape) {
     if (ReadFileToJson(configPath, root) < 0) {
         return -1;
     }
-    return ConfigHasShape(*root) ? 0 : -1;
+    return hasShape(*root) ? 0 : -1;
 }
 
 int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChange &change,
-                 const LogPlace &place) {
+                 const LogPlace &place, ConfigShape hasShape) {
     const bool creates = missing == MissingConfig::Created;
     // A file that cannot be looked up is not taken for a missing one: writing a new document over
     // it would lose every record.
@@ -64,7 +67,7 @@ int ConfigUpdate(const char *configPath, MissingConfig missing, const ConfigChan
         return -1;
     }
     Json::Value root;
-    if (!absent && ConfigReadDocument(configPath, &root) < 0) {
+    if (!absent && ConfigReadDocument(configPath, &root, hasShape) < 0) {
         LogErrorAt(place, "Can't read data from config file (%s)", configPath);
         return -1;
     }

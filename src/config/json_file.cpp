@@ -3,7 +3,7 @@
 #include "base/log.h"
 #include "files/file_replace.h"
 
-#include <exception>
+#include <cstring>
 #include <fstream>
 #include <iterator>
 #include <json/reader.h>
@@ -15,29 +15,34 @@
 
 namespace vesk {
 namespace {
-// jsoncpp throws on a document nested deeper than it is willing to follow. What only a lenient
-// reader takes for JSON counts as damaged: other readers of the file would refuse it.
-bool ParseStream(std::istream &stream, Json::Value *root) {
-    Json::CharReaderBuilder builder;
-    builder["collectComments"] = true;
-    builder["allowTrailingCommas"] = false;
-    builder["skipBom"] = false;
-    try {
-        // Read by the iterator and not by the library, whose stream hides that memory has run out.
-        const std::string text((std::istreambuf_iterator<char>(stream)),
-                               std::istreambuf_iterator<char>());
-        const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-        return reader->parse(text.data(), text.data() + text.size(), root, nullptr);
-    } catch (const std::bad_alloc &) {
-        throw;
-    } catch (const std::exception &) {
-        return false;
+// The library's first reader and not its later one, which also takes what other readers of the file
+// would refuse ("+3").
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
+bool ParseText(const std::string &text, Json::Value *root) {
+    return Json::Reader().parse(text, *root, true);
+}
+#pragma GCC diagnostic pop
+
+// The library throws one and the same for want of memory and on a document nested deeper than it is
+// willing to follow, which counts as damaged.
+bool ParseStream(std::istream &stream, Json::Value *root) try {
+    // Read by the iterator and not by the library, whose stream hides that memory has run out.
+    const std::string text((std::istreambuf_iterator<char>(stream)),
+                           std::istreambuf_iterator<char>());
+    return ParseText(text, root);
+} catch (const Json::RuntimeError &error) {
+    if (strstr(error.what(), "allocate") != nullptr) {
+        throw std::bad_alloc();
     }
+    return false;
+} catch (const std::ios_base::failure &) {
+    return false; // what opens can be unreadable: a folder, a broken disk
 }
 
 // What toStyledString gives. That one writes to a stream which swallows a lack of memory, and would
 // give a document that is cut.
-std::string StyledText(const Json::Value &root) {
+std::string StyledText(const Json::Value &root) try {
     std::ostringstream stream;
     stream.exceptions(std::ios::badbit | std::ios::failbit);
     if (root.hasComment(Json::commentBefore)) {
@@ -47,6 +52,8 @@ std::string StyledText(const Json::Value &root) {
     writer->write(root, &stream);
     stream << '\n';
     return stream.str();
+} catch (const std::ios_base::failure &) {
+    throw std::bad_alloc();
 }
 
 // Opening a FIFO waits for a writer, and the service lock would be held meanwhile.

@@ -8,8 +8,8 @@
 
 namespace vesk {
 // 0, or -1 after an error message when the file cannot be opened or is not JSON (an empty one is
-// not);
-// `*root` may hold a part of the document then. Never throws.
+// not); `*root` may hold a part of the document then. JSON is what jsoncpp's Json::Reader takes,
+// comments and any text behind the document included. Throws std::bad_alloc for want of memory.
 int ReadFileToJson(const std::string &path, Json::Value *root);
 
 // Replaces the file's content by the document in styled form. 0, or -1 after an error message when

@@ -87,7 +87,8 @@ int ConfigRemovePinFileVolume(const char *configPath, const char *mountPath) {
         }
         return outcome == kVolumeRemoved ? nullptr : "";
     };
-    const int result = ConfigUpdate(configPath, MissingConfig::Skipped, remove, place);
+    const int result =
+        ConfigUpdate(configPath, MissingConfig::Skipped, remove, place, ConfigHasVolumesShape);
     if (result < 0 || outcome == kVolumeAbsent) {
         return result;
     }

@@ -39,13 +39,14 @@ RequestRecord Record(uint8_t choice) {
 }
 
 // The file after an operation, compared with the one before.
-void Check(const std::string &path, const std::string &before, bool succeeded, const char *what) {
+void Check(const std::string &path, const std::string &before, bool succeeded, const char *what,
+           ConfigShape hasShape = ConfigHasShape) {
     if (!succeeded) {
         FuzzExpect(FuzzRead(path) == before, what);
         return;
     }
     Json::Value root;
-    FuzzExpect(ConfigReadDocument(path.c_str(), &root) == 0, what);
+    FuzzExpect(ConfigReadDocument(path.c_str(), &root, hasShape) == 0, what);
 }
 
 bool HasRequests(const std::string &path) {
@@ -106,7 +107,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     if ((operations & 32) != 0) {
         const std::string before = FuzzRead(path);
         Check(path, before, ConfigRemovePinFileVolume(path.c_str(), record.mountPath) == 0,
-              "removal of a volume");
+              "removal of a volume", ConfigHasVolumesShape);
     }
     return 0;
 }

@@ -73,6 +73,17 @@ TEST_F(CheckFilePinTest, AVolumeWithoutRecordsIsNotPinnedEvenWithoutTheFile) {
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
+TEST_F(CheckFilePinTest, OnlyTheVolumesAreLookedAt) {
+    CapturedLog log;
+    for (const char *rest :
+         {R"("nextRequestNum" : [])", R"("requestQueue" : 5)", R"("requests" : ["x"])"}) {
+        WriteWhole(config_, R"({"volumes" : {")" + topDir_ + R"(" : {"files" : {")" + Inode() +
+                                R"(" : "file"}}}, )" + rest + "}");
+        EXPECT_EQ(Check(), PinCheck::Pinned) << rest;
+    }
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
 TEST_F(CheckFilePinTest, WithoutAConfigurationItIsAnError) {
     CapturedLog log;
     EXPECT_EQ(CheckFileIsPin(config_.c_str(), "no top directory"), PinCheck::Error);

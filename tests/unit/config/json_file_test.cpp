@@ -84,7 +84,7 @@ TEST_F(JsonFileTest, ADocumentNested5000DeepFails) {
 TEST_F(JsonFileTest, WhatIsNotJsonFails) {
     const char *const texts[] = {"{\"a\":1,}", "[1,]",        "\xEF\xBB\xBF{}", "{'a':1}",
                                  "{\"a\" 1}",  "{\"a\":nan}", "{\"a\":1e999}",  "{1:2}",
-                                 "\xff\xfe",   " \n\t "};
+                                 "\xff\xfe",   " \n\t ",      "{\"a\":+3}",     "+3"};
     for (const char *text : texts) {
         Store(text);
         CapturedLog log;
@@ -112,6 +112,17 @@ TEST_F(JsonFileTest, CommentsAndAnyLayoutAreRead) {
     ASSERT_EQ(ReadFileToJson(path_, &root), 0);
     EXPECT_EQ(root["nextRequestNum"].asInt(), 7);
     EXPECT_TRUE(root["requestQueue"].isArray());
+}
+
+TEST_F(JsonFileTest, TextBehindTheDocumentIsLeftAlone) {
+    for (const char *text : {"{\"a\":1} {", "{\"a\":1}    ", "{\"a\":1}\n]]", "{\"a\":1}xyz"}) {
+        Store(text);
+        CapturedLog log;
+        Json::Value root;
+        EXPECT_EQ(ReadFileToJson(path_, &root), 0) << text;
+        EXPECT_EQ(root, ParseDocument("{\"a\" : 1}")) << text;
+        EXPECT_EQ(log.Messages(), Messages{});
+    }
 }
 
 TEST_F(JsonFileTest, WritingCreatesAMissingFile) {

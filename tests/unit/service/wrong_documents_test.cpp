@@ -16,6 +16,7 @@ struct Operation {
     int failure;
     const char *message; // %: the path
     std::function<int(const char *)> run;
+    bool onlyVolumes = false; // that is what it looks at
 };
 
 const std::vector<Operation> &Operations() {
@@ -29,7 +30,7 @@ const std::vector<Operation> &Operations() {
         {"finish", -1, "Can't read data from config file (%)",
          [](const char *path) { return ConfigUpdatedByFinishedRequest(path, &pin, "1"); }},
         {"remove volume", -1, "Can't read data from config file (%)",
-         [](const char *path) { return ConfigRemovePinFileVolume(path, "/volume1"); }},
+         [](const char *path) { return ConfigRemovePinFileVolume(path, "/volume1"); }, true},
         {"select", static_cast<int>(NextRequest::Error), "Get request from config file (%) error",
          [](const char *path) {
              RequestRecord record{};
@@ -85,6 +86,20 @@ TEST_F(WrongDocumentsTest, WrongTypesAreRefused) {
         "\"text\"",
         "7",
         "true",
+        R"({"volumes" : []})",
+        R"({"volumes" : ["/volume1"]})",
+        R"({"volumes" : {"/volume1" : "a"}})",
+        R"({"volumes" : {"/volume1" : {"files" : []}}})",
+        R"({"volumes" : {"/volume1" : {"files" : ["1"]}}})",
+    };
+    for (const char *text : texts) {
+        Store(text);
+        ExpectRefusedByAll();
+    }
+}
+
+TEST_F(WrongDocumentsTest, WrongTypesBesideTheVolumesAreRefusedByWhatLooksAtThem) {
+    const char *const texts[] = {
         R"({"requestQueue" : {"0" : "1"}})",
         R"({"requestQueue" : "1"})",
         R"({"requestQueue" : [["1"]]})",
@@ -93,11 +108,6 @@ TEST_F(WrongDocumentsTest, WrongTypesAreRefused) {
         R"({"requestQueue" : ["1"], "requests" : {"1" : {"type" : {"a" : 1}}}})",
         R"({"requestQueue" : ["1"], "requests" : {"1" : {"type" : "ack", "mountPath" : [1]}}})",
         R"({"requestQueue" : ["1"], "requests" : {"1" : {"type" : "ack", "data" : {"a" : 1}}}})",
-        R"({"volumes" : []})",
-        R"({"volumes" : ["/volume1"]})",
-        R"({"volumes" : {"/volume1" : "a"}})",
-        R"({"volumes" : {"/volume1" : {"files" : []}}})",
-        R"({"volumes" : {"/volume1" : {"files" : ["1"]}}})",
         R"({"nextRequestNum" : "3"})",
         R"({"nextRequestNum" : 2147483648})",
         R"({"nextRequestNum" : 1e30})",
@@ -106,7 +116,15 @@ TEST_F(WrongDocumentsTest, WrongTypesAreRefused) {
     };
     for (const char *text : texts) {
         Store(text);
-        ExpectRefusedByAll();
+        for (const Operation &operation : Operations()) {
+            if (operation.onlyVolumes) {
+                CapturedLog log;
+                EXPECT_EQ(operation.run(path_.c_str()), 0) << text;
+                EXPECT_EQ(log.Messages(), Messages{});
+            } else {
+                ExpectRefused(operation);
+            }
+        }
     }
 }
 
