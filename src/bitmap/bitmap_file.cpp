@@ -21,6 +21,11 @@ bool IsSpecial(int fd) {
     struct stat status {};
     return fstat(fd, &status) < 0 || !(S_ISREG(status.st_mode) || S_ISDIR(status.st_mode));
 }
+
+bool IsShorterThan(int fd, uint64_t bytes) {
+    struct stat status {};
+    return fstat(fd, &status) < 0 || static_cast<uint64_t>(status.st_size) < bytes;
+}
 } // namespace
 
 int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
@@ -29,7 +34,7 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
         return -1;
     }
     uint64_t fileBytes = 0;
-    if (FileGetSizeByte(path, &fileBytes) < 0) {
+    if (FileGetSizeByte(path, &fileBytes, LastLink::Itself) < 0) {
         LogError("Get the size of file (%s) error", path);
         return -1;
     }
@@ -42,18 +47,21 @@ int BitmapInitByFile(const char *path, PinBitmap *bitmap) {
     // The file may have grown since its size was compared with the bitmap's.
     auto remaining = static_cast<int64_t>(std::min<uint64_t>(fileBytes, bitmap->size));
     int64_t offset = 0;
-    while (remaining >= 1) {
+    // Bytes that are not there yet are asked for again, but not those of a file that was cut or
+    // exchanged since its size was taken.
+    bool failed = IsShorterThan(file.Get(), fileBytes);
+    while (remaining >= 1 && !failed) {
         const int64_t bytes = std::min(remaining, kChunkBytes);
         LogDebug("Next read start = %d bytes=%d", static_cast<int>(offset),
                  static_cast<int>(bytes));
         const ssize_t result = read(file.Get(), bitmap->data + offset, static_cast<size_t>(bytes));
-        if (result == -1) {
-            LogError("Read bitmap file (%s) error\n", path);
-            return -1;
-        }
-        // No end-of-file test: bytes that are not there yet are asked for again.
+        failed = result == -1 || (result == 0 && IsShorterThan(file.Get(), fileBytes));
         offset += result;
         remaining -= result;
+    }
+    if (failed) {
+        LogError("Read bitmap file (%s) error\n", path);
+        return -1;
     }
     LogVerbose("Read to memory finish");
     return 0;

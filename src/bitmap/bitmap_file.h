@@ -6,8 +6,8 @@
 
 namespace vesk {
 // Reads the file into the start of the bitmap's bytes; a file longer than the bitmap fills it
-// whole. A file that shrinks while it is read is read again and again until its bytes are there. 0,
-// or -1 after an error message (also for null arguments).
+// whole. 0, or -1 after an error message (also for null arguments, and when the file is shorter
+// than it was when asked for its size).
 int BitmapInitByFile(const char *path, PinBitmap *bitmap);
 
 // Writes all bytes from offset 0; creates the file (0644) if missing and keeps the tail of a longer

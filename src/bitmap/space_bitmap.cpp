@@ -58,12 +58,12 @@ int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool 
     LogVerbose("Allocate %zu bytes bitmap", static_cast<size_t>(memoryBytes));
 
     // A file that cannot be looked up is not taken for a missing one: it holds the volume's pins.
-    if (PathIsMissing(bitmapPath.get())) {
+    if (PathIsMissing(bitmapPath.get(), LastLink::Itself)) {
         LogVerbose("Bitmap files (%s) doesn't exist", bitmapPath.get());
         return 0;
     }
     uint64_t fileBytes = 0;
-    if (FileGetSizeByte(bitmapPath.get(), &fileBytes) < 0) {
+    if (FileGetSizeByte(bitmapPath.get(), &fileBytes, LastLink::Itself) < 0) {
         LogError("Get the size of file (%s) error", bitmapPath.get());
         ReleaseBitmap(bitmap);
         return -1;

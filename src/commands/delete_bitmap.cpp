@@ -14,7 +14,7 @@ int DeleteBitmap(const char *mountPath) {
         LogError("Can't get bitmap path");
         return -1;
     }
-    if (!PathExists(bitmapPath.get())) {
+    if (!PathExists(bitmapPath.get(), LastLink::Itself)) {
         LogVerbose("bitmap (%s) doesn't exist", bitmapPath.get());
         return 0;
     }

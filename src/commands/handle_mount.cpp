@@ -24,7 +24,8 @@ int HandleSpaceMount(const char *configPath, const char *mountPath) {
         LogError("Can't get volume (%s)'s bitmap path", mountPath);
         return -1;
     }
-    if (!PathExists(bitmapPath.get()) || !PathIsFile(bitmapPath.get())) {
+    if (!PathExists(bitmapPath.get(), LastLink::Itself) ||
+        !PathIsFile(bitmapPath.get(), LastLink::Itself)) {
         return 0;
     }
     if (unlink(bitmapPath.get()) < 0) {

@@ -38,7 +38,7 @@ int SendBitmap(const char *mountPath) {
         return -1;
     }
     const char *bitmapPath = volume.bitmapPath.get();
-    if (!PathExists(bitmapPath)) {
+    if (!PathExists(bitmapPath, LastLink::Itself)) {
         LogNotice("Bitmap file (%s) doesn't exist. No need to update to driver", bitmapPath);
         return 0;
     }

@@ -10,19 +10,23 @@ namespace {
 const mode_t kFileBit = 0x8000;
 const mode_t kDirectoryBit = 0x4000;
 
-int HasModeBit(const char *path, mode_t bit, const LogPlace &place) {
+int StatPath(const char *path, LastLink link, struct stat *status) {
+    return link == LastLink::Followed ? stat(path, status) : lstat(path, status);
+}
+
+int HasModeBit(const char *path, LastLink link, mode_t bit, const LogPlace &place) {
     struct stat status {};
-    if (stat(path, &status) < 0) {
+    if (StatPath(path, link, &status) < 0) {
         LogErrorAt(place, "Path (%s) doesn't exist", path);
         return 0;
     }
-    return (status.st_mode & bit) != 0 ? 1 : 0;
+    return (status.st_mode & bit) != 0 && !S_ISLNK(status.st_mode) ? 1 : 0;
 }
 } // namespace
 
-int FileGetSizeByte(const char *path, uint64_t *sizeBytes) {
+int FileGetSizeByte(const char *path, uint64_t *sizeBytes, LastLink link) {
     struct stat status {};
-    if (stat(path, &status) < 0) {
+    if (StatPath(path, link, &status) < 0) {
         LogError("Can't get file (%s) stat result", path);
         return -1;
     }
@@ -40,24 +44,24 @@ int FileGetInodeNumber(const char *path, uint32_t *inode) {
     return 0;
 }
 
-int PathExists(const char *path) {
+int PathExists(const char *path, LastLink link) {
     struct stat status {};
-    return stat(path, &status) == 0 ? 1 : 0;
+    return StatPath(path, link, &status) == 0 ? 1 : 0;
 }
 
-int PathIsMissing(const char *path) {
+int PathIsMissing(const char *path, LastLink link) {
     struct stat status {};
-    return stat(path, &status) < 0 &&
+    return StatPath(path, link, &status) < 0 &&
                    (errno == ENOENT || errno == ENOTDIR || errno == ELOOP || errno == ENAMETOOLONG)
                ? 1
                : 0;
 }
 
-int PathIsFile(const char *path) {
-    return HasModeBit(path, kFileBit, LogHere());
+int PathIsFile(const char *path, LastLink link) {
+    return HasModeBit(path, link, kFileBit, LogHere());
 }
 
 int PathIsDir(const char *path) {
-    return HasModeBit(path, kDirectoryBit, LogHere());
+    return HasModeBit(path, LastLink::Followed, kDirectoryBit, LogHere());
 }
 } // namespace vesk

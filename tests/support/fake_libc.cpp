@@ -5,22 +5,28 @@
 #include <cerrno>
 #include <cstdarg>
 #include <cstddef>
+#include <ctime>
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <map>
 #include <mutex>
 #include <pthread.h>
+#include <sys/ioctl.h>
+#include <sys/msg.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/time.h>
 #include <sys/types.h>
+#include <unistd.h>
 
 namespace vesk {
 int FakeLibc::sleeps = 0;
 int FakeLibc::alarmFactor = 1;
-int FakeLibc::pauseFactor = 1;
+int FakeLibc::clockFactor = 1;
 int FakeLibc::syncs = 0;
 std::function<void()> FakeLibc::onSleep;
 std::function<void()> FakeLibc::onSync;
+std::function<void()> FakeLibc::onMsgctl;
 std::function<int(unsigned long, void *)> FakeLibc::onIoctl;
 std::function<void(struct stat *)> FakeLibc::onStat;
 std::function<void(int, long long, size_t)> FakeLibc::onRead;
@@ -86,10 +92,11 @@ template <typename Function> Function Real(const char *name) {
 void FakeLibc::Reset() {
     sleeps = 0;
     alarmFactor = 1;
-    pauseFactor = 1;
+    clockFactor = 1;
     syncs = 0;
     onSleep = nullptr;
     onSync = nullptr;
+    onMsgctl = nullptr;
     onIoctl = nullptr;
     onStat = nullptr;
     onRead = nullptr;
@@ -125,18 +132,49 @@ int FakeLibc::Calls(const std::string &function) {
     return Orders()[function].calls;
 }
 
-// Fails the call when ordered to, otherwise calls the real function.
-#define PASS_OR_FAIL(failure, name, type, ...)                                                     \
+// Fails the call when ordered to, otherwise calls the real function, the library's `symbol`.
+#define PASS_OR_FAIL_AS(failure, name, symbol, type, ...)                                          \
     const int error = FailureOf(#name);                                                            \
     if (error != 0) {                                                                              \
         errno = error;                                                                             \
         return failure;                                                                            \
     }                                                                                              \
-    static const auto real = Real<type>(#name);                                                    \
+    static const auto real = Real<type>(symbol);                                                   \
     return real(__VA_ARGS__)
+#define PASS_OR_FAIL(failure, name, type, ...)                                                     \
+    PASS_OR_FAIL_AS(failure, name, #name, type, __VA_ARGS__)
+
+// 64-bit times on a 32-bit platform have functions of their own, under which the headers also
+// define the ones below.
+#ifdef __USE_TIME_BITS64
+#define TIME_SYMBOL(usual, wide) wide
+#else
+#define TIME_SYMBOL(usual, wide) usual
+#endif
+
+// CLOCK_MONOTONIC as it runs while it is slowed down.
+void SlowDown(timespec *now) {
+    static const timespec begin = *now;
+    const long long passed = (now->tv_sec - begin.tv_sec) * 1000000000LL + now->tv_nsec;
+    const long long shown = begin.tv_nsec + (passed - begin.tv_nsec) / FakeLibc::clockFactor;
+    now->tv_sec = begin.tv_sec + static_cast<time_t>(shown / 1000000000);
+    now->tv_nsec = static_cast<long>(shown % 1000000000);
+}
+
+int LookUp(const char *path, struct stat *status, int flags) {
+    const int error = FailureOf("stat");
+    if (error != 0) {
+        errno = error;
+        return -1;
+    }
+    const int result = fstatat(AT_FDCWD, path, status, flags);
+    if (result == 0 && FakeLibc::onStat) {
+        FakeLibc::onStat(status);
+    }
+    return result;
+}
 
 using SignalAction = void (*)(int);
-struct msqid_ds;
 } // namespace vesk
 
 using namespace vesk;
@@ -151,14 +189,17 @@ unsigned sleep(unsigned /*seconds*/) {
     return 0;
 }
 
-int usleep(useconds_t microseconds) {
-    static const auto real = Real<int (*)(useconds_t)>("usleep");
-    return real(microseconds * static_cast<useconds_t>(FakeLibc::pauseFactor));
+int clock_gettime(clockid_t clock, timespec *now) noexcept {
+    const long result = syscall(TIME_SYMBOL(SYS_clock_gettime, SYS_clock_gettime64), clock, now);
+    if (result == 0 && clock == CLOCK_MONOTONIC && FakeLibc::clockFactor != 1) {
+        SlowDown(now);
+    }
+    return static_cast<int>(result);
 }
 
 int setitimer(__itimer_which_t which, const itimerval *value, itimerval *old) noexcept {
-    static const auto real =
-        Real<int (*)(__itimer_which_t, const itimerval *, itimerval *)>("setitimer");
+    static const auto real = Real<int (*)(__itimer_which_t, const itimerval *, itimerval *)>(
+        TIME_SYMBOL("setitimer", "__setitimer64"));
     const long long microseconds =
         (value->it_value.tv_sec * 1000000LL + value->it_value.tv_usec) * FakeLibc::alarmFactor;
     itimerval later = *value;
@@ -182,11 +223,16 @@ int ioctl(int fd, unsigned long request, ...) noexcept {
     if (FakeLibc::onIoctl) {
         return FakeLibc::onIoctl(request, argument);
     }
-    PASS_OR_FAIL(-1, ioctl, int (*)(int, unsigned long, ...), fd, request, argument);
+    PASS_OR_FAIL_AS(-1, ioctl, TIME_SYMBOL("ioctl", "__ioctl_time64"),
+                    int (*)(int, unsigned long, ...), fd, request, argument);
 }
 
 int msgctl(int id, int command, msqid_ds *data) noexcept {
-    PASS_OR_FAIL(-1, msgctl, int (*)(int, int, msqid_ds *), id, command, data);
+    if (FakeLibc::onMsgctl) {
+        FakeLibc::onMsgctl();
+    }
+    PASS_OR_FAIL_AS(-1, msgctl, TIME_SYMBOL("msgctl", "__msgctl64"), int (*)(int, int, msqid_ds *),
+                    id, command, data);
 }
 
 int msgget(key_t key, int flags) noexcept {
@@ -225,18 +271,13 @@ off_t lseek64(int fd, off_t offset, int whence) noexcept {
     return real(fd, offset, whence);
 }
 
-// Under whatever name the platform's 64-bit variant has; the real answer comes by another call.
+// Under whatever names the platform's 64-bit variants have; the real answers come by another call.
 int stat(const char *path, struct stat *status) noexcept {
-    const int error = FailureOf("stat");
-    if (error != 0) {
-        errno = error;
-        return -1;
-    }
-    const int result = fstatat(AT_FDCWD, path, status, 0);
-    if (result == 0 && FakeLibc::onStat) {
-        FakeLibc::onStat(status);
-    }
-    return result;
+    return LookUp(path, status, 0);
+}
+
+int lstat(const char *path, struct stat *status) noexcept {
+    return LookUp(path, status, AT_SYMLINK_NOFOLLOW);
 }
 
 int fsync(int fd) {
@@ -265,6 +306,18 @@ int pthread_mutex_init(pthread_mutex_t *mutex, const pthread_mutexattr_t *attrib
     static const auto real =
         Real<int (*)(pthread_mutex_t *, const pthread_mutexattr_t *)>("pthread_mutex_init");
     return real(mutex, attributes);
+}
+
+int pthread_create(pthread_t *thread, const pthread_attr_t *attributes, void *(*start)(void *),
+                   void *argument) noexcept {
+    const int error = FailureOf("pthread_create");
+    if (error != 0) {
+        return error;
+    }
+    static const auto real =
+        Real<int (*)(pthread_t *, const pthread_attr_t *, void *(*)(void *), void *)>(
+            "pthread_create");
+    return real(thread, attributes, start, argument);
 }
 
 SignalAction signal(int number, SignalAction handler) noexcept {

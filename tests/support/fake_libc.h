@@ -19,18 +19,18 @@ struct FakeLibc {
     static int sleeps;
     static std::function<void()> onSleep;
 
-    // What setitimer() sets comes, and what usleep() waits takes, this many times later: a busy
-    // machine needs more time than the tool gives itself.
+    // What setitimer() sets comes this many times later, and CLOCK_MONOTONIC runs this many times
+    // slower: a busy machine needs more time than the tool gives itself.
     static int alarmFactor;
-    static int pauseFactor;
+    static int clockFactor;
 
     static int syncs; // sync() only counts
     static std::function<void()> onSync;
 
     // The n-th next call (1: the next) of this function fails with this errno (a function that
     // returns its error returns it; aligned_alloc returns null). Known: ioctl, msgctl, msgget,
-    // msgsnd, write, read, lseek, fsync, rename, fchown, pthread_mutex_init, signal, aligned_alloc,
-    // ftok, stat.
+    // msgsnd, write, read, lseek, fsync, rename, fchown, pthread_mutex_init, pthread_create,
+    // signal, aligned_alloc, ftok, stat (lstat is one, too).
     static void Fail(const std::string &function, int error, int nth = 1);
     // The same for every call from the n-th on.
     static void FailFrom(const std::string &function, int error, int nth = 1);
@@ -41,11 +41,14 @@ struct FakeLibc {
     // How often the function was called since Reset().
     static int Calls(const std::string &function);
 
-    // Changes what stat() has found while it is set.
+    // Changes what stat() or lstat() has found while it is set.
     static std::function<void(struct stat *)> onStat;
 
     // Answers every ioctl while it is set: (request, third argument) to the result; -1 with errno.
     static std::function<int(unsigned long, void *)> onIoctl;
+
+    // Called before every msgctl().
+    static std::function<void()> onMsgctl;
 
     // Told of every read before it happens: descriptor, its position (bytes; -1 where there is
     // none), bytes asked for.

@@ -111,6 +111,45 @@ TEST_F(BitmapInitByFileTest, ReadThatGivesNothingIsRepeated) {
     EXPECT_EQ(log.Count("BitmapInitByFile() [N]: Next read start = 0 bytes=10"), 2);
 }
 
+// Its size is asked for by its name first: by then another file may lie there.
+TEST_F(BitmapInitByFileTest, FileThatHasBecomeShorterIsAnError) {
+    WriteWhole(path, Pattern(10));
+    FakeLibc::onStat = [](struct stat *status) { status->st_size = 11; };
+    CapturedLog log;
+    EXPECT_EQ(Read(20), -1);
+    EXPECT_EQ(log.Text(), "tool: Read bitmap file (" + path + ") error\n\n");
+}
+
+TEST_F(BitmapInitByFileTest, FileThatIsCutWhileItIsReadIsAnError) {
+    WriteWhole(path, Pattern(10000));
+    int reads = 0;
+    FakeLibc::onRead = [&](int, long long, size_t) {
+        if (++reads == 2) {
+            EXPECT_EQ(truncate(path.c_str(), 4096), 0);
+        }
+    };
+    CapturedLog log;
+    EXPECT_EQ(Read(10000), -1);
+    EXPECT_EQ(log.Text(), "tool: Read bitmap file (" + path + ") error\n\n");
+    EXPECT_EQ(reads, 2);
+}
+
+TEST_F(BitmapInitByFileTest, LinksAreNotFollowed) {
+    WriteWhole(path, Pattern(10));
+    const std::string target = path + ".target";
+    std::filesystem::rename(path, target);
+    for (const bool dangling : {false, true}) {
+        if (dangling) {
+            std::filesystem::remove(target);
+        } else {
+            ASSERT_EQ(symlink(target.c_str(), path.c_str()), 0);
+        }
+        CapturedLog log;
+        EXPECT_EQ(Read(10), -1);
+        EXPECT_EQ(log.Text(), "tool: Can't open bitmap file (" + path + ")\n\n");
+    }
+}
+
 TEST_F(BitmapInitByFileTest, FailedReadIsAnError) {
     WriteWhole(path, Pattern(10000));
     FakeLibc::Fail("read", EIO, 2);

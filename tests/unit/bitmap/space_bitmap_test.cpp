@@ -10,6 +10,7 @@
 #include <gtest/gtest.h>
 #include <linux/fs.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 namespace vesk {
 namespace {
@@ -221,6 +222,14 @@ TEST_F(SpaceBitmapTest, FileThatCannotBeLookedUpIsNotTakenForAMissingOne) {
     FakeLibc::Fail("stat", EIO);
     EXPECT_EQ(Load(0), Messages{});
     EXPECT_EQ(Content(), content);
+}
+
+TEST_F(SpaceBitmapTest, LinkThatPointsNowhereIsNotTakenForAMissingFile) {
+    ASSERT_EQ(symlink("no", path.c_str()), 0);
+    EXPECT_EQ(Load(-1), (Messages{"Bitmap size changed. Could be due to volume expansion",
+                                  "Can't open bitmap file (" + path + ")", "",
+                                  "Read bitmap file to bitmap memory error"}));
+    EXPECT_EQ(bitmap, nullptr);
 }
 
 TEST_F(SpaceBitmapTest, FileThatVanishesBeforeItIsSizedIsAnError) {

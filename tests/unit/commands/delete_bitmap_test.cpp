@@ -30,6 +30,18 @@ TEST_F(VolumeEventsTest, DeleteBitmapOfAVolumeThatIsNoSpaceWorksToo) {
     EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
 }
 
+TEST_F(VolumeEventsTest, DeleteBitmapRemovesALinkAndNotItsTarget) {
+    const std::string elsewhere = folder_.Path("elsewhere");
+    std::filesystem::create_symlink(elsewhere, bitmapFile_);
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_FALSE(std::filesystem::is_symlink(bitmapFile_));
+    WriteWhole(elsewhere, "ab");
+    std::filesystem::create_symlink(elsewhere, bitmapFile_);
+    EXPECT_EQ(DeleteBitmap(Volume()), 0);
+    EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
+    EXPECT_EQ(ReadWhole(elsewhere), "ab");
+}
+
 TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {
     std::filesystem::create_directory(bitmapFile_);
     CapturedLog log;

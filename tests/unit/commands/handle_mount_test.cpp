@@ -78,6 +78,36 @@ TEST_F(HandleMountTest, MountLeavesADirectoryAtTheBitmapPath) {
     EXPECT_TRUE(std::filesystem::is_directory(bitmapFile_));
 }
 
+TEST_F(HandleMountTest, MountLeavesALinkAtTheBitmapPath) {
+    FakeAppliance::caches.clear();
+    const std::string elsewhere = folder_.Path("elsewhere");
+    for (const bool dangling : {true, false}) {
+        std::filesystem::create_symlink(elsewhere, bitmapFile_);
+        if (!dangling) {
+            WriteWhole(elsewhere, "ab");
+        }
+        CapturedLog log;
+        EXPECT_EQ(Mount(), 0);
+        EXPECT_TRUE(std::filesystem::is_symlink(bitmapFile_)) << dangling;
+        std::filesystem::remove(bitmapFile_);
+    }
+    EXPECT_EQ(ReadWhole(elsewhere), "ab");
+}
+
+TEST_F(HandleMountTest, MountLooksAtTheVolumesAlone) {
+    FakeAppliance::caches.clear();
+    for (const char *rest :
+         {R"("nextRequestNum" : [])", R"("requestQueue" : 5)", R"("requests" : ["x"])"}) {
+        WriteWhole(config_,
+                   R"({"volumes" : {")" + volume_ + R"(" : {"files" : {}}}, )" + rest + "}");
+        CapturedLog log;
+        EXPECT_EQ(Mount(), 0) << rest;
+        EXPECT_EQ(log.Messages(), Messages{recordsRemoved_});
+        EXPECT_EQ(Parse(ReadWhole(config_)),
+                  Parse(std::string(R"({"volumes" : {}, )") + rest + "}"));
+    }
+}
+
 TEST_F(HandleMountTest, MountWithADamagedConfigurationKeepsTheBitmap) {
     FakeAppliance::caches.clear();
     WriteWhole(config_, R"({"volumes" : []})");

@@ -43,6 +43,14 @@ TEST_F(SendBitmapTest, SendBitmapWithoutABitmapFileSucceeds) {
     EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
 }
 
+TEST_F(SendBitmapTest, SendBitmapRefusesALinkEvenWhereItPointsNowhere) {
+    std::filesystem::create_symlink("no", bitmapFile_);
+    CapturedLog log;
+    EXPECT_EQ(SendBitmap(Volume()), -1);
+    EXPECT_EQ(LastOf(log.Messages()), "Allocate bitmap failed");
+    EXPECT_EQ(device_->events, Events{"query"});
+}
+
 TEST_F(SendBitmapTest, SendBitmapsGoodEndsAreNotices) {
     CapturedLog log(2);
     SendBitmap(Volume());

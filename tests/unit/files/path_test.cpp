@@ -5,6 +5,7 @@
 #include "tests/support/temp_dir.h"
 
 #include <cerrno>
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
@@ -113,6 +114,46 @@ TEST_F(PathTest, ExistsIsSilent) {
 TEST_F(PathTest, LinkThatPointsNowhereDoesNotExist) {
     CapturedLog log;
     EXPECT_EQ(PathExists(LinkTo(missing).c_str()), 0);
+}
+
+TEST_F(PathTest, LinkItselfExistsAndIsNoFile) {
+    CapturedLog log(3);
+    const std::string link = LinkTo(missing);
+    uint64_t size = 0;
+    EXPECT_EQ(PathExists(link.c_str(), LastLink::Itself), 1);
+    EXPECT_EQ(PathIsMissing(link.c_str(), LastLink::Itself), 0);
+    EXPECT_EQ(PathIsMissing(link.c_str()), 1);
+    EXPECT_EQ(PathIsFile(link.c_str(), LastLink::Itself), 0);
+    EXPECT_EQ(FileGetSizeByte(link.c_str(), &size, LastLink::Itself), 0);
+    EXPECT_EQ(size, missing.size());
+    EXPECT_EQ(log.Text(), "");
+    EXPECT_EQ(PathExists(missing.c_str(), LastLink::Itself), 0);
+    EXPECT_EQ(PathIsMissing(missing.c_str(), LastLink::Itself), 1);
+    WriteWhole(missing, "");
+    EXPECT_EQ(PathIsFile(link.c_str(), LastLink::Itself), 0);
+    EXPECT_EQ(PathIsFile(missing.c_str(), LastLink::Itself), 1);
+}
+
+// A 32-bit platform's own times reach from 1901 to 2038.
+TEST_F(PathTest, FilesOfEveryDateAreFiles) {
+    CapturedLog log(3);
+    const std::string path = folder.Path("file");
+    WriteWhole(path, "12345");
+    for (const long long seconds : {-2524521600LL, 2208988800LL, 4291747200LL}) {
+        const auto date = static_cast<time_t>(seconds);
+        ASSERT_EQ(date, seconds);
+        const timespec times[] = {{date, 0}, {date, 0}};
+        ASSERT_EQ(utimensat(AT_FDCWD, path.c_str(), times, 0), 0);
+        uint64_t size = 0;
+        uint32_t inode = 0;
+        EXPECT_EQ(PathExists(path.c_str()), 1);
+        EXPECT_EQ(PathIsMissing(path.c_str()), 0);
+        EXPECT_EQ(PathIsFile(path.c_str()), 1);
+        EXPECT_EQ(FileGetSizeByte(path.c_str(), &size), 0);
+        EXPECT_EQ(size, 5U);
+        EXPECT_EQ(FileGetInodeNumber(path.c_str(), &inode), 0);
+    }
+    EXPECT_EQ(log.Text(), "");
 }
 
 TEST_F(PathTest, PlainFileIsAFileAndNoFolder) {
