@@ -23,8 +23,9 @@ bool ParseEntry(const std::string &entry, FileInfo *info) {
         pathLength >= sizeof(info->szRelativePath)) {
         return false;
     }
+    // With a second "#" the first belongs to the name, and the number behind it to nobody's inode.
     const char *number = entry.c_str() + pathLength + 1;
-    if (*number < '0' || *number > '9') {
+    if (*number < '0' || *number > '9' || strchr(number, '#') != nullptr) {
         return false;
     }
     errno = 0;

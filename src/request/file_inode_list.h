@@ -3,7 +3,7 @@
 // One entry a file, joined by ";": the path relative to the volume (no leading "/"), "#", the inode
 // number in decimal; for instance share/a.txt#1234;share/b.bin#5678. At most 1023 characters.
 // Relative paths therefore cannot hold "#", ";" or white space: a path with "#" is stored, but its
-// entry reads back wrong and the request fails when it is carried out.
+// entry cannot be read back, and the request fails when it is carried out.
 //
 // Thread rule: no state.
 #pragma once
@@ -18,7 +18,8 @@ struct FileInfo {
     unsigned long inodeNum;   // 32 bits of it are used
 };
 
-// Builds the list from absolute paths joined by ";" into `out` (`outSize` bytes with the NUL).
+// Builds the list from absolute paths joined by ";" into `out` (`outSize` bytes with the NUL, at
+// least 1).
 // Empty pieces are skipped. 0, or -1 after an error message at the first path that does not lie
 // below `mountPath` or cannot be asked for its inode, or when the list does not fit.
 int AbsolutePathsToFileInodeList(const char *mountPath, const char *absolutePaths, char *out,
@@ -29,7 +30,8 @@ int AbsolutePathsToFileInodeList(const char *mountPath, const char *absolutePath
 void SplitString(const char *text, const char *delimiters, std::vector<std::string> *pieces);
 
 // Appends one record for each entry of the list. An entry is 1 to 511 characters of path, "#" and a
-// decimal number that fits in 32 bits; what follows the number is ignored. 0, or -1 after an error
-// message at the first entry that is none; those before it stay appended.
+// decimal number that fits in 32 bits; what follows the number is ignored, unless it holds another
+// "#". 0, or -1 after an error message at the first entry that is none; those before it stay
+// appended.
 int RequestDataGetFileInfos(const char *data, std::vector<FileInfo> *infos);
 } // namespace vesk

@@ -146,7 +146,7 @@ TEST_F(FileInodeListTest, AnEmptyListGivesNoRecords) {
 
 TEST_F(FileInodeListTest, WhatFollowsTheNumberIsIgnored) {
     std::vector<FileInfo> infos;
-    EXPECT_EQ(RequestDataGetFileInfos("a#12x#y;b#007", &infos), 0);
+    EXPECT_EQ(RequestDataGetFileInfos("a#12xy;b#007", &infos), 0);
     ASSERT_EQ(infos.size(), 2U);
     EXPECT_EQ(infos[0].inodeNum, 12UL);
     EXPECT_EQ(infos[1].inodeNum, 7UL);
@@ -164,9 +164,9 @@ TEST_F(FileInodeListTest, EntriesThatAreNoneFail) {
     const std::string longPath(512, 'p');
     for (const std::string &entry :
          {std::string("#5"), std::string("a"), std::string("a#"), std::string("a#-1"),
-          std::string("a#+1"), std::string("a# 1"), std::string("a##1"),
-          std::string("a#4294967296"), std::string("a#99999999999999999999999"),
-          std::string("a#%d"), longPath + "#1"}) {
+          std::string("a#+1"), std::string("a# 1"), std::string("a##1"), std::string("a#1#2"),
+          std::string("a#1x#"), std::string("a#b#1"), std::string("a#4294967296"),
+          std::string("a#99999999999999999999999"), std::string("a#%d"), longPath + "#1"}) {
         std::vector<FileInfo> infos;
         CapturedLog log;
         EXPECT_EQ(RequestDataGetFileInfos(entry.c_str(), &infos), -1) << entry;
