@@ -116,6 +116,8 @@ int CheckNormalMsg(const RequestMessage *message) {
 void GetRequests(const char *configPath) {
     {
         LogTraceScope();
+        // A queue whose key is not in its file yet would never be found.
+        ReceiverTakesNext();
         ServerMsgQueueId = MsgQueueGet(kMessageKeyFile);
         if (ServerMsgQueueId == -1) {
             LogError("Create server messsage queue by file (%s) failed", kMessageKeyFile);

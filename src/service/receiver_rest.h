@@ -4,8 +4,8 @@
 #pragma once
 
 namespace vesk {
-// Before each message: from here on the receiver may have one in hand. Once it is called to rest
-// this does not return.
+// Before each message, and before the queue and its key file are looked for, which may make them:
+// from here on the receiver may have one in hand. Once it is called to rest this does not return.
 void ReceiverTakesNext();
 
 // Whether a wait for messages that was interrupted was so by the call to rest.

@@ -18,6 +18,10 @@ const suseconds_t kEndGraceMicroseconds = 500000;
 
 std::atomic<int> serviceThreads{0};
 
+// Without a thread for the signals: the one that starts the service takes them.
+std::atomic<bool> startingThreadTakesSignals{false};
+std::atomic<pthread_t> startingThread{};
+
 sigset_t EndingSignalSet() {
     sigset_t set;
     sigemptyset(&set);
@@ -53,7 +57,7 @@ void LimitEnd() {
     quick_exit(0);
 }
 
-void *WaitForSignals(void * /*argument*/) {
+[[noreturn]] void *WaitForSignals(void * /*argument*/) {
     const sigset_t set = EndingSignalSet();
     int signalNumber = 0;
     while (sigwait(&set, &signalNumber) != 0) {
@@ -61,17 +65,6 @@ void *WaitForSignals(void * /*argument*/) {
     LimitEnd();
     ReceiverAwaitRest();
     SignalHandler(signalNumber);
-}
-
-// False when there is no thread to be had: then the handler runs on the thread that is interrupted,
-// which may be the receiver, so nobody is waited for.
-bool StartWaiter() {
-    pthread_t waiter{};
-    if (pthread_create(&waiter, nullptr, WaitForSignals, nullptr) != 0) {
-        return false;
-    }
-    pthread_detach(waiter);
-    return true;
 }
 } // namespace
 
@@ -86,10 +79,19 @@ int SetSignalHandler() {
             return -1;
         }
     }
-    if (!StartWaiter()) {
-        pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
-    }
     return 0;
+}
+
+void StartSignalThread() {
+    pthread_t waiter{};
+    if (pthread_create(&waiter, nullptr, WaitForSignals, nullptr) == 0) {
+        pthread_detach(waiter);
+        return;
+    }
+    startingThread = pthread_self();
+    startingThreadTakesSignals = true;
+    const sigset_t set = EndingSignalSet();
+    pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
 }
 
 void SignalHandler(int signalNumber) {
@@ -105,6 +107,11 @@ void SetServiceThreads(int count) {
 void ServiceThreadEnds() {
     if (--serviceThreads == 0) {
         EndProcess();
+    }
+    if (startingThreadTakesSignals && pthread_equal(startingThread, pthread_self()) != 0) {
+        const sigset_t set = EndingSignalSet();
+        pthread_sigmask(SIG_BLOCK, &set, nullptr);
+        WaitForSignals(nullptr);
     }
 }
 } // namespace vesk

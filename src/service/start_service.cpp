@@ -22,6 +22,7 @@ int StartService(const ToolParameters *parameters) {
     }
     if (ServiceStateInitialize() != 0) {
         LogError("Initialize mutex failed");
+        LogTraceExit();
         return -1;
     }
     FileRemoveLeftovers(parameters->configPath);
@@ -30,8 +31,10 @@ int StartService(const ToolParameters *parameters) {
     if (pthread_create(&worker, nullptr, DoRequests, const_cast<ToolParameters *>(parameters)) !=
         0) {
         LogError("Can't create thread: %s", strerror(errno));
+        LogTraceExit();
         return -1;
     }
+    StartSignalThread();
     GetRequests(parameters->configPath);
 }
 } // namespace vesk

@@ -137,8 +137,8 @@ END
 
 @test "a request of type unknown is stored and ends the worker for good" {
     start_service
-    find_newest_thread
-    local worker=$NEWEST_THREAD
+    find_worker
+    local worker=$WORKER
     send_record 0 /volume1 ""
     wait_until request_is_stored 0
     wait_until thread_is_gone "$worker"

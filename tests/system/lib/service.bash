@@ -41,18 +41,18 @@ receiver_waits() { thread_is_in_call "$SERVICE_PID" ' 0x604 '; }
 # dealt with.
 messages_are_taken() { waiting_is 0 && receiver_waits; }
 
-# The worker waits for a request or in a pause. It is the thread made last; where it has ended that is
-# the one that waits for signals.
+# The worker waits for a request or in a pause. It is the first thread that is made; where it has ended,
+# the next is the one that waits for signals.
 worker_rests() {
-    find_newest_thread
-    thread_is_in_call "$NEWEST_THREAD" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
+    find_worker
+    thread_is_in_call "$WORKER" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
 }
-find_newest_thread() {
+find_worker() {
     local task
-    NEWEST_THREAD=0
+    WORKER=
     for task in /proc/"$SERVICE_PID"/task/*; do
         task=${task##*/}
-        [[ $task == *[!0-9]* || $task -lt $NEWEST_THREAD ]] || NEWEST_THREAD=$task
+        [[ $task == *[!0-9]* || $task == "$SERVICE_PID" || (-n $WORKER && $task -gt $WORKER) ]] || WORKER=$task
     done
 }
 

@@ -30,7 +30,6 @@ using Clock = std::chrono::steady_clock;
 
 const int kStretched = 100;
 
-// Not usleep(), whose time tests stretch.
 void PauseBriefly() {
     std::this_thread::sleep_for(std::chrono::milliseconds(1));
 }

@@ -28,6 +28,15 @@ int SignalState() {
     return state;
 }
 
+// As the service does. False where it cannot.
+bool TakeSignals() {
+    if (SetSignalHandler() != 0) {
+        return false;
+    }
+    StartSignalThread();
+    return true;
+}
+
 // Makes every thread that is started without an own stack size fail.
 void RefuseThreads() {
     pthread_attr_t attributes;
@@ -62,7 +71,7 @@ TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten
     for (const int number : kEndingSignals) {
         ChildProcess child({2}, [] {
             LogNotice("still in the buffer");
-            SetSignalHandler();
+            TakeSignals();
             for (;;) {
                 pause();
             }
@@ -80,7 +89,7 @@ TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten
 
 TEST_F(SignalHandlerTest, ASignalIsSilentAtLevel1) {
     ChildProcess child({1}, [] {
-        SetSignalHandler();
+        TakeSignals();
         kill(getpid(), SIGTERM);
         for (;;) {
             pause();
@@ -95,7 +104,7 @@ TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
     SKIP_WHERE_SIGNALS_COME_LATE();
     SKIP_WHERE_SIGNALS_ARE_EMULATED();
     ChildProcess child({2, true}, [] {
-        SetSignalHandler();
+        TakeSignals();
         for (;;) {
             LogNotice("more and more, until the pipe takes no more and the lock is held for good");
         }
@@ -108,7 +117,7 @@ TEST_F(SignalHandlerTest, ASignalInsideOutputThatNobodyReadsEndsTheProcess) {
 
 TEST_F(SignalHandlerTest, OtherSignalsKeepTheirActions) {
     ChildProcess child({1}, [] {
-        SetSignalHandler();
+        TakeSignals();
         raise(SIGUSR1);
         return 99;
     });
@@ -119,7 +128,7 @@ TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheHandlerRunsWhereItIsInterrupte
     SKIP_WHERE_SIGNALS_COME_LATE();
     ChildProcess child({2}, [] {
         RefuseThreads();
-        if (SetSignalHandler() != 0 || SignalState() != 0b000111) {
+        if (!TakeSignals() || SignalState() != 0b000111) {
             return 99;
         }
         raise(SIGINT);
@@ -129,9 +138,33 @@ TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheHandlerRunsWhereItIsInterrupte
     EXPECT_EQ(child.Messages(), Messages{"SignalHandler() [N]: Get signal = 2"});
 }
 
+TEST_F(SignalHandlerTest, WithoutAWaitingThreadTheOneThatHasEndedStillTakesTheSignals) {
+    SKIP_WHERE_SIGNALS_ARE_EMULATED();
+    ChildProcess child({2}, [] {
+        SetSignalHandler();
+        SetServiceThreads(2);
+        std::thread([] { // a worker: the signals stay blocked in it
+            for (;;) {
+                pause();
+            }
+        })
+            .detach();
+        RefuseThreads();
+        StartSignalThread();
+        LogNotice("ends");
+        fflush(stdout);
+        ServiceThreadEnds();
+        return 99;
+    });
+    ASSERT_TRUE(child.AwaitOutput("ends"));
+    child.Signal(SIGTERM);
+    EXPECT_EQ(child.AwaitEnd(), 0);
+    EXPECT_EQ(LastOf(child.Messages()), "SignalHandler() [N]: Get signal = 15");
+}
+
 TEST_F(SignalHandlerTest, TheLastServiceThreadEndsTheProcess) {
     ChildProcess child({1}, [] {
-        SetSignalHandler();
+        TakeSignals();
         SetServiceThreads(2);
         ServiceThreadEnds();
         LogNotice("one is left");

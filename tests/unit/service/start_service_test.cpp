@@ -63,18 +63,21 @@ protected:
         }
         return messages;
     }
-    // The worker holds the lock in choosing a request until the file is there. What the ending
-    // thread waits between its calls to the receiver is multiplied.
-    std::function<int()> ServiceThatChoosesUntilReleased(int pauseFactor) const {
-        return Service([this, pauseFactor] {
-            FakeLibc::pauseFactor = pauseFactor;
+    // The worker holds the lock in choosing a request until the file is there. The clock by which
+    // the ending thread waits for the receiver is slowed down.
+    std::function<int()> ServiceThatChoosesUntilReleased(int clockFactor) const {
+        return Service([this, clockFactor] {
+            FakeLibc::clockFactor = clockFactor;
             FakeAppliance::onConfigLookup = [this] {
                 LogNotice("Choosing");
-                while (!PathExists(release_.c_str())) {
-                    std::this_thread::sleep_for(std::chrono::milliseconds(1));
-                }
+                AwaitRelease();
             };
         });
+    }
+    void AwaitRelease() const {
+        while (!PathExists(release_.c_str())) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        }
     }
     // The receiver has taken a message and waits for the lock to store it.
     void SendMessageToHold(ChildProcess *service) const {
@@ -215,6 +218,35 @@ TEST_F(StartServiceTest, ASignalEndsTheServiceBeforeItHasItsQueue) {
     }
 }
 
+TEST_F(StartServiceTest, ASignalLetsTheQueueBeMadeWithItsKeyFile) {
+    EmptyPrivateWorld();
+    ChildProcess service({1, false, true}, Service([this] {
+                             FakeLibc::clockFactor = 100;
+                             FakeLibc::onMsgctl = [this] {
+                                 LogNotice("Making");
+                                 AwaitRelease();
+                             };
+                         }));
+    ASSERT_TRUE(service.AwaitOutput("Making"));
+    service.Signal(SIGTERM);
+    ASSERT_TRUE(ChildProcess::Await([&] { return service.Catches(SIGUSR1); }));
+    EXPECT_TRUE(service.Runs());
+    EXPECT_EQ(ReadWhole(kMessageKeyFile), "");
+    WriteWhole(release_, "");
+    EXPECT_EQ(service.AwaitEnd(), 0);
+    EXPECT_EQ(ReadWhole(kMessageKeyFile), std::to_string(ftok(kMessageKeyFile, 'x')));
+    EXPECT_NE(msgget(ftok(kMessageKeyFile, 'x'), 0), -1);
+}
+
+TEST_F(StartServiceTest, WithRoomForOneThreadMoreItIsTheWorkers) {
+    ChildProcess service({1, false, true},
+                         Service([] { FakeLibc::Fail("pthread_create", EAGAIN, 2); }));
+    Send(kRequestReloadPinBlocks, "/volume9"); // of no cache: stored, woken for and dropped
+    EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(), 0);
+}
+
 TEST_F(StartServiceTest, ASignalRightAfterTheHandlersAreInstalledEndsTheService) {
     SKIP_WHERE_SIGNALS_ARE_EMULATED();
     for (int i = 0; i < 10; ++i) {
@@ -282,6 +314,7 @@ TEST_F(StartServiceTest, WithoutItsLockItDoesNotStart) {
     EXPECT_EQ(service.Messages(), (Messages{
                                       "StartService() [N] : +++++",
                                       "StartService() [N] : ***** Initialize mutex failed",
+                                      "StartService() [N] : -----",
                                   }));
 }
 
@@ -297,6 +330,7 @@ TEST_F(StartServiceTest, WithoutItsWorkerItDoesNotStart) {
               (Messages{
                   "StartService() [N] : +++++",
                   "StartService() [N] : ***** Can't create thread: Cannot allocate memory",
+                  "StartService() [N] : -----",
               }));
 }
 } // namespace vesk
