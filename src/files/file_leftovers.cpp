@@ -1,6 +1,6 @@
 #include "files/file_leftovers.h"
 
-#include "base/deleter.h"
+#include "base/malloc_text.h"
 
 #include <cerrno>
 #include <csignal>
@@ -48,9 +48,11 @@ bool IsLeftover(int folder, const char *name) {
 } // namespace
 
 void FileRemoveLeftovers(const char *path) {
-    const char *slash = strrchr(path, '/');
-    const std::string folderPath =
-        slash == nullptr ? "." : std::string(path, static_cast<size_t>(slash - path) + 1);
+    // Where a link leads to is what is replaced.
+    const MallocText target(realpath(path, nullptr));
+    const std::string file = target ? target.get() : path;
+    const size_t slash = file.rfind('/');
+    const std::string folderPath = slash == std::string::npos ? "." : file.substr(0, slash + 1);
     const std::unique_ptr<DIR, Deleter<closedir>> folder(opendir(folderPath.c_str()));
     if (!folder) {
         return;

@@ -8,7 +8,7 @@ namespace vesk {
 const char kTemporaryPrefix[] = ".veskcachepinfile.";
 const char kTemporarySuffix[] = ".tmp";
 
-// Removes the temporary files beside `path` whose process is gone and that nobody has written to
-// for a minute; what cannot be removed stays. Never logs.
+// Removes the temporary files beside `path`, or beside its target if it is a link, whose process is
+// gone and that nobody has written to for a minute; what cannot be removed stays. Never logs.
 void FileRemoveLeftovers(const char *path);
 } // namespace vesk

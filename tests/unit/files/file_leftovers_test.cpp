@@ -42,6 +42,18 @@ TEST_F(FileLeftoversTest, OldFilesOfGoneProcessesGo) {
     EXPECT_TRUE(IsThere("config.json"));
 }
 
+TEST_F(FileLeftoversTest, BesideTheTargetOfALinkTheyGo) {
+    const std::string name = ".veskcachepinfile." + GonePid() + ".12.tmp";
+    Make(name, 3600);
+    Make("config.json", 3600);
+    const TempDir elsewhere;
+    const std::string link = elsewhere.Path("link");
+    ASSERT_EQ(symlink(config.c_str(), link.c_str()), 0);
+    FileRemoveLeftovers(link.c_str());
+    EXPECT_FALSE(IsThere(name));
+    EXPECT_TRUE(IsThere("config.json"));
+}
+
 TEST_F(FileLeftoversTest, FilesOfLiveProcessesAndFreshOnesStay) {
     const std::string live = ".veskcachepinfile." + std::to_string(getpid()) + ".0.tmp";
     const std::string fresh = ".veskcachepinfile." + GonePid() + ".0.tmp";
