@@ -3,14 +3,31 @@
 #include "base/deleter.h"
 #include "base/log.h"
 #include "base/malloc_text.h"
+#include "base/scoped_fd.h"
 
 #include <cstdio>
 #include <cstring>
+#include <fcntl.h>
 #include <memory>
+#include <sys/stat.h>
+#include <unistd.h>
 
 namespace vesk {
 namespace {
 using Stream = std::unique_ptr<FILE, Deleter<fclose>>;
+
+// All of it, or as much as the text has room for. Cuts the text to what has been read; -1 with
+// errno on failure.
+int ReadAll(int fd, std::string *text) {
+    size_t length = 0;
+    ssize_t result = 1;
+    while (length < text->size() && result > 0) {
+        result = read(fd, &(*text)[length], text->size() - length);
+        length += result > 0 ? static_cast<size_t>(result) : 0;
+    }
+    text->resize(length);
+    return result < 0 ? -1 : 0;
+}
 } // namespace
 
 int FileWriteString(const char *path, const char *text, OldContent old) {
@@ -47,6 +64,27 @@ int FileReadString(const char *path, std::string *text) {
     }
     text->assign(line.get());
     LogVerbose("Get text = %s", text->c_str());
+    return 0;
+}
+
+int FileReadWhole(const char *path, std::string *text) {
+    const LogPlace place{"FileReadString", __LINE__};
+    const ScopedFd file(open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+    struct stat status {};
+    const int known = file.IsOpen() ? fstat(file.Get(), &status) : stat(path, &status);
+    if (known == 0 && !S_ISREG(status.st_mode)) {
+        return -1;
+    }
+    if (!file.IsOpen() || known < 0) {
+        LogErrorAt(place, "Can't open file (%s)", path);
+        return -1;
+    }
+    text->resize(8192);
+    if (ReadAll(file.Get(), text) < 0 || text->empty()) {
+        LogErrorAt(place, "Can't get a line from file (%s)", path);
+        return -1;
+    }
+    LogVerboseAt(place, "Get text = %s", text->c_str());
     return 0;
 }
 } // namespace vesk

@@ -14,4 +14,8 @@ int FileWriteString(const char *path, const char *text, OldContent old = OldCont
 // The first line of the file, with its line feed if it has one. 0, or -1 after an error message
 // when the file cannot be opened or is empty.
 int FileReadString(const char *path, std::string *text);
+
+// The same of the whole file, in FileReadString's name, without blocking whatever lies there; of a
+// file longer than 8 KiB the beginning. -1 without a message where it is no regular file.
+int FileReadWhole(const char *path, std::string *text);
 } // namespace vesk

@@ -10,6 +10,7 @@
 
 namespace vesk {
 // 1 when the lookup of this file (full path, compared whole) shall fail, else 0. A control file
-// that is not a regular file counts as absent, and opening it never blocks.
+// that is not a regular file counts as absent, and opening it never blocks; of one that cannot be
+// read there is an error message.
 int FileSimulateGetMappingFailed(const std::string &filePath);
 } // namespace vesk

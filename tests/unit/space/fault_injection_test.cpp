@@ -2,13 +2,13 @@
 
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
+#include "tests/support/ordinary_user.h"
 #include "tests/support/private_mounts.h"
 #include "tests/support/temp_dir.h"
 
 #include <cerrno>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 namespace vesk {
@@ -16,6 +16,8 @@ namespace {
 const bool kPrivateMounts = UsePrivateMounts();
 const char kControlFile[] = "/tmp/veskcachepinfiletool.debug";
 const char kFile[] = "/volume1/photo/a.jpg";
+const char kNoLine[] = "FileReadString() [N] : ***** Can't get a line from file "
+                       "(/tmp/veskcachepinfiletool.debug)";
 
 class FileSimulateGetMappingFailedTest : public LeakCheckedTest {
 protected:
@@ -47,7 +49,8 @@ TEST_F(FileSimulateGetMappingFailedTest, NothingFailsWithoutAControlFile) {
 TEST_F(FileSimulateGetMappingFailedTest, ThePathOfTheFileMatches) {
     CapturedLog log(2);
     EXPECT_EQ(WithControl("/volume1/photo/a.jpg"), 1);
-    EXPECT_EQ(log.Text(), "");
+    EXPECT_EQ(log.Messages(),
+              std::vector<std::string>{"FileReadString() [N]: Get text = /volume1/photo/a.jpg"});
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, OneLineFeedIsIgnoredTwoAreNot) {
@@ -70,9 +73,14 @@ TEST_F(FileSimulateGetMappingFailedTest, ThePathIsComparedWhole) {
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, EmptyControlFileMatchesNoFile) {
+    {
+        CapturedLog log(3);
+        EXPECT_EQ(WithControl("", ""), 0);
+        EXPECT_EQ(log.Messages(), std::vector<std::string>{kNoLine});
+    }
     CapturedLog log;
-    EXPECT_EQ(WithControl(""), 0);
     EXPECT_EQ(WithControl("\n"), 0);
+    EXPECT_EQ(log.Text(), "");
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, LongPathsAreComparedWhole) {
@@ -126,24 +134,31 @@ TEST_F(FileSimulateGetMappingFailedTest, FolderSocketAndDeviceCountAsAbsent) {
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, ControlFileThatCannotBeReadCountsAsAbsent) {
-    CapturedLog log;
+    CapturedLog log(3);
     FakeLibc::Fail("read", EIO);
     EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 0);
+    EXPECT_EQ(log.Messages(), std::vector<std::string>{kNoLine});
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ControlFileThatBreaksOffCountsAsAbsent) {
+    CapturedLog log(3);
+    FakeLibc::Limit("read", 20);
+    FakeLibc::Fail("read", EIO, 2);
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 0);
+    EXPECT_EQ(log.Messages(), std::vector<std::string>{kNoLine});
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, ControlFileWithoutPermissionCountsAsAbsent) {
     WriteWhole(kControlFile, "/volume1/photo/a.jpg\n");
     ASSERT_EQ(chmod(kControlFile, 0600), 0);
-    fflush(stdout);
-    const pid_t child = fork();
-    if (child == 0) {
-        const CapturedLog log;
-        _exit(setuid(65534) == 0 ? FileSimulateGetMappingFailed(kFile) : 99);
+    CapturedLog log(3);
+    {
+        const OrdinaryUser user;
+        EXPECT_EQ(FileSimulateGetMappingFailed(kFile), 0);
     }
-    int status = -1; // of no process, where there is none
-    waitpid(child, &status, 0);
-    ASSERT_TRUE(WIFEXITED(status));
-    EXPECT_EQ(WEXITSTATUS(status), 0);
+    EXPECT_EQ(log.Messages(),
+              std::vector<std::string>{"FileReadString() [N] : ***** Can't open file "
+                                       "(/tmp/veskcachepinfiletool.debug)"});
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, ComparisonIsToldAtLevel3) {
@@ -152,8 +167,10 @@ TEST_F(FileSimulateGetMappingFailedTest, ComparisonIsToldAtLevel3) {
     EXPECT_EQ(WithControl("/other"), 0);
     EXPECT_EQ(log.Messages(),
               (std::vector<std::string>{
+                  "FileReadString() [N]: Get text = /volume1/photo/a.jpg", "",
                   "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
                   "failed failed=/volume1/photo/a.jpg ret=1",
+                  "FileReadString() [N]: Get text = /other",
                   "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
                   "failed failed=/other ret=0"}));
 }
