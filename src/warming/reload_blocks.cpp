@@ -35,8 +35,8 @@ WorkResult ReloadPinBlocksToCache(const PinBitmap *bitmap, const char *cacheDevi
             LogError("Read range to cache failed");
             return WorkResult::Failed;
         }
-        // Every step ends with a look; the bitmap's end is none.
-        if (more && ServiceIsPendingSpace(mountPath)) {
+        // Every step and every read ends with a look; the bitmap's end alone is none.
+        if ((more || run.count > 0) && ServiceIsPendingSpace(mountPath)) {
             LogVerbose("Interrupted due to space is pending");
             return WorkResult::Interrupted;
         }

@@ -38,7 +38,7 @@ WorkResult ReadFilesToCache(const char *mountPath, const std::vector<FileToWarm>
         const WorkResult result = ReadMappingRangesToCache(mountPath, device.Get(), file.table,
                                                            buffer.get(), kWarmBufferBytes);
         if (result == WorkResult::Failed) {
-            LogError("Can't read file (%s) to cache", file.path.c_str());
+            LogError("Can't read file (%.511s) to cache", file.path.c_str());
             return WorkResult::Failed;
         }
         if (result == WorkResult::Interrupted) {

@@ -12,7 +12,7 @@
 
 namespace vesk {
 struct FileToWarm {
-    std::string path;       // full path, for messages
+    std::string path;       // full path, for messages, which show its first 511 bytes
     FileMappingTable table; // extents on the volume's block device
 };
 

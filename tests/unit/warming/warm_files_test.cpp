@@ -91,6 +91,15 @@ TEST_F(WarmFilesTest, AFailingReadNamesTheFileOnce) {
     EXPECT_EQ(device_->events, (Events{"read 8192+4096", "read 8388608+4096"}));
 }
 
+TEST_F(WarmFilesTest, ALongPathIsShownUpToItsFirst511Bytes) {
+    SKIP_WITHOUT_DIRECT_READS();
+    const std::string path = "/volume1/" + std::string(503, 'x');
+    CapturedLog log;
+    EXPECT_EQ(ReadFilesToCache("/volume1", {MakeFile(path, {FakeExtent(0, 8, 16384)})}),
+              WorkResult::Failed);
+    EXPECT_EQ(log.Messages().back(), "Can't read file (" + path.substr(0, 511) + ") to cache");
+}
+
 TEST_F(WarmFilesTest, FailuresNameTheirFunctions) {
     SKIP_WITHOUT_DIRECT_READS();
     FakeLibc::Fail("read", EIO);
