@@ -6,10 +6,22 @@
 #include <blkid/blkid.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
+#include <unistd.h>
 
+#include <fstream>
 #include <memory>
 
 namespace vesk {
+namespace {
+// Empty where there is no such file.
+std::string FirstLineOf(const std::string &path) {
+    std::ifstream stream(path);
+    std::string line;
+    std::getline(stream, line);
+    return line;
+}
+} // namespace
+
 std::string BlockDeviceOfMount(const MountEntry &mount) {
     // A source such as "tank/data" or "none" must not be looked up in the current directory.
     const bool isPath = !mount.source.empty() && mount.source.front() == '/';
@@ -36,6 +48,26 @@ dev_t BlockDeviceNumber(const std::string &devicePath) {
         return 0;
     }
     return status.st_rdev;
+}
+
+bool BlockDeviceHasOffset(dev_t device, const std::string &folder) {
+    const std::string path =
+        folder + "/" + std::to_string(major(device)) + ":" + std::to_string(minor(device));
+    for (const char *mark : {"/partition", "/md", "/bcache"}) {
+        if (access((path + mark).c_str(), F_OK) == 0) {
+            return true;
+        }
+    }
+    const std::string mapping = FirstLineOf(path + "/dm/uuid");
+    for (const char *kind : {"LVM-", "CRYPT-", "part"}) {
+        if (mapping.rfind(kind, 0) == 0) {
+            return true;
+        }
+    }
+    const std::string offset = FirstLineOf(path + "/loop/offset");
+    const dev_t below = BlockDeviceNumber(FirstLineOf(path + "/loop/backing_file"));
+    return (!offset.empty() && offset != "0") ||
+           (below != 0 && below != device && BlockDeviceHasOffset(below, folder));
 }
 
 std::string BlockDeviceProbe(const std::string &devicePath, const char *name) {

@@ -22,6 +22,12 @@ std::string BlockDeviceByNumber(dev_t device);
 // The number of the block device with this path; 0: the path names no block device.
 dev_t BlockDeviceNumber(const std::string &devicePath);
 
+// Whether the device with this number begins somewhere inside another one, or within what another
+// one translates: a partition, a loop device with an offset or over such a device, a RAID, a cache
+// or a logical volume. Sectors counted from its start are others of the device below. `folder` is
+// where the kernel describes devices by their numbers.
+bool BlockDeviceHasOffset(dev_t device, const std::string &folder = "/sys/dev/block");
+
 // One value of the superblock found on a block device, by libblkid's name for it ("UUID", "TYPE").
 // Empty: no such value, or the device cannot be read or carries signatures that contradict each
 // other.

@@ -6,8 +6,11 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <limits>
 #include <memory>
+#include <mutex>
+#include <vector>
 
 namespace vesk {
 namespace {
@@ -15,6 +18,91 @@ namespace {
 // things. Filesystems that do not tell the type here are checked after opening.
 bool MayBeRegularFile(const dirent &entry) {
     return entry.d_type == DT_REG || entry.d_type == DT_UNKNOWN;
+}
+
+// The files of a folder as they were at one moment. Requests ask for one file of a folder after the
+// other, and reading a large folder takes long.
+class FolderScan {
+public:
+    // Whether these are the folder's files still. A change in the same tick of the file system's
+    // clock as the scan shows in neither time: who does not find a file here, or another one under
+    // its name, scans again.
+    bool IsOf(const struct stat &folder) const {
+        return !entries_.empty() && folder.st_dev == status_.st_dev &&
+               folder.st_ino == status_.st_ino && IsEqual(folder.st_mtim, status_.st_mtim) &&
+               IsEqual(folder.st_ctim, status_.st_ctim);
+    }
+    // `folder` is its status from before.
+    void Read(int fd, const struct stat &folder) {
+        entries_.clear();
+        names_.clear();
+        status_ = folder;
+        ScopedFd again(openat(fd, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+        const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(again.Get()));
+        if (stream == nullptr) {
+            return;
+        }
+        again.Release(); // the stream closes it from here on
+        while (const dirent *entry = readdir(stream.get())) {
+            if (MayBeRegularFile(*entry)) {
+                entries_.push_back({entry->d_ino, names_.size()});
+                names_.append(entry->d_name).push_back('\0');
+            }
+        }
+        std::stable_sort(entries_.begin(), entries_.end(), IsBefore);
+    }
+    bool Search(InodeSearch &search) const {
+        const auto [first, last] =
+            std::equal_range(entries_.begin(), entries_.end(), Entry{search.wanted, 0}, IsBefore);
+        std::for_each(first, last, [&](const Entry &entry) {
+            InodeSearchOffer(search, entry.inode, names_.c_str() + entry.name);
+        });
+        return InodeSearchFound(search);
+    }
+
+private:
+    struct Entry {
+        uint64_t inode;
+        size_t name; // where it begins in `names_` (bytes)
+    };
+    // By the low 32 bits, which is what is known of a wanted file.
+    static bool IsBefore(const Entry &a, const Entry &b) {
+        return static_cast<uint32_t>(a.inode) < static_cast<uint32_t>(b.inode);
+    }
+    static bool IsEqual(const timespec &a, const timespec &b) {
+        return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
+    }
+    struct stat status_ = {};
+    std::vector<Entry> entries_;
+    std::string names_; // each with its NUL
+};
+
+// Looks for the file in the folder, or only in what is remembered of it.
+bool SearchFolder(int folder, bool remembered, InodeSearch &search) {
+    static std::mutex lock; // guards lastScan
+    static auto *lastScan = new FolderScan;
+    struct stat status = {};
+    if (fstat(folder, &status) != 0) {
+        return false;
+    }
+    const std::lock_guard<std::mutex> guard(lock);
+    if (!remembered) {
+        lastScan->Read(folder, status);
+    }
+    return lastScan->IsOf(status) && lastScan->Search(search);
+}
+
+ScopedFd OpenFound(int folder, const InodeSearch &search) {
+    // Non-blocking: the entry may have become a FIFO meanwhile. What was opened is checked for the
+    // same reason.
+    ScopedFd file(
+        openat(folder, search.name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    struct stat status = {};
+    if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
+        status.st_ino != search.candidate) {
+        return ScopedFd();
+    }
+    return file;
 }
 } // namespace
 
@@ -41,39 +129,17 @@ bool InodeSearchFound(const InodeSearch &search) {
 }
 
 ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
-    ScopedFd opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    if (!opened.IsOpen()) {
-        return ScopedFd();
-    }
-    const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(opened.Get()));
-    if (stream == nullptr) {
-        return ScopedFd();
-    }
-    opened.Release(); // the stream closes it from here on
-
-    InodeSearch search;
-    search.wanted = inode;
-    while (const dirent *entry = readdir(stream.get())) {
-        if (MayBeRegularFile(*entry)) {
-            InodeSearchOffer(search, entry->d_ino, entry->d_name);
-        }
-        if (search.isExact) {
-            break;
+    const ScopedFd folder(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    for (const bool remembered : {true, false}) {
+        InodeSearch search;
+        search.wanted = inode;
+        if (folder.IsOpen() && SearchFolder(folder.Get(), remembered, search)) {
+            ScopedFd file = OpenFound(folder.Get(), search);
+            if (file.IsOpen()) {
+                return file;
+            }
         }
     }
-    if (!InodeSearchFound(search)) {
-        return ScopedFd();
-    }
-
-    // Non-blocking: the entry may have become a FIFO meanwhile. What was opened is checked for the
-    // same reason.
-    ScopedFd file(openat(dirfd(stream.get()), search.name.c_str(),
-                         O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
-    struct stat status = {};
-    if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
-        status.st_ino != search.candidate) {
-        return ScopedFd();
-    }
-    return file;
+    return ScopedFd();
 }
 } // namespace vesk

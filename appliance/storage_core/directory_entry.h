@@ -1,6 +1,7 @@
 // Finding a directory's file by its inode number.
 //
-// Thread rule: no state; the functions are independent of each other.
+// Thread rule: callable from any thread. The files of the folder that was asked for last are
+// remembered, under a lock, so that asking for all files of a folder reads it once.
 #pragma once
 
 #include "base/scoped_fd.h"

@@ -41,7 +41,7 @@ bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
     while (true) {
         batch->fm_start = start;
         batch->fm_length = FIEMAP_MAX_OFFSET - start;
-        batch->fm_flags = 0;
+        batch->fm_flags = FIEMAP_FLAG_SYNC;
         batch->fm_mapped_extents = 0;
         batch->fm_extent_count = kBatchExtents;
         if (ioctl(fd, FS_IOC_FIEMAP, batch.get()) != 0) {

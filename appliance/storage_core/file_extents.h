@@ -14,8 +14,9 @@ namespace vesk {
 // allocated yet, kept in the inode, packed or compressed) and `entry` is left alone.
 bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry);
 
-// Appends the extents of an open regular file to `entries`, in file order. Dirty data is not
-// written back first: what has no place on the device yet is left out. False: the kernel did not
-// answer; `entries` then holds what came before.
+// Appends the extents of an open regular file to `entries`, in file order. Its data is written out
+// first: else what has no place yet would be missing, and what a copy on write is about to move
+// would be told at its old place. False: the kernel did not answer; `entries` then holds what came
+// before.
 bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries);
 } // namespace vesk

@@ -108,7 +108,8 @@ int FileSystemDevice::GetDevicePath(const std::string &filePath, std::string &de
 FileSystemDevice *FileSystemDeviceCreater::Create(const std::string &devicePath) {
     try {
         const dev_t number = BlockDeviceNumber(devicePath);
-        if (number == 0 || !FileSystemIsMappable(MountOfDevice(devicePath, number))) {
+        if (number == 0 || BlockDeviceHasOffset(number) ||
+            !FileSystemIsMappable(MountOfDevice(devicePath, number))) {
             return nullptr;
         }
         return new FiemapDevice(number);

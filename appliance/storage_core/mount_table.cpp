@@ -4,6 +4,7 @@
 
 #include <libmount/libmount.h>
 
+#include <algorithm>
 #include <memory>
 
 namespace vesk {
@@ -31,6 +32,13 @@ bool IsAtOrBelow(const std::string &path, const std::string &directory) {
     }
     return path.compare(0, directory.size(), directory) == 0 &&
            (path.size() == directory.size() || path[directory.size()] == '/');
+}
+
+// The mounts at the top have one that the table does not show, or themselves.
+bool HasParent(const MountEntry &entry, const std::vector<MountEntry> &entries) {
+    return std::any_of(entries.begin(), entries.end(), [&](const MountEntry &other) {
+        return other.id == entry.parentId && other.id != entry.id;
+    });
 }
 } // namespace
 
@@ -60,12 +68,24 @@ const MountEntry *MountFindByDevice(const std::vector<MountEntry> &entries, dev_
 }
 
 const MountEntry *MountFindByPath(const std::vector<MountEntry> &entries, const std::string &path) {
+    // As the kernel walks: from the mount on which the walk stands to the first mount point on it
+    // that the path meets. What lies below a mount point and was mounted before it is never met.
     const MountEntry *found = nullptr;
-    for (const MountEntry &entry : entries) {
-        if (!entry.target.empty() && IsAtOrBelow(path, entry.target) &&
-            (found == nullptr || entry.target.size() >= found->target.size())) {
-            found = &entry;
+    for (size_t steps = 0; steps < entries.size(); ++steps) {
+        const MountEntry *next = nullptr;
+        for (const MountEntry &entry : entries) {
+            const bool isHere = found == nullptr
+                                    ? !HasParent(entry, entries)
+                                    : entry.parentId == found->id && entry.id != found->id;
+            if (isHere && !entry.target.empty() && IsAtOrBelow(path, entry.target) &&
+                (next == nullptr || entry.target.size() < next->target.size())) {
+                next = &entry;
+            }
         }
+        if (next == nullptr) {
+            break;
+        }
+        found = next;
     }
     return found;
 }

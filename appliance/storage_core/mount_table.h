@@ -34,9 +34,9 @@ bool MountTableRead(const char *path, std::vector<MountEntry> &entries);
 // over. The result points into `entries`.
 const MountEntry *MountFindByDevice(const std::vector<MountEntry> &entries, dev_t device);
 
-// The mount that an absolute path without symbolic links lies on: the longest mount point above it,
-// of several there the one mounted last. Null where no mount point is above the path. The result
-// points into `entries`.
+// The mount that an absolute path without symbolic links lies on; never one that another mount
+// hides, at its own mount point or at a folder above it. Null where no mount point is above the
+// path. The result points into `entries`.
 const MountEntry *MountFindByPath(const std::vector<MountEntry> &entries, const std::string &path);
 
 // The value of one of the mount's filesystem options; empty where it is absent or has no value.

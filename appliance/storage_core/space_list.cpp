@@ -19,11 +19,9 @@ bool ShowsWholeFilesystem(const MountEntry &mount) {
            (mount.type == "btrfs" && mount.root == MountOptionValue(mount, "subvol"));
 }
 
-// The path of a covered mount leads to another filesystem.
-bool IsCovered(const MountEntry &mount, const std::vector<MountEntry> &mounts) {
-    return std::any_of(mounts.begin(), mounts.end(), [&](const MountEntry &other) {
-        return other.id != mount.id && other.parentId == mount.id && other.target == mount.target;
-    });
+// The path of a hidden mount leads to another filesystem.
+bool IsVisible(const MountEntry &mount, const std::vector<MountEntry> &mounts) {
+    return MountFindByPath(mounts, mount.target) == &mount;
 }
 
 bool Fits(const Space &space) {
@@ -51,7 +49,7 @@ std::vector<Space> SpaceListSelect(const std::vector<MountEntry> &mounts,
     std::vector<Space> spaces;
     std::vector<dev_t> devices; // number of each chosen filesystem, in the order of `spaces`
     for (const MountEntry &mount : mounts) {
-        if (mount.type == "autofs" || !ShowsWholeFilesystem(mount) || IsCovered(mount, mounts) ||
+        if (mount.type == "autofs" || !ShowsWholeFilesystem(mount) || !IsVisible(mount, mounts) ||
             std::find(devices.begin(), devices.end(), mount.device) != devices.end()) {
             continue;
         }

@@ -20,8 +20,8 @@ struct Space {
 using SpaceDeviceLookup = std::function<std::string(const MountEntry &)>;
 
 // The spaces in table order: every filesystem on a block device, each by its first mount that shows
-// the whole of it (btrfs: a whole subvolume), is not covered by another mount at the same path and
-// has paths that fit.
+// the whole of it (btrfs: a whole subvolume), is not hidden by another mount and has paths that
+// fit.
 std::vector<Space> SpaceListSelect(const std::vector<MountEntry> &mounts,
                                    const SpaceDeviceLookup &deviceOf);
 } // namespace vesk

@@ -37,14 +37,15 @@ volume_make() {
     volume_configure
 }
 
-# volume_attach FILE: prints the loop device. The devices are the machine's, which makes new ones as they
+# volume_attach FILE: prints the loop device; LOOP_OPTIONS, words, go to losetup. The devices are the machine's, which makes new ones as they
 # are asked for; the nodes are the world's own. Another world may be faster with the device, once or twice.
 volume_attach() {
     local loop tries=0
     while [ "$tries" -lt 20 ]; do
         loop=$(losetup --find)
         [ -b "$loop" ] || mknod "$loop" b 7 "${loop#/dev/loop}"
-        if losetup "$loop" "$1" 2>/tmp/losetup.errors; then
+        # shellcheck disable=SC2086
+        if losetup ${LOOP_OPTIONS:-} "$loop" "$1" 2>/tmp/losetup.errors; then
             echo "$loop"
             return
         fi

@@ -3,9 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <fcntl.h>
-#include <linux/falloc.h>
-#include <linux/fiemap.h>
-#include <linux/fs.h>
 #include <linux/loop.h>
 #include <sched.h>
 #include <spawn.h>
@@ -15,7 +12,6 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdlib>
@@ -184,35 +180,6 @@ void TestFile::Fallocate(int mode, uint64_t offset, uint64_t length) {
 
 void TestFile::Sync() {
     EXPECT_EQ(fsync(fd.Get()), 0) << std::strerror(errno);
-}
-
-bool TestFile::LookBeforePlaced(uint64_t offset, uint64_t length,
-                                const std::function<void()> &look) {
-    for (int tries = 0; tries < 100; ++tries) {
-        Fallocate(FALLOC_FL_PUNCH_HOLE | FALLOC_FL_KEEP_SIZE, offset, length);
-        Write(offset, length);
-        look();
-        if (IsUnplaced(offset, length)) {
-            return true;
-        }
-    }
-    return false;
-}
-
-// What has got a place keeps it, so whoever looked before this has seen none either.
-bool TestFile::IsUnplaced(uint64_t offset, uint64_t length) const {
-    constexpr uint32_t kExtents = 16;
-    alignas(fiemap) std::array<char, sizeof(fiemap) + kExtents * sizeof(fiemap_extent)> memory = {};
-    auto *const map = reinterpret_cast<fiemap *>(memory.data());
-    map->fm_start = offset;
-    map->fm_length = length;
-    map->fm_extent_count = kExtents;
-    EXPECT_EQ(ioctl(fd.Get(), FS_IOC_FIEMAP, map), 0) << std::strerror(errno);
-    const fiemap_extent *const first = map->fm_extents;
-    return map->fm_mapped_extents > 0 &&
-           std::all_of(first, first + map->fm_mapped_extents, [](const fiemap_extent &extent) {
-               return (extent.fe_flags & FIEMAP_EXTENT_DELALLOC) != 0;
-           });
 }
 
 uint64_t TestFile::Inode() const {

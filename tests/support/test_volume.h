@@ -12,7 +12,6 @@
 #include <sys/types.h>
 
 #include <cstdint>
-#include <functional>
 #include <string>
 #include <vector>
 
@@ -75,16 +74,8 @@ public:
     void Sync();
     uint64_t Inode() const;
 
-    // Writes the range anew and looks at the file, as often as it takes for the range to have had
-    // no place on the device throughout a look: the kernel gives it one when it likes. False where
-    // it always does so at once.
-    bool LookBeforePlaced(uint64_t offset, uint64_t length, const std::function<void()> &look);
-
     const std::string path;
     const ScopedFd fd;
-
-private:
-    bool IsUnplaced(uint64_t offset, uint64_t length) const;
 };
 
 // The pattern that TestFile::Write puts at this place of a file.

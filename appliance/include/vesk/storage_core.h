@@ -6,8 +6,8 @@
 // names and the order of virtual functions are a binary interface: changing one breaks the other
 // library.
 //
-// Thread rule: no function keeps state between calls; calls from several threads are independent as
-// long as each uses its own list, device and table.
+// Thread rule: no function keeps state that a caller could see; calls from several threads are
+// independent as long as each uses its own list, device and table.
 #ifndef VESK_STORAGE_CORE_H
 #define VESK_STORAGE_CORE_H
 

@@ -8,6 +8,8 @@
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
+#include <filesystem>
+
 namespace vesk {
 namespace {
 class BlockDevice : public testing::Test {
@@ -95,6 +97,55 @@ TEST_F(BlockDevice, ProbeTellsTypeAndUuid) {
     EXPECT_EQ(BlockDeviceProbe(volume->device, "NO_SUCH_VALUE"), "");
     EXPECT_EQ(BlockDeviceProbe("/nonexistent", "UUID"), "");
     EXPECT_EQ(BlockDeviceProbe("", "UUID"), "");
+}
+
+// A folder as the kernel describes devices in, by number.
+class BlockDeviceOffset : public testing::Test {
+protected:
+    bool HasOffset(const std::string &file = "", const std::string &text = "") {
+        std::filesystem::remove_all(folder.Path("7:3"));
+        std::filesystem::create_directories(folder.Path("7:3/loop"));
+        std::filesystem::create_directories(folder.Path("7:3/dm"));
+        if (!file.empty()) {
+            folder.FileMake("7:3/" + file, text + "\n");
+        }
+        return BlockDeviceHasOffset(makedev(7, 3), folder.Path());
+    }
+    TestFolder folder;
+};
+
+TEST_F(BlockDeviceOffset, WholeDevicesHaveNone) {
+    EXPECT_FALSE(BlockDeviceHasOffset(makedev(7, 9), folder.Path())) << "nothing is known of it";
+    EXPECT_FALSE(HasOffset());
+    EXPECT_FALSE(HasOffset("loop/offset", "0"));
+    EXPECT_FALSE(HasOffset("loop/backing_file", "/run/vesk/cachedev_0"));
+    EXPECT_FALSE(HasOffset("dm/uuid", ""));
+    EXPECT_FALSE(HasOffset("dm/uuid", "FLASHCACHE-1"));
+}
+
+TEST_F(BlockDeviceOffset, PartsAndTranslationsOfOthersHaveOne) {
+    EXPECT_TRUE(HasOffset("partition", "1"));
+    EXPECT_TRUE(HasOffset("loop/offset", "1048576"));
+    EXPECT_TRUE(HasOffset("md", ""));
+    EXPECT_TRUE(HasOffset("bcache", ""));
+    EXPECT_TRUE(HasOffset("dm/uuid", "LVM-x"));
+    EXPECT_TRUE(HasOffset("dm/uuid", "CRYPT-LUKS2-x"));
+    EXPECT_TRUE(HasOffset("dm/uuid", "part1-mpath-x"));
+}
+
+TEST_F(BlockDevice, OffsetOfTheDeviceBelowCounts) {
+    const TestFolder folder;
+    const std::string below = std::to_string(major(number)) + ":" + std::to_string(minor(number));
+    std::filesystem::create_directories(folder.Path("7:300/loop"));
+    std::filesystem::create_directories(folder.Path(below + "/loop"));
+    folder.FileMake("7:300/loop/backing_file", volume->device + "\n");
+    EXPECT_FALSE(BlockDeviceHasOffset(makedev(7, 300), folder.Path()));
+    folder.FileMake(below + "/loop/offset", "512\n");
+    EXPECT_TRUE(BlockDeviceHasOffset(makedev(7, 300), folder.Path()));
+}
+
+TEST_F(BlockDevice, LoopDeviceOverAFileHasNoOffset) {
+    EXPECT_FALSE(BlockDeviceHasOffset(number));
 }
 } // namespace
 } // namespace vesk

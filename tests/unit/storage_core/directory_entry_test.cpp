@@ -88,6 +88,24 @@ TEST(DirectoryOpenFile, OpensNothingButRegularFilesOfThisDirectory) {
     EXPECT_TRUE(DirectoryOpenFile(below, InodeOfPath(inner)).IsOpen());
 }
 
+// The folder's files are remembered; what happens to them at once, within one tick of its clock,
+// must not be hidden by that.
+TEST(DirectoryOpenFile, SeesWhatHappensBetweenItsCalls) {
+    const TestFolder folder;
+    const uint64_t first = InodeOfPath(folder.FileMake("first", "text"));
+    ASSERT_TRUE(DirectoryOpenFile(folder.Path(), first).IsOpen());
+    for (int i = 0; i < 100; ++i) {
+        const std::string path = folder.FileMake("another", "text");
+        const uint64_t another = InodeOfPath(path);
+        ASSERT_TRUE(DirectoryOpenFile(folder.Path(), another).IsOpen()) << i;
+        std::filesystem::rename(path, folder.Path("renamed"));
+        ASSERT_TRUE(DirectoryOpenFile(folder.Path(), another).IsOpen()) << i;
+        ASSERT_TRUE(DirectoryOpenFile(folder.Path(), first).IsOpen()) << i;
+        std::filesystem::remove(folder.Path("renamed"));
+        ASSERT_FALSE(DirectoryOpenFile(folder.Path(), another).IsOpen()) << i;
+    }
+}
+
 TEST(DirectoryOpenFile, FailsOnWhatIsNoDirectory) {
     const TestFolder folder;
     const std::string path = folder.FileMake("file", "text");

@@ -24,7 +24,7 @@ constexpr char kTable[] =
     "30 27 254:2 /sub\\040dir /volume\\0401\\011a\\134b rw - ext4 /dev/disk/by\\040label rw\n"
     "31 27 0:40 /@ /data rw - btrfs /dev/vdc rw,subvolid=256,subvol=/@\n"
     "32 31 0:60 / /data/tmp rw - tmpfs tmpfs rw\n"
-    "33 27 0:61 / /data/tmp rw - tmpfs tmpfs2 rw\n";
+    "33 32 0:61 / /data/tmp rw - tmpfs tmpfs2 rw\n";
 
 TEST(MountTable, ReadsEveryFieldDecoded) {
     const std::vector<MountEntry> entries = TableOf(kTable);
@@ -71,6 +71,21 @@ TEST(MountTable, FindsByDeviceTheFirstMountThatIsNoAutomountPoint) {
     entries.back().id = 99;
     ASSERT_NE(MountFindByDevice(entries, makedev(254, 1)), nullptr);
     EXPECT_EQ(MountFindByDevice(entries, makedev(254, 1))->id, 29);
+}
+
+TEST(MountTable, FindsByPathNoMountThatALaterOneHides) {
+    const std::vector<MountEntry> entries = TableOf("27 1 254:0 / / rw - ext4 /dev/vda rw\n"
+                                                    "28 27 254:1 / /mnt/a/b rw - ext4 /dev/vdb rw\n"
+                                                    "29 27 0:60 / /mnt rw - tmpfs tmpfs rw\n"
+                                                    "30 29 254:2 / /mnt/a rw - ext4 /dev/vdc rw\n"
+                                                    "31 31 254:3 / /own rw - ext4 /dev/vdd rw\n");
+    const auto idOf = [&](const char *path) {
+        const MountEntry *mount = MountFindByPath(entries, path);
+        return mount == nullptr ? -1 : mount->id;
+    };
+    EXPECT_EQ(idOf("/mnt/a/b"), 30);
+    EXPECT_EQ(idOf("/mnt/b"), 29);
+    EXPECT_EQ(idOf("/own/file"), 27);
 }
 
 TEST(MountTable, FindsByPathTheLongestMountPoint) {

@@ -105,6 +105,15 @@ TEST(SpaceListSelect, CoveredMountIsNoSpace) {
               (Texts{"/dev/vdc /volume1", "/dev/vdd /volume1/inner"}));
 }
 
+TEST(SpaceListSelect, MountBelowAFolderThatIsMountedOverIsNoSpace) {
+    EXPECT_EQ(SpacesOf("27 1 254:0 / / rw - ext4 /dev/vda rw\n"
+                       "30 27 254:1 / /mnt/volume1 rw - ext4 /dev/vdb rw\n"
+                       "31 27 0:60 / /mnt rw - tmpfs tmpfs rw\n"
+                       "32 27 254:1 / /volume1 rw - ext4 /dev/vdb rw\n"
+                       "33 31 254:2 / /mnt/volume1 rw - ext4 /dev/vdc rw\n"),
+              (Texts{"/dev/vda /", "/dev/vdb /volume1", "/dev/vdc /mnt/volume1"}));
+}
+
 TEST(SpaceListSelect, PathsThatDoNotFitAreLeftOut) {
     const std::string fits127 = "/dev/" + std::string(122, 'd');
     const std::string fits511 = "/" + std::string(510, 'm');
