@@ -31,8 +31,9 @@ endif()
 
 add_library(vesk_options INTERFACE)
 add_library(vesk::options ALIAS vesk_options)
-# GNU interfaces (O_DIRECT, process_vm_readv) and 64-bit file offsets on every platform.
-target_compile_definitions(vesk_options INTERFACE _GNU_SOURCE _FILE_OFFSET_BITS=64)
+# GNU interfaces (O_DIRECT, process_vm_readv), 64-bit file offsets and times on every platform: with 32 bits
+# no file dated outside 1901 to 2038 can be asked for anything.
+target_compile_definitions(vesk_options INTERFACE _GNU_SOURCE _FILE_OFFSET_BITS=64 _TIME_BITS=64)
 target_compile_options(vesk_options INTERFACE
   -Wall -Wextra -Wconversion -Wshadow -ffunction-sections -fdata-sections)
 if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")

@@ -11,6 +11,11 @@ struct CommandCase {
     int status;
 };
 
+// Without it the test's description has the bytes of the pointers in it.
+void PrintTo(const CommandCase &one, std::ostream *out) {
+    *out << one.name;
+}
+
 class MainCommandTest : public MainTest, public ::testing::WithParamInterface<CommandCase> {};
 
 const CommandCase kCommandCases[] = {
