@@ -32,6 +32,16 @@ END
     same config.json "$(ls -A "${CONF%/*}")"
 }
 
+# The service cannot use it; the commands that look at the volumes alone can.
+refused_by_the_service() {
+    cp "$CONF" "$BATS_TEST_TMPDIR/before"
+    answers 0 --check-pin /volume1/a --config-path "$CONF" <<<No
+    says 0 --handle-mount --mount-path /nowhere --config-path "$CONF" \
+        <<<": Can't get space uuid from mount path (/nowhere)"
+    service_refused ''
+    cmp "$BATS_TEST_TMPDIR/before" "$CONF"
+}
+
 # The worker and the receiver both end, and with them the process.
 service_refused() {
     local status=0
@@ -81,8 +91,12 @@ END
 @test "members of another type" {
     local text
     for text in '{"requestQueue":{}}' '{"requestQueue":5}' '{"requestQueue":"0"}' \
-        '{"requests":[]}' '{"requests":"0"}' '{"volumes":[]}' '{"volumes":5}' \
+        '{"requests":[]}' '{"requests":"0"}' \
         '{"nextRequestNum":"one"}' '{"nextRequestNum":{}}' '{"nextRequestNum":[1]}'; do
+        put_config "$text"
+        refused_by_the_service
+    done
+    for text in '{"volumes":[]}' '{"volumes":5}'; do
         put_config "$text"
         refused
     done
@@ -93,8 +107,11 @@ END
     for text in '{"requestQueue":[{}]}' '{"requestQueue":["0",["1"]]}' '{"requests":{"0":[]}}' \
         '{"requests":{"0":5}}' '{"requests":{"0":{"type":{}}}}' \
         '{"requests":{"0":{"type":"ack","mountPath":[]}}}' \
-        '{"requests":{"0":{"type":"ack","mountPath":"/v","data":{"a":1}}}}' \
-        '{"volumes":{"/v":5}}' '{"volumes":{"/v":[]}}' '{"volumes":{"/v":{"files":[]}}}' \
+        '{"requests":{"0":{"type":"ack","mountPath":"/v","data":{"a":1}}}}'; do
+        put_config "$text"
+        refused_by_the_service
+    done
+    for text in '{"volumes":{"/v":5}}' '{"volumes":{"/v":[]}}' '{"volumes":{"/v":{"files":[]}}}' \
         '{"volumes":{"/v":{"files":"a"}}}' '{"volumes":{"/v":{"files":7}}}'; do
         put_config "$text"
         refused
@@ -105,7 +122,7 @@ END
     local text
     for text in 2147483648 -2147483649 4294967296 18446744073709551616 1e300 -1e300; do
         put_config "{\"nextRequestNum\":$text}"
-        refused
+        refused_by_the_service
     done
 }
 

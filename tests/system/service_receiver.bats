@@ -138,7 +138,7 @@ END
 @test "a request of type unknown is stored and ends the worker for good" {
     start_service
     find_worker
-    local worker=$WORKER
+    local worker=$WORKER_THREAD
     send_record 0 /volume1 ""
     wait_until request_is_stored 0
     wait_until thread_is_gone "$worker"
@@ -226,8 +226,8 @@ END
     same "{\"$(inode "x y")\":\"x\"}" "$(config '.volumes["/volume1"].files')"
     service_said <<END
 : Handle request (type=pinFiles files=x#$(inode "x y")) OK 
-: Get mapping result fail.
-: Can't add file (/volume1/x) inode (1) to bitmap
+: Parse file inode from string (x#1#$(inode "x#1")) failed
+: Can't parse file inodes from request's data (x#1#$(inode "x#1"))
 : Handle request failed
 : Handle request error (num = 1, type = pinFiles), drop it.
 END

@@ -45,14 +45,14 @@ messages_are_taken() { waiting_is 0 && receiver_waits; }
 # the next is the one that waits for signals.
 worker_rests() {
     find_worker
-    thread_is_in_call "$WORKER" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
+    thread_is_in_call "$WORKER_THREAD" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
 }
 find_worker() {
     local task
-    WORKER=
+    WORKER_THREAD=
     for task in /proc/"$SERVICE_PID"/task/*; do
         task=${task##*/}
-        [[ $task == *[!0-9]* || $task == "$SERVICE_PID" || (-n $WORKER && $task -gt $WORKER) ]] || WORKER=$task
+        [[ $task == *[!0-9]* || $task == "$SERVICE_PID" || (-n $WORKER_THREAD && $task -gt $WORKER_THREAD) ]] || WORKER_THREAD=$task
     done
 }
 
