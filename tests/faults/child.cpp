@@ -131,13 +131,18 @@ bool Child::IsQuiet() const {
         WorldRead(TaskPath(pid_, receiver + "/stat")).find(") Z ") == std::string::npos) {
         return false;
     }
-    // The worker is the last one; where it has ended that is one that waits for something else.
-    long newest = 0;
+    // The worker is the first of the others; where it has ended that is one that waits for
+    // something else, or the receiver alone is left.
+    long worker = 0;
     std::error_code gone;
     for (const auto &entry : std::filesystem::directory_iterator(TaskPath(pid_, ""), gone)) {
-        newest = std::max(newest, strtol(entry.path().filename().c_str(), nullptr, 10));
+        const long thread = strtol(entry.path().filename().c_str(), nullptr, 10);
+        if (thread != pid_ && (worker == 0 || thread < worker)) {
+            worker = thread;
+        }
     }
-    return IsInCall(pid_, std::to_string(newest), {kRequestWait, kSignalWait, kMessageWait});
+    return IsInCall(pid_, std::to_string(worker == 0 ? pid_ : worker),
+                    {kRequestWait, kSignalWait, kMessageWait});
 }
 
 bool Child::AwaitQuiet() const {
