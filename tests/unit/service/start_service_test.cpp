@@ -322,7 +322,8 @@ TEST_F(StartServiceTest, WithoutItsWorkerItDoesNotStart) {
     ChildProcess service({2}, Service([] {
                              pthread_attr_t attributes;
                              pthread_attr_init(&attributes);
-                             pthread_attr_setstacksize(&attributes, SIZE_MAX / 2 & ~size_t{0xFFFF});
+                             pthread_attr_setstacksize(&attributes,
+                                                       SIZE_MAX / 4 * 3 & ~size_t{0xFFFF});
                              pthread_setattr_default_np(&attributes);
                          }));
     EXPECT_EQ(service.AwaitEnd(), 42);
