@@ -1,5 +1,11 @@
 // The bitmap file: the raw bitmap bytes, byte 0 first, without header or checksum. It is read and
-// written in chunks of 4096 bytes. Thread rule: no state; a bitmap belongs to one thread at a time.
+// written in chunks of 4096 bytes.
+//
+// It lies where a volume's users may write. What they plant in its place is refused when it is
+// opened: a symbolic link, whose target is neither opened nor asked for its size, and a FIFO,
+// socket or device, for which nobody waits.
+//
+// Thread rule: no state; a bitmap belongs to one thread at a time.
 #pragma once
 
 #include "bitmap/pin_bitmap.h"

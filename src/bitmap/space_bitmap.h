@@ -16,8 +16,11 @@ int BitmapGetNeededSizeByte(const char *cachePath, uint64_t *sizeBytes);
 
 // Builds the space's bitmap; all zero where there is no bitmap file yet. A file shorter than the
 // bitmap (the volume has grown) fills its start and sets `*sizeChanged`; a longer one is a failure.
-// 0, or -1 after an error message. `*bitmap` must be null before the call; whatever it holds after
-// it, on failure too, the caller releases with BitmapFree. Nothing is written.
+// So is a look-up that fails otherwise than by "nothing there", since the file holds the volume's
+// pins, and what bitmap/bitmap_file.h refuses to open: a symbolic link in the file's place is
+// there, wherever it points. 0, or -1 after an error message. `*bitmap` must be null before the
+// call; whatever it holds after it, on failure too, the caller releases with BitmapFree. Nothing is
+// written.
 int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool *sizeChanged);
 
 // Holds a bitmap until its scope ends.

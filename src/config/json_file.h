@@ -12,8 +12,8 @@ namespace vesk {
 // comments and any text behind the document included. Throws std::bad_alloc for want of memory.
 int ReadFileToJson(const std::string &path, Json::Value *root);
 
-// Replaces the file's content by the document in styled form. 0, or -1 after an error message when
-// the file cannot be opened. A document that can be opened but not written whole (a full disk)
-// leaves the old one in place and is not reported: 0.
+// Replaces the file's content by the document in styled form (files/file_replace.h). 0, or -1 after
+// an error message with the old document in place. Only a write that fails for want of room is not
+// reported: 0, and the old document is in place as well. Throws std::bad_alloc, too.
 int WriteJsonToFile(const Json::Value &root, const char *path);
 } // namespace vesk

@@ -2,8 +2,9 @@
 //
 // One entry a file, joined by ";": the path relative to the volume (no leading "/"), "#", the inode
 // number in decimal; for instance share/a.txt#1234;share/b.bin#5678. At most 1023 characters.
-// Relative paths therefore cannot hold "#", ";" or white space: a path with "#" is stored, but its
-// entry cannot be read back, and the request fails when it is carried out.
+// Relative paths therefore cannot hold ";", white space or "#". A path with "#" is stored, but an
+// entry with a second "#" is none when it is read back, so that the number behind the first,
+// another file's perhaps, is never taken for the inode: the request fails when it is carried out.
 //
 // Thread rule: no state.
 #pragma once
@@ -19,9 +20,8 @@ struct FileInfo {
 };
 
 // Builds the list from absolute paths joined by ";" into `out` (`outSize` bytes with the NUL, at
-// least 1).
-// Empty pieces are skipped. 0, or -1 after an error message at the first path that does not lie
-// below `mountPath` or cannot be asked for its inode, or when the list does not fit.
+// least 1). Empty pieces are skipped. 0, or -1 after an error message at the first path that does
+// not lie below `mountPath` or cannot be asked for its inode, or when the list does not fit.
 int AbsolutePathsToFileInodeList(const char *mountPath, const char *absolutePaths, char *out,
                                  size_t outSize);
 
