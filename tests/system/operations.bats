@@ -26,8 +26,15 @@ block() { awk -v wanted="== $1" '/^== / { inside = $0 == wanted; next } inside' 
     for i in $(seq 40); do
         random "/volume1/photos/$i.raw" 4K
     done
-    touch "/volume1/photos/not this one"
+    mkdir "/volume1/photos/not these"
+    random "/volume1/photos/not this one" 4K
+    random "/volume1/photos/not these/1.raw" 4K
+    touch /volume1/photos/empty.raw
+    truncate -s 1M /volume1/photos/hole.raw
     sync
+    # The record of a file that is gone.
+    mkdir /run/operations
+    echo '{"volumes":{"/volume1":{"files":{"4000000000":"gone"}}}}' >/run/operations/pins.json
     {
         cat <<'END'
 set -eu
@@ -47,12 +54,16 @@ END
     }
     same Yes "$(block 3)"
     same Yes "$(block 5 | sed -n 1p)"
-    same 40 "$(block 5 | grep -c '^photos/')"
-    same 0 "$(block 5 | grep -c 'not this one')"
+    same "$({ echo gone && seq -f 'photos/%g.raw' 40; } | sort)" \
+        "$(block 5 | sed -n '2,/^[0-9]*$/{/^[0-9]*$/!p}' | sort)"
     same "$(volume_state 1 pinnedBlocks)" 0
     [ "$(block 6)" -ge 1 ]
-    same "$(block 8 | sed -n 1p)" "$(block 8 | sed -n 2p)"
-    same No "$(block 9)"
-    same "$threads" "$(block 11 | wc -l)"
+    same "{\"slots\":256,\"pinnedBlocks\":$(block 6)}" "$(block 7)"
+    same "$(block 9 | sed -n 1p)" "$(block 9 | sed -n 2p)"
+    same No "$(block 10)"
+    same "$threads" "$(block 12 | wc -l)"
     same 0 "$(grep -c '"photos/' /run/operations/pins.json)"
+    # The last block, which starts over: a volume of whose pins nothing is left.
+    same null "$(jq '.volumes["/volume1"]' /run/operations/pins.json)"
+    refute test -e /volume1/veskcachepinfile.bitmap
 }
