@@ -1,8 +1,8 @@
 // system_date file SECONDS PATH...
 // system_date clock [SECONDS]
 //
-// Dates files, or sets the machine's clock, in seconds from 1970 on; without a number, prints what the
-// clock shows. The tools of a 32-bit Debian know no moment past 2038.
+// Dates files, or sets the machine's clock, in seconds from 1970 on; without a number, prints what
+// the clock shows. The tools of a 32-bit Debian know no moment past 2038.
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
