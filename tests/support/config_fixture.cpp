@@ -88,6 +88,10 @@ void ConfigTest::TearDown() {
     LeakCheckedTest::TearDown();
 }
 
+std::string ConfigTest::Stored() const {
+    return std::filesystem::exists(path_) ? ReadWhole(path_) : kNoFile;
+}
+
 void ConfigTest::ExpectStored(const std::string &document) const {
     EXPECT_EQ(Stored(), ParseDocument(document).toStyledString());
 }

@@ -31,9 +31,9 @@ protected:
     void SetUp() override;
     void TearDown() override; // also: the service lock is free
 
-    // Writes the configuration file, and reads it back.
+    // Writes the configuration file, and reads it back: kNoFile where there is none.
     void Store(const std::string &text) const { WriteWhole(path_, text); }
-    std::string Stored() const { return ReadWhole(path_); }
+    std::string Stored() const;
     Json::Value StoredDocument() const { return ParseDocument(Stored()); }
     // Whether the file holds this document in the library's styled form.
     void ExpectStored(const std::string &document) const;
@@ -45,6 +45,8 @@ protected:
     const std::string path_ = folder_.Path("conf.json");
     const std::string volume_ = folder_.Path("volume1"); // a folder
 };
+
+inline const char kNoFile[] = "(no file)";
 
 // Two pins on /volume1 (0 is done, 1 is queued) and a reload request.
 extern const char kExampleDocument[];

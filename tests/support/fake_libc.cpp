@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <cstdarg>
 #include <cstddef>
+#include <cstring>
 #include <ctime>
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -24,12 +25,15 @@ int FakeLibc::sleeps = 0;
 int FakeLibc::alarmFactor = 1;
 int FakeLibc::clockFactor = 1;
 int FakeLibc::syncs = 0;
+std::function<void(long long)> FakeLibc::onAlarm;
+std::function<void()> FakeLibc::onPause;
 std::function<void()> FakeLibc::onSleep;
 std::function<void()> FakeLibc::onSync;
 std::function<void()> FakeLibc::onMsgctl;
 std::function<int(unsigned long, void *)> FakeLibc::onIoctl;
 std::function<void(struct stat *)> FakeLibc::onStat;
 std::function<void(int, long long, size_t)> FakeLibc::onRead;
+std::function<void(const std::string &, int, unsigned)> FakeLibc::onOpen;
 
 namespace {
 struct Order {
@@ -84,6 +88,15 @@ void SetOrder(const std::string &function, int error, int nth, bool onwards) {
     anyOrder = true;
 }
 
+// The mode among an open call's further arguments, and the note of the call.
+mode_t NoteOpen(const char *path, int flags, va_list arguments) {
+    const mode_t mode = (flags & O_CREAT) != 0 ? va_arg(arguments, mode_t) : 0;
+    if (FakeLibc::onOpen) {
+        FakeLibc::onOpen(path, flags, mode);
+    }
+    return mode;
+}
+
 template <typename Function> Function Real(const char *name) {
     return reinterpret_cast<Function>(dlsym(RTLD_NEXT, name));
 }
@@ -94,12 +107,15 @@ void FakeLibc::Reset() {
     alarmFactor = 1;
     clockFactor = 1;
     syncs = 0;
+    onAlarm = nullptr;
+    onPause = nullptr;
     onSleep = nullptr;
     onSync = nullptr;
     onMsgctl = nullptr;
     onIoctl = nullptr;
     onStat = nullptr;
     onRead = nullptr;
+    onOpen = nullptr;
     const std::lock_guard<std::mutex> lock(ordersMutex);
     Orders().clear();
     anyOrder = false;
@@ -181,12 +197,20 @@ using namespace vesk;
 
 extern "C" {
 
-unsigned sleep(unsigned /*seconds*/) {
-    ++FakeLibc::sleeps;
+unsigned sleep(unsigned seconds) {
+    FakeLibc::sleeps += static_cast<int>(seconds);
     if (FakeLibc::onSleep) {
         FakeLibc::onSleep();
     }
     return 0;
+}
+
+int usleep(useconds_t microseconds) {
+    if (FakeLibc::onPause) {
+        FakeLibc::onPause();
+    }
+    static const auto real = Real<int (*)(useconds_t)>("usleep");
+    return real(microseconds);
 }
 
 int clock_gettime(clockid_t clock, timespec *now) noexcept {
@@ -200,8 +224,11 @@ int clock_gettime(clockid_t clock, timespec *now) noexcept {
 int setitimer(__itimer_which_t which, const itimerval *value, itimerval *old) noexcept {
     static const auto real = Real<int (*)(__itimer_which_t, const itimerval *, itimerval *)>(
         TIME_SYMBOL("setitimer", "__setitimer64"));
-    const long long microseconds =
-        (value->it_value.tv_sec * 1000000LL + value->it_value.tv_usec) * FakeLibc::alarmFactor;
+    const long long asked = value->it_value.tv_sec * 1000000LL + value->it_value.tv_usec;
+    if (FakeLibc::onAlarm) {
+        FakeLibc::onAlarm(asked);
+    }
+    const long long microseconds = asked * FakeLibc::alarmFactor;
     itimerval later = *value;
     later.it_value.tv_sec = static_cast<time_t>(microseconds / 1000000);
     later.it_value.tv_usec = static_cast<suseconds_t>(microseconds % 1000000);
@@ -245,6 +272,25 @@ int msgsnd(int id, const void *message, size_t size, int flags) {
 
 key_t ftok(const char *path, int project) noexcept {
     PASS_OR_FAIL(-1, ftok, key_t(*)(const char *, int), path, project);
+}
+
+// Under whatever names the platform's 64-bit variants have.
+int open(const char *path, int flags, ...) {
+    va_list arguments;
+    va_start(arguments, flags);
+    const mode_t mode = NoteOpen(path, flags, arguments);
+    va_end(arguments);
+    static const auto real = Real<int (*)(const char *, int, ...)>("open64");
+    return real(path, flags, mode);
+}
+
+int openat(int folder, const char *path, int flags, ...) {
+    va_list arguments;
+    va_start(arguments, flags);
+    const mode_t mode = NoteOpen(path, flags, arguments);
+    va_end(arguments);
+    static const auto real = Real<int (*)(int, const char *, int, ...)>("openat64");
+    return real(folder, path, flags, mode);
 }
 
 ssize_t write(int fd, const void *data, size_t size) {
@@ -327,5 +373,9 @@ SignalAction signal(int number, SignalAction handler) noexcept {
 
 void *aligned_alloc(size_t alignment, size_t size) noexcept {
     PASS_OR_FAIL(nullptr, aligned_alloc, void *(*)(size_t, size_t), alignment, size);
+}
+
+char *strdup(const char *text) noexcept {
+    PASS_OR_FAIL(nullptr, strdup, char *(*)(const char *), text);
 }
 }

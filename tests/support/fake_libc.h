@@ -15,7 +15,7 @@ namespace vesk {
 struct FakeLibc {
     static void Reset();
 
-    // sleep() returns at once and calls onSleep; real: pass the time after all.
+    // sleep() returns at once, adds its seconds here and calls onSleep.
     static int sleeps;
     static std::function<void()> onSleep;
 
@@ -23,14 +23,17 @@ struct FakeLibc {
     // slower: a busy machine needs more time than the tool gives itself.
     static int alarmFactor;
     static int clockFactor;
+    // Told of what setitimer() is asked for (microseconds), and of every usleep().
+    static std::function<void(long long)> onAlarm;
+    static std::function<void()> onPause;
 
     static int syncs; // sync() only counts
     static std::function<void()> onSync;
 
     // The n-th next call (1: the next) of this function fails with this errno (a function that
-    // returns its error returns it; aligned_alloc returns null). Known: ioctl, msgctl, msgget,
-    // msgsnd, write, read, lseek, fsync, rename, fchown, pthread_mutex_init, pthread_create,
-    // signal, aligned_alloc, ftok, stat (lstat is one, too).
+    // returns its error returns it; aligned_alloc and strdup return null). Known: ioctl, msgctl,
+    // msgget, msgsnd, write, read, lseek, fsync, rename, fchown, pthread_mutex_init,
+    // pthread_create, signal, aligned_alloc, strdup, ftok, stat (lstat is one, too).
     static void Fail(const std::string &function, int error, int nth = 1);
     // The same for every call from the n-th on.
     static void FailFrom(const std::string &function, int error, int nth = 1);
@@ -53,5 +56,9 @@ struct FakeLibc {
     // Told of every read before it happens: descriptor, its position (bytes; -1 where there is
     // none), bytes asked for.
     static std::function<void(int, long long, size_t)> onRead;
+
+    // Told of every open() and openat() before it happens: path as given, flags, and the mode that
+    // a file to be created gets (0 without O_CREAT).
+    static std::function<void(const std::string &, int, unsigned)> onOpen;
 };
 } // namespace vesk

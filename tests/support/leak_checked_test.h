@@ -1,11 +1,13 @@
 // The fixture of tests that drive the tool's code against the fakes: everything starts as declared,
 // and at the end nothing may be left: no record of the appliance's libraries, no open descriptor.
 //
-// Messages go to standard output, never to the machine's log; hold a CapturedLog to read them.
+// Messages go to standard output, never to the machine's log; hold a CapturedLog to read them. Each
+// must be one of the tool's, of the right class and place (message_check.h).
 #pragma once
 
 #include "tests/support/fake_appliance.h"
 #include "tests/support/fake_libc.h"
+#include "tests/support/message_check.h"
 
 #include "base/log.h"
 
@@ -26,6 +28,7 @@ protected:
         LogLevel = 1;
         FakeAppliance::Reset();
         FakeLibc::Reset();
+        CheckMessages();
         descriptors_ = CountOpenDescriptors();
     }
     void TearDown() override {
@@ -34,6 +37,7 @@ protected:
         EXPECT_EQ(FakeAppliance::liveStats, 0);
         EXPECT_EQ(FakeAppliance::liveDevices, 0);
         EXPECT_EQ(CountOpenDescriptors(), descriptors_);
+        CheckNoMessages();
         FakeLibc::Reset();
     }
 

@@ -3,6 +3,7 @@
 
 #include <fstream>
 #include <iterator>
+#include <linux/futex.h>
 #include <string>
 #include <sys/types.h>
 
@@ -14,5 +15,19 @@ inline bool ThreadSleeps(pid_t process, pid_t thread) {
                        "/stat");
     const std::string status((std::istreambuf_iterator<char>(file)), {});
     return status.rfind(") S") != std::string::npos;
+}
+
+// Whether this thread waits for a condition, as opposed to a lock, and does so without a limit of
+// time. Told by the arguments of the call that it is in.
+inline bool ThreadAwaitsConditionForGood(pid_t process, pid_t thread) {
+    std::ifstream file("/proc/" + std::to_string(process) + "/task/" + std::to_string(thread) +
+                       "/syscall");
+    std::string number; // differs from machine to machine
+    unsigned long long word = 0;
+    unsigned long long operation = 0;
+    unsigned long long value = 0;
+    unsigned long long limit = 0; // an address
+    return file >> number >> std::hex >> word >> operation >> value >> limit &&
+           (operation & FUTEX_CMD_MASK) == FUTEX_WAIT_BITSET && limit == 0;
 }
 } // namespace vesk

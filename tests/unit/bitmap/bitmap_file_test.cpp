@@ -3,6 +3,7 @@
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
 #include "tests/support/private_mounts.h"
+#include "tests/support/recorded_opens.h"
 #include "tests/support/temp_dir.h"
 
 #include <cerrno>
@@ -74,6 +75,15 @@ TEST_F(BitmapInitByFileTest, ReadsChunksOf4096Bytes) {
                         "BitmapInitByFile() [N]: Next read start = 4096 bytes=4096",
                         "BitmapInitByFile() [N]: Next read start = 8192 bytes=1808",
                         "BitmapInitByFile() [N]: Read to memory finish"}));
+}
+
+// Whatever lies there: no link is followed and nothing is waited for.
+TEST_F(BitmapInitByFileTest, OpensTheFileForReading) {
+    WriteWhole(path, Pattern(10));
+    const RecordedOpens opens;
+    EXPECT_EQ(Read(10), 0);
+    EXPECT_EQ(opens.FlagsOf(path),
+              std::vector<int>{O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC});
 }
 
 TEST_F(BitmapInitByFileTest, ShorterFileFillsTheStart) {
@@ -210,6 +220,13 @@ TEST_F(BitmapWriteToFileTest, WritesChunksOf4096BytesAndDoesNotSync) {
     EXPECT_EQ(Write(Pattern(8193)), 0);
     EXPECT_EQ(FakeLibc::Calls("write"), 3);
     EXPECT_EQ(FakeLibc::Calls("fsync"), 0);
+}
+
+TEST_F(BitmapWriteToFileTest, OpensTheFileForReadingAndWriting) {
+    const RecordedOpens opens;
+    EXPECT_EQ(Write(Pattern(10)), 0);
+    EXPECT_EQ(opens.FlagsOf(path),
+              std::vector<int>{O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC});
 }
 
 TEST_F(BitmapWriteToFileTest, EmptyBitmapMakesAnEmptyFile) {

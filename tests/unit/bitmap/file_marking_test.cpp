@@ -24,9 +24,11 @@ protected:
         AnswerWith(
             0, {FakeExtent(0, 128, 0), FakeExtent(128, 10, 1150, 1), FakeExtent(138, 256, 384)});
     }
-    int Add() { return BitmapAddFile(&bitmap, "/volume1", kFile, 4711, &table); }
-    int Unset() {
-        return UnsetBitmapAndAppendUnpinInfos(nullptr, &bitmap, "/volume1", kFile, 4711, &infos);
+    int Add(uint32_t inode = 4711) {
+        return BitmapAddFile(&bitmap, "/volume1", kFile, inode, &table);
+    }
+    int Unset(uint32_t inode = 4711) {
+        return UnsetBitmapAndAppendUnpinInfos(nullptr, &bitmap, "/volume1", kFile, inode, &infos);
     }
     void ExpectBytes(unsigned char first, unsigned char second) {
         EXPECT_EQ(bytes[0], first);
@@ -66,6 +68,20 @@ TEST_F(BitmapAddFileTest, HandsOutACopyOfTheExtents) {
     EXPECT_EQ(table.entries[1].numSectors, 10U);
     EXPECT_EQ(table.entries[1].deviceStartSector, 1150U);
     EXPECT_EQ(table.entries[1].flag, 1U);
+}
+
+TEST_F(FileMarkingTest, InodeIsHandedOnWhole) {
+    CapturedLog log;
+    std::vector<uint64_t> asked;
+    FakeAppliance::onLookup = [&asked](const std::string &, uint64_t inode, int,
+                                       FileMappingTable &answer) {
+        asked.push_back(inode);
+        answer.entries = {FakeExtent(0, 128, 0)};
+        return 0;
+    };
+    EXPECT_EQ(Add(4294967294), 0);
+    EXPECT_EQ(Unset(4294967293), 0);
+    EXPECT_EQ(asked, (std::vector<uint64_t>{4294967294, 4294967293}));
 }
 
 TEST_F(BitmapAddFileTest, KeepsTheBitsOfOtherFiles) {

@@ -303,6 +303,9 @@ TEST_F(SpaceBitmapTest, VolumeNamesTheStepThatFailedAtTheCallersPlace) {
     };
     RefuseDeviceSize();
     EXPECT_EQ(lastMessage(true), "Caller() [N] : ***** Allocate bitmap failed");
+    FakeAppliance::onConfigLookup = [] { FakeAppliance::spaces.clear(); }; // meanwhile
+    EXPECT_EQ(lastMessage(false), "Caller() [N] : ***** Can't get bitmap path");
+    FakeApplianceOneVolume("/dev/null", folder.Path());
     FakeAppliance::caches[0].cachePathResult = 0;
     EXPECT_EQ(lastMessage(false), "Caller() [N] : ***** Can't get cache path");
     FakeAppliance::spaces[0].uuid = "";

@@ -9,12 +9,16 @@
 
 namespace vesk {
 int FakeCommands::result = 0;
+std::function<void()> FakeCommands::onOperation;
 uint64_t FakeCommands::bitmapSize = 0;
 
 namespace {
 int Answer(const char *operation, const char *first, const char *second = nullptr) {
     printf("[%s %s", operation, first == nullptr ? "-" : first);
     printf(second == nullptr ? "]\n" : " %s]\n", second);
+    if (FakeCommands::onOperation) {
+        FakeCommands::onOperation();
+    }
     return FakeCommands::result;
 }
 

@@ -3,10 +3,12 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 
 namespace vesk {
 struct FakeCommands {
-    static int result;          // of every operation
-    static uint64_t bitmapSize; // bytes; what GetBitmapSizeByte finds
+    static int result;                        // of every operation
+    static std::function<void()> onOperation; // called by each, where set
+    static uint64_t bitmapSize;               // bytes; what GetBitmapSizeByte finds
 };
 } // namespace vesk

@@ -82,6 +82,7 @@ protected:
     void SetUp() override {
         LeakCheckedTest::SetUp();
         FakeCommands::result = 0;
+        FakeCommands::onOperation = nullptr;
         FakeCommands::bitmapSize = 0;
     }
 

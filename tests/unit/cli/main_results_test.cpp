@@ -2,6 +2,9 @@
 // appliance answer as the test says.
 #include "tests/unit/cli/main_fixture.h"
 
+#include <json/value.h>
+#include <new>
+
 namespace vesk {
 TEST_F(MainTest, BitmapSizeIsANumberAndALineFeed) {
     FakeCommands::bitmapSize = 18446744073709551615ULL;
@@ -58,6 +61,30 @@ TEST_F(MainTest, IsAllUnpinOnACacheThatCannotTellSaysSoAndFails) {
     FakeLibc::onIoctl = [](unsigned long, void *) { return -1; };
     const Outcome run = Tool({"--is-all-unpin", "/dev/null"});
     EXPECT_EQ(run.output, "Get unpin information failed. (This cache doesn't support pin ?)\n");
+    EXPECT_EQ(run.status, 255);
+}
+
+TEST_F(MainTest, MemoryThatRunsOutIsAnErrorAndEndsWith255) {
+    FakeCommands::onOperation = [] { throw std::bad_alloc(); };
+    Outcome run = ToolWith(0, Arguments{"--check-bitmap"} + kMount); // otherwise always 0
+    EXPECT_EQ(run.output, "[CheckBitmapSet /volume1]\ntool: Out of memory\n");
+    EXPECT_EQ(run.status, 255);
+    run = ToolWith(0, {"--check-pin", "/", "--config-path", "c"});
+    EXPECT_EQ(run.output, "[CheckFileIsPin c /]\ntool: Out of memory\n");
+    EXPECT_EQ(run.status, 255);
+}
+
+TEST_F(MainTest, MemoryThatTheJsonLibraryMissesIsTheSame) {
+    FakeCommands::onOperation = [] { throw Json::RuntimeError("no room"); };
+    const Outcome run = ToolWith(0, {"--check-pin", "/", "--config-path", "c"});
+    EXPECT_EQ(run.output, "[CheckFileIsPin c /]\ntool: Out of memory\n");
+    EXPECT_EQ(run.status, 255);
+}
+
+TEST_F(MainTest, MemoryThatRunsOutWhileOptionsAreParsedIsTheSame) {
+    FakeAppliance::onConfigLookup = [] { throw std::bad_alloc(); };
+    const Outcome run = ToolWith(0, {"--space-uuid", "uuid-1"});
+    EXPECT_EQ(run.output, "tool: Out of memory\n");
     EXPECT_EQ(run.status, 255);
 }
 

@@ -34,6 +34,18 @@ TEST_F(CheckFilePinTest, ARecordedInodeIsPinned) {
     EXPECT_EQ(log.Messages(), Messages{});
 }
 
+TEST_F(CheckFilePinTest, AnInodeIsComparedByItsLow32Bits) {
+    FakeLibc::onStat = [](struct stat *status) {
+        status->st_ino = static_cast<ino_t>(0x5FFFFFFFEULL);
+    };
+    CapturedLog log;
+    StoreFiles(R"({"4294967294" : "file"})");
+    EXPECT_EQ(Check(), PinCheck::Pinned);
+    StoreFiles(R"({"25769803774" : "file", "65534" : "file", "-2" : "file"})");
+    EXPECT_EQ(Check(), PinCheck::NotPinned);
+    EXPECT_EQ(log.Messages(), Messages{});
+}
+
 TEST_F(CheckFilePinTest, TheTopDirectoryIsLoggedAtLevel2) {
     StoreFiles("{}");
     CapturedLog log(2);

@@ -2,6 +2,8 @@
 
 #include "tests/unit/commands/volume_events_fixture.h"
 
+#include <cerrno>
+
 namespace vesk {
 TEST_F(VolumeEventsTest, DeleteBitmapDeletesTheFileAndNothingElse) {
     WriteWhole(bitmapFile_, "ab");
@@ -40,6 +42,15 @@ TEST_F(VolumeEventsTest, DeleteBitmapRemovesALinkAndNotItsTarget) {
     EXPECT_EQ(DeleteBitmap(Volume()), 0);
     EXPECT_FALSE(std::filesystem::exists(bitmapFile_));
     EXPECT_EQ(ReadWhole(elsewhere), "ab");
+}
+
+TEST_F(VolumeEventsTest, DeleteBitmapWithoutMemoryForThePathFails) {
+    WriteWhole(bitmapFile_, "ab");
+    FakeLibc::Fail("strdup", ENOMEM);
+    CapturedLog log(2);
+    EXPECT_EQ(DeleteBitmap(Volume()), -1);
+    EXPECT_EQ(log.Messages(), Messages{"DeleteBitmap() [N] : ***** Can't get bitmap path"});
+    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
 }
 
 TEST_F(VolumeEventsTest, DeleteBitmapFailsOnWhatCannotBeUnlinked) {

@@ -3,6 +3,7 @@
 #include "tests/support/ordinary_user.h"
 #include "tests/unit/commands/volume_events_fixture.h"
 
+#include <cerrno>
 #include <json/reader.h>
 #include <sstream>
 #include <sys/stat.h>
@@ -140,6 +141,18 @@ TEST_F(HandleMountTest, MountThatCannotDeleteTheBitmapHasRemovedTheRecords) {
                               }));
     EXPECT_FALSE(Parse(ReadWhole(config_))["volumes"].isMember(volume_));
     EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
+}
+
+TEST_F(HandleMountTest, MountWithoutMemoryForTheBitmapPathHasRemovedTheRecords) {
+    FakeAppliance::caches.clear();
+    WriteWhole(bitmapFile_, "ab");
+    FakeLibc::Fail("strdup", ENOMEM, 2); // behind the UUID in the library
+    CapturedLog log(2);
+    EXPECT_EQ(Mount(), -1);
+    EXPECT_EQ(LastOf(log.Messages()),
+              "HandleSpaceMount() [N] : ***** Can't get volume (" + volume_ + ")'s bitmap path");
+    EXPECT_EQ(ReadWhole(bitmapFile_), "ab");
+    EXPECT_FALSE(Parse(ReadWhole(config_))["volumes"].isMember(volume_));
 }
 
 TEST_F(HandleMountTest, MountOfAnUnknownVolumeRemovesItsRecords) {

@@ -71,6 +71,15 @@ TEST_F(ModifyBitmapTest, WithoutTheSpaceItFails) {
               }));
 }
 
+TEST_F(ModifyBitmapTest, ASpaceThatHasGoneMeanwhileHasNoBitmapPath) {
+    FakeAppliance::onConfigLookup = [] { FakeAppliance::spaces.clear(); };
+    CapturedLog log(2);
+    EXPECT_EQ(SetBitmap(Volume(), 0, 128), -1);
+    EXPECT_EQ(MessagesOf(log, "ModifyBitmap"),
+              Messages{"ModifyBitmap() [N] : ***** Can't get bitmap path"});
+    EXPECT_EQ(device_->events, Events{});
+}
+
 TEST_F(ModifyBitmapTest, FailuresNameTheirFunctions) {
     FakeAppliance::caches.clear();
     CapturedLog log(2);

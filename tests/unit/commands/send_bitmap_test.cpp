@@ -71,6 +71,16 @@ TEST_F(SendBitmapTest, SendBitmapOfAVolumeWithoutPinningFails) {
     EXPECT_EQ(device_->events, Events{});
 }
 
+TEST_F(SendBitmapTest, SendBitmapOfASpaceThatHasGoneMeanwhileFails) {
+    FakeAppliance::onConfigLookup = [] { FakeAppliance::spaces.clear(); };
+    CapturedLog log(2);
+    EXPECT_EQ(SendBitmap(Volume()), -1);
+    EXPECT_EQ(MessagesOf(log, "SendBitmap"),
+              Messages{"SendBitmap() [N] : ***** Can't get space uuid from reference path (" +
+                       volume_ + ")"});
+    EXPECT_EQ(device_->events, Events{});
+}
+
 TEST_F(SendBitmapTest, SendBitmapWithoutACachePathFails) {
     FakeAppliance::caches[0].cachePathResult = 0;
     CapturedLog log;

@@ -90,6 +90,18 @@ TEST_F(UnpinAllTest, ADriverThatRefusesFailsBoth) {
         }));
 }
 
+TEST_F(UnpinAllTest, TheRequestCarriesNoArgument) {
+    device_->failingRequest = 0xFED1;
+    CapturedLog log;
+    EXPECT_EQ(UnpinAllBlocksByCachePath(Device()), -1);
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Ioctl Error: Send ioctl 65233 Data ((nil)) size (0) to " +
+                                      device_->Path() + ", ret=-1",
+                                  "",
+                                  "Ioctl for unpin all cache blocks failed",
+                              }));
+}
+
 TEST_F(UnpinAllTest, AMissingDeviceFails) {
     CapturedLog log;
     EXPECT_EQ(UnpinAllBlocksByCachePath("/missing/device"), -1);

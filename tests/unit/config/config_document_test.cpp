@@ -117,6 +117,7 @@ TEST_F(ConfigDocumentTest, AnUpdateOfAMissingFileHasThreeOutcomes) {
     EXPECT_EQ(log.Messages(),
               (Messages{"Caller() [N]: No config file (" + path_ + "), skip it",
                         "Caller() [N] : ***** Can't find config file (" + path_ + ")"}));
+    EXPECT_EQ(Stored(), kNoFile);
     EXPECT_EQ(ConfigUpdate(path_.c_str(), MissingConfig::Created, AddMember, kCaller), 0);
     ExpectStored(R"({"new" : 1})");
 }

@@ -33,6 +33,7 @@ TEST_F(JsonFileTest, ReadingAMissingFileFails) {
     Json::Value root;
     EXPECT_EQ(ReadFileToJson(path_, &root), -1);
     EXPECT_EQ(log.Messages(), Messages{"Can't open file " + path_});
+    EXPECT_EQ(Stored(), kNoFile);
 }
 
 TEST_F(JsonFileTest, ReadingAnUnreadableFileFails) {
@@ -123,6 +124,16 @@ TEST_F(JsonFileTest, TextBehindTheDocumentIsLeftAlone) {
         EXPECT_EQ(root, ParseDocument("{\"a\" : 1}")) << text;
         EXPECT_EQ(log.Messages(), Messages{});
     }
+}
+
+TEST_F(JsonFileTest, CommentsStayInTheFile) {
+    Store("// before\n{\"a\":1, // behind a\n/* before b */\"b\":2}");
+    Json::Value root;
+    ASSERT_EQ(ReadFileToJson(path_, &root), 0);
+    root["c"] = 3;
+    ASSERT_EQ(WriteJsonToFile(root, path_.c_str()), 0);
+    EXPECT_EQ(Stored(), "\n// before\n{\n\t\"a\" : 1, // behind a\n\t/* before b */\n\t\"b\" : 2,"
+                        "\n\t\"c\" : 3\n}\n");
 }
 
 TEST_F(JsonFileTest, WritingCreatesAMissingFile) {

@@ -71,7 +71,7 @@ TEST_F(PinnedFilesCycleTest, WithoutAFileItFails) {
     CapturedLog log;
     EXPECT_EQ(Finish(pin_, "1"), -1);
     EXPECT_EQ(log.Messages(), Messages{"Can't find config file (" + path_ + ")"});
-    EXPECT_EQ(Stored(), "");
+    EXPECT_EQ(Stored(), kNoFile);
 }
 
 TEST_F(PinnedFilesCycleTest, WithADamagedFileItFails) {
@@ -94,6 +94,17 @@ TEST_F(PinnedFilesCycleTest, AListThatDoesNotParseFailsAndWritesNothing) {
                                   "Can't update pin file list",
                               }));
     EXPECT_EQ(Stored(), kExampleDocument);
+}
+
+TEST_F(PinnedFilesCycleTest, TheRecordsComeBeforeTheRequest) {
+    Store(kExampleDocument);
+    CapturedLog log;
+    EXPECT_EQ(Finish(MakeRecord(kRequestPinFiles, "/volume1", "b"), "7"), -1); // nor is it queued
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Parse file inode from string (b) failed",
+                                  "Can't get file infos",
+                                  "Can't update pin file list",
+                              }));
 }
 
 TEST_F(PinnedFilesCycleTest, ARequestThatIsNotQueuedFailsAndWritesNothing) {
@@ -125,7 +136,7 @@ TEST_F(PinnedFilesCycleTest, RemovingAVolumeWithoutAFileSucceedsAndCreatesNothin
     EXPECT_EQ(RemoveVolume(), 0);
     EXPECT_EQ(log.Messages(),
               Messages{"ConfigRemovePinFileVolume() [N]: No config file (" + path_ + "), skip it"});
-    EXPECT_EQ(Stored(), "");
+    EXPECT_EQ(Stored(), kNoFile);
 }
 
 TEST_F(PinnedFilesCycleTest, RemovingAVolumeKeepsItsQueuedRequests) {

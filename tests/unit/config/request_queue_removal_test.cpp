@@ -116,6 +116,7 @@ TEST_F(RequestRemovalTest, DroppingWithoutAFileFails) {
     EXPECT_EQ(
         log.Messages(),
         Messages{"ConfigDropErrorRequest() [N] : ***** Can't find config file (" + path_ + ")"});
+    EXPECT_EQ(Stored(), kNoFile);
 }
 
 TEST_F(RequestRemovalTest, DroppingFromADamagedFileFails) {

@@ -124,7 +124,7 @@ TEST_F(RequestQueueTest, AFileThatDoesNotExistRefusesTheRequest) {
 TEST_F(RequestQueueTest, ARefusedFirstRequestCreatesNoFile) {
     CapturedLog log;
     EXPECT_EQ(Add(MakeRecord(kRequestUnpinFiles, volume_, "/elsewhere/a")), -1);
-    EXPECT_EQ(Stored(), "");
+    EXPECT_EQ(Stored(), kNoFile);
     EXPECT_TRUE(log.Has("Get relative paths failed"));
 }
 

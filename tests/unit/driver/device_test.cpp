@@ -3,6 +3,7 @@
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
 #include "tests/support/open_file.h"
+#include "tests/support/recorded_opens.h"
 #include "tests/support/temp_dir.h"
 
 #include <cerrno>
@@ -58,9 +59,11 @@ TEST_F(DeviceGetSizeByteTest, OpensTheDeviceReadOnly) {
         flags = OpenFileFlags(device);
         return 0;
     };
+    const RecordedOpens opens;
     ASSERT_EQ(DeviceGetSizeByte(device.c_str(), &size), 0);
     ASSERT_NE(flags, -1);
     EXPECT_EQ(flags & O_ACCMODE, O_RDONLY);
+    EXPECT_EQ(opens.FlagsOf(device), std::vector<int>{O_RDONLY | O_CLOEXEC});
     EXPECT_EQ(OpenFileFlags(device), -1); // closed again
 }
 
@@ -126,10 +129,12 @@ TEST_F(DoIoctlTest, OpensTheDeviceForReadingAndWritingForEachRequest) {
         flags = OpenFileFlags(device);
         return 0;
     };
-    for (int i = 0; i < 2; ++i) {
+    const RecordedOpens opens;
+    for (int i = 1; i <= 2; ++i) {
         ASSERT_EQ(DoIoctl(device.c_str(), 0xFED1, nullptr, 0), 0);
         ASSERT_NE(flags, -1);
         EXPECT_EQ(flags & O_ACCMODE, O_RDWR);
+        EXPECT_EQ(opens.FlagsOf(device), std::vector<int>(i, O_RDWR | O_CLOEXEC));
         EXPECT_EQ(OpenFileFlags(device), -1); // closed again
     }
 }

@@ -2,6 +2,7 @@
 
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
+#include "tests/support/ordinary_user.h"
 #include "tests/support/private_mounts.h"
 #include "tests/support/temp_dir.h"
 
@@ -99,10 +100,25 @@ TEST_F(FileTextTest, ReadSaysWhatItFoundAtLevel2) {
 TEST_F(FileTextTest, ReadFailsWhereTheFileCannotBeOpened) {
     CapturedLog log(2);
     std::string text = "before";
-    EXPECT_EQ(FileReadString("/no/such", &text), -1);
+    EXPECT_EQ(FileReadString(path.c_str(), &text), -1);
     EXPECT_EQ(text, "before");
-    EXPECT_EQ(log.Messages(),
-              std::vector<std::string>{"FileReadString() [N] : ***** Can't open file (/no/such)"});
+    EXPECT_EQ(log.Messages(), std::vector<std::string>{
+                                  "FileReadString() [N] : ***** Can't open file (" + path + ")"});
+    EXPECT_FALSE(std::filesystem::exists(path));
+}
+
+TEST_F(FileTextTest, ReadsWhatMayOnlyBeRead) {
+    WriteWhole(path, "123");
+    ASSERT_EQ(chmod(folder.Path().c_str(), 0755), 0);
+    ASSERT_EQ(chmod(path.c_str(), 0444), 0);
+    CapturedLog log;
+    std::string text;
+    {
+        const OrdinaryUser user;
+        EXPECT_EQ(FileReadString(path.c_str(), &text), 0);
+    }
+    EXPECT_EQ(text, "123");
+    EXPECT_EQ(log.Text(), "");
 }
 
 TEST_F(FileTextTest, ReadFailsOnAnEmptyFileAndOnAFolder) {

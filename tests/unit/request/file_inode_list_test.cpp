@@ -3,6 +3,7 @@
 #include "tests/support/config_fixture.h"
 
 #include <filesystem>
+#include <sys/stat.h>
 
 namespace vesk {
 class FileInodeListTest : public ConfigTest {
@@ -25,6 +26,13 @@ TEST_F(FileInodeListTest, EachFileGivesRelativePathAndInode) {
     EXPECT_EQ(MakeList(volume_ + "/share/a.txt;" + volume_ + "/b"), 0);
     EXPECT_EQ(list_, "share/a.txt#" + a + ";b#" + b);
     EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(FileInodeListTest, TheLargestInodeIsListedWhole) {
+    CreateFile("a");
+    FakeLibc::onStat = [](struct stat *status) { status->st_ino = UINT32_MAX; };
+    EXPECT_EQ(MakeList(volume_ + "/a"), 0);
+    EXPECT_EQ(list_, "a#4294967295");
 }
 
 TEST_F(FileInodeListTest, EmptyPiecesAreSkipped) {

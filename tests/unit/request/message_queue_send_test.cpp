@@ -175,6 +175,14 @@ TEST_F(MessageQueueSendTest, TextsThatFillTheirFieldsHaveNoNul) {
     EXPECT_EQ(message.text, std::string("\1\0\0\0", 4) + std::string(512 + 1024, 'x'));
 }
 
+TEST_F(MessageQueueSendTest, AMountPathOf512CharactersIsSentWhole) {
+    for (const size_t length : {size_t{511}, size_t{512}}) {
+        const std::string mountPath(length, 'm');
+        EXPECT_EQ(SendRequest(queueId_, 6, mountPath.c_str(), nullptr, kCaller), 0);
+        EXPECT_EQ(TakeMessage(queueId_).text, RecordBytes(6, mountPath));
+    }
+}
+
 TEST_F(MessageQueueSendTest, ARequestThatCannotBeSentFailsAtTheCallersPlace) {
     CapturedLog log(2);
     EXPECT_EQ(SendRequest(-1, 1, "/volume1", nullptr, kCaller), -1);

@@ -240,6 +240,7 @@ TEST_F(MessageQueueTest, AKeyFileThatCannotBeReadGivesNoKey) {
     CapturedLog log(2);
     EXPECT_EQ(GetMsgKey(&key, KeyFile()), -1);
     EXPECT_EQ(key, 99);
+    EXPECT_FALSE(std::filesystem::exists(keyFile_));
     EXPECT_EQ(
         MessagesOf(log, "GetMsgKey"),
         Messages{"GetMsgKey() [N] : ***** Can't get message key from file (" + keyFile_ + ")"});

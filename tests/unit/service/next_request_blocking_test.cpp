@@ -3,8 +3,12 @@
 #include "config/request_queue.h"
 #include "state/service_state.h"
 #include "tests/support/config_fixture.h"
+#include "tests/support/thread_state.h"
 
+#include <atomic>
+#include <sys/syscall.h>
 #include <thread>
+#include <unistd.h>
 
 namespace vesk {
 // The selection on a thread of its own; it ends when it has found something.
@@ -16,6 +20,7 @@ protected:
     }
     void Start() {
         selection_ = std::thread([this] {
+            thread_ = static_cast<pid_t>(syscall(SYS_gettid));
             result_ = ConfigParseAndGetNextAvailableRequest(path_.c_str(), &record_, &num_);
         });
     }
@@ -29,6 +34,7 @@ protected:
         ServiceUnlock();
     }
     std::thread selection_;
+    std::atomic<pid_t> thread_{0};
     RequestRecord record_{};
     std::string num_;
     NextRequest result_ = NextRequest::None;
@@ -38,6 +44,7 @@ TEST_F(NextRequestBlockingTest, WithoutAFileItWaitsForTheFirstRequest) {
     CapturedLog log(2);
     Start();
     AwaitWaiting(log, 1);
+    EXPECT_EQ(Stored(), kNoFile);
     const RequestRecord reload = MakeRecord(kRequestReloadPinBlocks, "/volume1");
     ASSERT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
     ServiceSignalRequest();
@@ -53,6 +60,22 @@ TEST_F(NextRequestBlockingTest, WithoutAFileItWaitsForTheFirstRequest) {
                   "ConfigParseAndGetNextAvailableRequest() [N]: Get request (request num = 0 type "
                   "= reloadPinBlocks data = ",
               }));
+}
+
+TEST_F(NextRequestBlockingTest, ItWaitsForASignalAndForNothingElse) {
+    CapturedLog log(2);
+    Start();
+    AwaitWaiting(log, 1);
+    while (!ThreadSleeps(getpid(), thread_)) {
+        std::this_thread::yield();
+    }
+    EXPECT_TRUE(ThreadAwaitsConditionForGood(getpid(), thread_)); // neither a pause nor a time-out
+    const RequestRecord reload = MakeRecord(kRequestReloadPinBlocks, "/volume1");
+    ASSERT_EQ(ConfigAddRequest(path_.c_str(), &reload), 0);
+    ServiceSignalRequest();
+    selection_.join();
+    EXPECT_EQ(log.Count("ConfigParseAndGetNextAvailableRequest() [N]: Go to block mode"), 1);
+    EXPECT_EQ(FakeLibc::sleeps, 0);
 }
 
 TEST_F(NextRequestBlockingTest, ASignalWithoutARequestIsWaitedOn) {

@@ -2,9 +2,10 @@
 
 #include "state/service_state.h"
 #include "tests/support/config_fixture.h"
+#include "tests/support/lock_probe.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
-#include <thread>
 
 namespace vesk {
 namespace {
@@ -251,6 +252,43 @@ TEST_F(NextRequestTest, ADropThatCannotBeWrittenIsAnError) {
                                   "Can't write to files",
                               }));
     EXPECT_EQ(Stored(), before);
+}
+
+TEST_F(NextRequestTest, TheVolumeIsLookedUpByItsWholePath) {
+    const std::string shorter = "/" + std::string(510, 'm');
+    const std::string whole = shorter + "m"; // which no space can have
+    FakeAppliance::spaces[0].referencePath = shorter;
+    StoreTwo(R"({"type" : "ack", "mountPath" : ")" + whole + R"("})",
+             R"({"type" : "ack", "mountPath" : ")" + shorter + R"("})");
+    CapturedLog log;
+    EXPECT_EQ(Next(), NextRequest::Taken);
+    EXPECT_EQ(num_, "1");
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Can't get space uuid from mount path (" + whole + ")",
+                                  "Drop requests finish",
+                              }));
+}
+
+TEST_F(NextRequestTest, TheLockIsHeldOverTheChoiceAndItsDrops) {
+    StoreTwo(R"({"type" : "pinFiles", "mountPath" : "/volume8", "data" : "b#2"})", kPinA);
+    LockProbe atRead;
+    LockProbe atLookup;
+    LockProbe atWrite;
+    FakeLibc::onRead = [&](int, long long, size_t) { atRead.Look(); };
+    FakeAppliance::onConfigLookup = [&] { atLookup.Look(); };
+    FakeLibc::onOpen = [&](const std::string &, int flags, unsigned) {
+        if ((flags & O_CREAT) != 0) {
+            atWrite.Look();
+        }
+    };
+    CapturedLog log;
+    EXPECT_EQ(Next(), NextRequest::Taken);
+    FakeLibc::onRead = nullptr;
+    FakeLibc::onOpen = nullptr;
+    FakeAppliance::onConfigLookup = nullptr;
+    EXPECT_TRUE(atRead.FoundItHeld());
+    EXPECT_TRUE(atLookup.FoundItHeld());
+    EXPECT_TRUE(atWrite.FoundItHeld());
 }
 
 TEST_F(NextRequestTest, LongTextsAreCutToTheRecordsFields) {

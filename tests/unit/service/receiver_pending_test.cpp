@@ -53,6 +53,43 @@ TEST_F(ReceiverPendingTest, RemovingWhatIsNotPendingIsANotice) {
                               }));
 }
 
+TEST_F(ReceiverPendingTest, OnlyAStoredRequestWakesTheWorker) {
+    std::atomic<pid_t> worker{0};
+    int wakeUps = 0;    // under the lock
+    bool ended = false; // under the lock
+    std::thread other([&] {
+        const ServiceLockGuard lock;
+        worker = static_cast<pid_t>(syscall(SYS_gettid));
+        while (!ended) {
+            ServiceWaitForRequest();
+            ++wakeUps;
+        }
+    });
+    const auto awaitWaiting = [&worker] {
+        while (worker == 0 || !ThreadAwaitsConditionForGood(getpid(), worker)) {
+            sched_yield();
+        }
+    };
+    awaitWaiting();
+    Put(kRequestAddPendingSpace, "/volume1");
+    Put(kRequestRemovePendigSpace, "/volume1"); // it is the worker's polling that notices
+    Put(kRequestRemovePendigSpace, "/volume1");
+    PutEnd();
+    CapturedLog log;
+    RunReceiver();
+    awaitWaiting(); // one that was woken has counted it and waits again
+    Put(kRequestReloadPinBlocks, "/volume1");
+    PutEnd();
+    {
+        const ServiceLockGuard lock; // until here nobody has woken it
+        EXPECT_EQ(wakeUps, 0);
+        ended = true;
+    }
+    RunReceiver();
+    other.join();
+    EXPECT_EQ(wakeUps, 1);
+}
+
 TEST_F(ReceiverPendingTest, ASpaceThatLeavesTheListMeanwhileStopsIt) {
     std::string path = "/volume1";
     ASSERT_EQ(ServiceAddPendingSpaceAtomic(&path[0]), 0);

@@ -1,8 +1,11 @@
 #include "service/receiver.h"
 
+#include "service/receiver_rest.h"
+#include "tests/unit/service/child_process.h"
 #include "tests/unit/service/receiver_fixture.h"
 
 #include <csignal>
+#include <new>
 #include <sys/msg.h>
 
 namespace vesk {
@@ -116,6 +119,42 @@ TEST_F(ReceiverTest, AQueueThatIsTakenAwayStopsIt) {
     FakeLibc::onRead = nullptr;
     EXPECT_EQ(log.Messages(), Messages{"Receive messaged failed: Invalid argument"});
     EXPECT_EQ(ParseJson(ReadWhole(config_))["requestQueue"].size(), 1U);
+}
+
+TEST_F(ReceiverTest, ALackOfMemoryHoldsTheMessageBackForASecond) {
+    bool first = true;
+    FakeLibc::onRead = [&first](int, long long, size_t) { // of the configuration
+        if (first) {
+            first = false;
+            throw std::bad_alloc();
+        }
+    };
+    WriteWhole(config_, "{}");
+    Put(kRequestReloadPinBlocks, "/volume1");
+    PutEnd();
+    CapturedLog log;
+    RunReceiver();
+    FakeLibc::onRead = nullptr;
+    EXPECT_EQ(log.Messages(), (Messages{
+                                  "Message is held back: std::bad_alloc",
+                                  "Space UUID is not set",
+                                  "Get wrong message format",
+                              }));
+    EXPECT_EQ(FakeLibc::sleeps, 1);
+    EXPECT_EQ(ParseJson(ReadWhole(config_))["requestQueue"].size(), 1U);
+}
+
+TEST_F(ReceiverTest, OnceItHasEndedItIsNotWaitedFor) {
+    PutEnd();
+    ChildProcess child({1}, [this] {
+        RunReceiver();
+        bool waited = false;
+        FakeLibc::onPause = [&waited] { waited = true; };
+        ReceiverAwaitRest();
+        return waited ? 1 : 0;
+    });
+    EXPECT_EQ(child.AwaitEnd(), 0);
+    EXPECT_EQ(child.Messages(), (Messages{"Space UUID is not set", "Get wrong message format"}));
 }
 
 TEST_F(ReceiverTest, WithoutAQueueItEndsAtOnce) {

@@ -64,6 +64,18 @@ TEST_F(RequestHandlersCommonTest, WithoutACacheItFails) {
                               }));
 }
 
+TEST_F(RequestHandlersCommonTest, ASpaceThatHasGoneMeanwhileHasNoBitmapPath) {
+    FakeAppliance::onConfigLookup = [] { FakeAppliance::spaces.clear(); };
+    CapturedLog log(2);
+    EXPECT_EQ(Handle(kRequestReloadPinBlocks), WorkResult::Failed);
+    EXPECT_EQ(MessagesOf(log, "HandleRequest"),
+              (Messages{
+                  "HandleRequest() [N] : ***** Can't get bitmap path",
+                  "HandleRequest() [N] : ***** Handle request failed",
+              }));
+    EXPECT_EQ(device_->events, Events{});
+}
+
 TEST_F(RequestHandlersCommonTest, FailuresNameTheirFunction) {
     FakeAppliance::caches.clear();
     CapturedLog log(2);

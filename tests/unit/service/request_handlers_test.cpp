@@ -41,7 +41,9 @@ TEST_F(RequestHandlersTest, LookupsGoByFolderAndInode) {
         return 0;
     };
     EXPECT_EQ(Handle(kRequestPinFiles, "a#1;share/b#4294967295"), WorkResult::Done);
-    EXPECT_EQ(asked, (std::vector<std::string>{volume_ + " 1", volume_ + "/share 4294967295"}));
+    EXPECT_EQ(Handle(kRequestUnpinFiles, "share/c#4294967294"), WorkResult::Done);
+    EXPECT_EQ(asked, (std::vector<std::string>{volume_ + " 1", volume_ + "/share 4294967295",
+                                               volume_ + "/share 4294967294"}));
     EXPECT_EQ(FakeAppliance::askedPath, volume_);
 }
 

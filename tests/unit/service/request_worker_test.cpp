@@ -5,6 +5,7 @@
 #include "request/tool_parameters.h"
 
 #include <json/reader.h>
+#include <new>
 #include <pthread.h>
 #include <sstream>
 #include <thread>
@@ -56,7 +57,7 @@ protected:
     // In the n-th pause the configuration is damaged, which ends the worker.
     void EndInPause(int pause) {
         FakeLibc::onSleep = [this, pause] {
-            if (FakeLibc::sleeps == pause) {
+            if (FakeLibc::sleeps >= pause) {
                 WriteWhole(config_, "");
             }
         };
@@ -216,6 +217,52 @@ TEST_F(RequestWorkerTest, AnInterruptedRequestRunsAgainWhenItsVolumeIsFree) {
                                    "read 196608+4096",
                                    "read 589824+8192",
                                }));
+}
+
+// The test of the pending list that a drop makes looks at the record that is still to be filled.
+TEST_F(RequestWorkerTest, EachChoiceBeginsWithAnEmptyRecord) {
+    WriteWhole(config_, R"({"requestQueue" : ["0", "1"], "requests" : {
+        "0" : {"type" : "reloadPinBlocks", "mountPath" : ")" +
+                            volume_ + R"("},
+        "1" : {"type" : "reloadPinBlocks", "mountPath" : "/of/no/cache"}}})");
+    FakeLibc::onSleep = [this] {
+        if (FakeLibc::sleeps == 1) { // request 0 is done
+            SetPending();
+        } else { // request 1 is dropped
+            WriteWhole(config_, "");
+        }
+    };
+    CapturedLog log;
+    RunWorker();
+    EXPECT_TRUE(ServiceIsPendingSpace(volume_.c_str()));
+    Messages expected = {
+        "Handle request (type=reloadPinBlocks) OK ",
+        "Can't get space uuid from mount path (/of/no/cache)",
+        "Drop requests finish",
+    };
+    expected.insert(expected.end(), end_.begin(), end_.end());
+    EXPECT_EQ(log.Messages(), expected);
+}
+
+TEST_F(RequestWorkerTest, ALackOfMemoryPutsTheChoiceOffForASecond) {
+    Queue({{"reloadPinBlocks", "null"}});
+    EndInPause(2);
+    bool first = true;
+    FakeAppliance::onConfigLookup = [&first] {
+        if (first) {
+            first = false;
+            throw std::bad_alloc();
+        }
+    };
+    CapturedLog log;
+    RunWorker();
+    Messages expected = {
+        "Request is put off: std::bad_alloc",
+        "Handle request (type=reloadPinBlocks) OK ",
+    };
+    expected.insert(expected.end(), end_.begin(), end_.end());
+    EXPECT_EQ(log.Messages(), expected);
+    EXPECT_EQ(FakeLibc::sleeps, 2);
 }
 
 TEST_F(RequestWorkerTest, AtLevel2TheThreadIsTracedAndItsMessagesAreItsOwn) {

@@ -7,6 +7,7 @@
 #include <cerrno>
 #include <csignal>
 #include <pthread.h>
+#include <string>
 #include <thread>
 #include <unistd.h>
 
@@ -85,6 +86,23 @@ TEST_F(SignalHandlerTest, EachSignalEndsTheProcessWithStatus0AndItsOutputWritten
         EXPECT_NE(messages[0].find(" : still in the buffer"), std::string::npos) << messages[0];
         EXPECT_EQ(messages[1], "SignalHandler() [N]: Get signal = " + std::to_string(number));
     }
+}
+
+TEST_F(SignalHandlerTest, TheEndIsLimitedToHalfASecond) {
+    ChildProcess child({1}, [] {
+        FakeLibc::onAlarm = [](long long microseconds) { LogNotice("%lld", microseconds); };
+        TakeSignals();
+        kill(getpid(), SIGTERM);
+        for (;;) {
+            pause();
+        }
+        return 99;
+    });
+    EXPECT_EQ(child.AwaitEnd(), 0);
+    const Messages messages = child.Messages();
+    ASSERT_EQ(messages.size(), 1U);
+    EXPECT_GT(std::stoll(messages[0]), 0);
+    EXPECT_LE(std::stoll(messages[0]), 500000);
 }
 
 TEST_F(SignalHandlerTest, ASignalIsSilentAtLevel1) {

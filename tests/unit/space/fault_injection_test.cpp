@@ -4,6 +4,7 @@
 #include "tests/support/leak_checked_test.h"
 #include "tests/support/ordinary_user.h"
 #include "tests/support/private_mounts.h"
+#include "tests/support/recorded_opens.h"
 #include "tests/support/temp_dir.h"
 
 #include <cerrno>
@@ -95,6 +96,13 @@ TEST_F(FileSimulateGetMappingFailedTest, ControlFileThatComesInPiecesIsReadWhole
     CapturedLog log;
     FakeLibc::Limit("read", 5);
     EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
+}
+
+TEST_F(FileSimulateGetMappingFailedTest, ControlFileIsOpenedForReadingWithoutWaiting) {
+    CapturedLog log;
+    const RecordedOpens opens;
+    EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
+    EXPECT_EQ(opens.FlagsOf(kControlFile), std::vector<int>{O_RDONLY | O_NONBLOCK | O_CLOEXEC});
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, ControlFileIsReadAnewEveryTime) {

@@ -201,8 +201,10 @@ TEST_F(FileExtentsTest, OtherExtentsAreNotWorthAMessage) {
     CapturedLog log;
     AnswerWith(0, {FakeExtent(0, 8, 1000, 0)});
     EXPECT_EQ(Lookup(), 0);
-    AnswerWith(0, {FakeExtent(0, 8, 1000, 2)});
-    EXPECT_EQ(Lookup(), 0);
+    for (const uint32_t flag : {2U, 3U, UINT32_MAX}) {
+        AnswerWith(0, {FakeExtent(0, 8, 1000, flag)});
+        EXPECT_EQ(Lookup(), 0);
+    }
     AnswerWith(0, {FakeExtent(0, 8, 1000, 1), FakeExtent(8, 8, 2000, 1)});
     EXPECT_EQ(Lookup(), 0);
     EXPECT_EQ(log.Text(), "");
@@ -235,5 +237,21 @@ TEST_F(FileExtentsFaultTest, SimulatedFailureFailsTheLookupThatSucceeded) {
     EXPECT_EQ(Lookup("/volume1/photo/b.jpg"), 0); // only that file fails
     std::filesystem::remove("/tmp/veskcachepinfiletool.debug");
     EXPECT_EQ(Lookup(), 0);
+}
+
+TEST_F(FileExtentsFaultTest, SimulatedFailureIsLookedForAtEachTry) {
+    SKIP_WITHOUT_PRIVATE_MOUNTS();
+    AnswerWithExtents({0, 0, 1});
+    FakeLibc::onSleep = [] {
+        if (FakeLibc::sleeps == 2) {
+            WriteWhole("/tmp/veskcachepinfiletool.debug", kFile);
+        }
+    };
+    CapturedLog log;
+    EXPECT_EQ(Lookup(), -1);
+    EXPECT_EQ(FakeAppliance::lookups, 3);
+    EXPECT_EQ(log.Text(), "tool: Simulate /volume1/photo/a.jpg get mapping failed\n"
+                          "tool: Get mapping result fail.\n");
+    std::filesystem::remove("/tmp/veskcachepinfiletool.debug");
 }
 } // namespace vesk

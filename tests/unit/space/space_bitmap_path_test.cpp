@@ -4,37 +4,17 @@
 #include "tests/support/captured_log.h"
 #include "tests/support/leak_checked_test.h"
 
-#include <cstdlib>
-#include <cstring>
+#include <cerrno>
 #include <gtest/gtest.h>
 
 namespace vesk {
 namespace {
-int copiesLeft = -1; // negative: memory never runs out
-
-class SpaceBitmapPathTest : public LeakCheckedTest {
-protected:
-    void TearDown() override {
-        copiesLeft = -1;
-        LeakCheckedTest::TearDown();
-    }
-};
+using SpaceBitmapPathTest = LeakCheckedTest;
 
 std::string PathBelow(const std::string &referencePath) {
     return MallocText(BitmapGetPathByReferencePath(referencePath.c_str())).get();
 }
 } // namespace
-
-// Takes the place of the C library's.
-extern "C" char *strdup(const char *text) noexcept {
-    if (copiesLeft == 0) {
-        return nullptr;
-    }
-    --copiesLeft;
-    const size_t size = strlen(text) + 1;
-    auto *copy = static_cast<char *>(malloc(size));
-    return copy == nullptr ? nullptr : static_cast<char *>(memcpy(copy, text, size));
-}
 
 TEST_F(SpaceBitmapPathTest, LiesInTheTopDirectoryOfTheVolume) {
     CapturedLog log(3);
@@ -72,9 +52,8 @@ TEST_F(SpaceBitmapPathTest, OfAnUnknownSpaceIsAnError) {
 TEST_F(SpaceBitmapPathTest, RunningOutOfMemoryIsAnError) {
     FakeApplianceOneVolume("/dev/mapper/cachedev_0");
     CapturedLog log;
-    copiesLeft = 2; // the UUID in the library and the reference path
+    FakeLibc::Fail("strdup", ENOMEM, 3); // behind the UUID in the library and the reference path
     EXPECT_EQ(SpaceGetBitmapPath("uuid-1"), nullptr);
-    copiesLeft = -1;
     EXPECT_EQ(log.Text(), "tool: Can't get bitmap path\n");
 }
 } // namespace vesk

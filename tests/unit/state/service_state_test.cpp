@@ -165,6 +165,31 @@ TEST_F(ServiceStateTest, ASignalWakesTheWaiter) {
     SUCCEED();
 }
 
+TEST_F(ServiceStateTest, TheWaitHasNoLimitOfTime) {
+    std::atomic<pid_t> thread{0};
+    bool woken = false; // under the lock
+    std::thread waiter([&] {
+        const ServiceLockGuard lock;
+        thread = static_cast<pid_t>(syscall(SYS_gettid));
+        while (!woken) {
+            ServiceWaitForRequest();
+        }
+    });
+    while (thread == 0) {
+        std::this_thread::yield();
+    }
+    {
+        const ServiceLockGuard lock; // to be had only while the other thread waits
+        woken = true;
+    }
+    while (!ThreadSleeps(getpid(), thread)) {
+        std::this_thread::yield();
+    }
+    EXPECT_TRUE(ThreadAwaitsConditionForGood(getpid(), thread));
+    ServiceSignalRequest();
+    waiter.join();
+}
+
 // For the thread sanitizer above all: readers ask while the list changes under the lock.
 TEST_F(ServiceStateTest, ReadersWithoutTheLockSeeWholeLists) {
     const std::string always = "/a volume whose name is too long to be kept inside a string object";

@@ -1,5 +1,6 @@
 #include "warming/read_file.h"
 
+#include "tests/support/recorded_opens.h"
 #include "tests/unit/warming/warming_fixture.h"
 
 #include <cerrno>
@@ -34,6 +35,14 @@ TEST_F(ReadFileTest, TheFileIsReadUpToTheLastSector) {
     EXPECT_EQ(Read(255), WorkResult::Done); // 128 KiB
     EXPECT_EQ(device_->events, (Events{"read 0+65536", "read 65536+65536"}));
     EXPECT_EQ(log.Messages(), Messages{});
+}
+
+TEST_F(ReadFileTest, TheFileIsOpenedForDirectReads) {
+    UseDevice(1 << 20);
+    SKIP_WITHOUT_DIRECT_READS();
+    const RecordedOpens opens;
+    EXPECT_EQ(Read(0), WorkResult::Done);
+    EXPECT_EQ(opens.FlagsOf(device_->Path()), std::vector<int>{O_RDONLY | O_DIRECT | O_CLOEXEC});
 }
 
 TEST_F(ReadFileTest, APartOfAChunkCostsAWholeOne) {

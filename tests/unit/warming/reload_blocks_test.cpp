@@ -1,5 +1,6 @@
 #include "warming/reload_blocks.h"
 
+#include "tests/support/recorded_opens.h"
 #include "tests/unit/warming/warming_fixture.h"
 
 #include <cerrno>
@@ -94,6 +95,14 @@ TEST_F(ReloadBlocksTest, Bits3To5And9AreTwoRanges) {
               }));
 }
 
+TEST_F(ReloadBlocksTest, TheDeviceIsOpenedForDirectReads) {
+    UseDevice(1 << 20);
+    SKIP_WITHOUT_DIRECT_READS();
+    const RecordedOpens opens;
+    EXPECT_EQ(Reload("\x01"), WorkResult::Done);
+    EXPECT_EQ(opens.FlagsOf(device_->Path()), std::vector<int>{O_RDONLY | O_DIRECT | O_CLOEXEC});
+}
+
 TEST_F(ReloadBlocksTest, AClearBitmapReadsNothing) {
     UseDevice(1 << 20);
     SKIP_WITHOUT_DIRECT_READS();
@@ -165,7 +174,11 @@ TEST_F(ReloadBlocksTest, APendingVolumeIsNotRead) {
                       "ReloadPinBlocksToCache() [N]: Interrupted due to space is pending",
                   }));
     }
-    EXPECT_EQ(Reload(std::string(2, '\0')), WorkResult::Interrupted);
+    // Also where all bytes are equal, so that the walk sees no run begin or end.
+    for (const size_t size : {size_t{2}, size_t{4096}, size_t{4097}, size_t{10000}}) {
+        EXPECT_EQ(Reload(std::string(size, '\0')), WorkResult::Interrupted);
+        EXPECT_EQ(Reload(std::string(size, '\xff')), WorkResult::Interrupted);
+    }
     EXPECT_EQ(device_->events, Events{});
 }
 

@@ -1,5 +1,6 @@
 #include "warming/warm_files.h"
 
+#include "tests/support/recorded_opens.h"
 #include "tests/unit/warming/warming_fixture.h"
 
 #include "warming/read_range.h"
@@ -50,6 +51,13 @@ TEST_F(WarmFilesTest, AtLevel2EachStepIsLogged) {
     EXPECT_EQ(MessagesOf(log, "ReadFilesToCache"), Messages{});
 }
 
+TEST_F(WarmFilesTest, TheDeviceIsOpenedForDirectReads) {
+    SKIP_WITHOUT_DIRECT_READS();
+    const RecordedOpens opens;
+    EXPECT_EQ(ReadFilesToCache("/volume1", {a_, b_}), WorkResult::Done);
+    EXPECT_EQ(opens.FlagsOf(device_->Path()), std::vector<int>{O_RDONLY | O_DIRECT | O_CLOEXEC});
+}
+
 TEST_F(WarmFilesTest, NoFilesReadNothing) {
     SKIP_WITHOUT_DIRECT_READS();
     EXPECT_EQ(ReadFilesToCache("/volume1", {}), WorkResult::Done);
@@ -60,10 +68,12 @@ TEST_F(WarmFilesTest, UnwrittenExtentsAreSkipped) {
     SKIP_WITHOUT_DIRECT_READS();
     const FileToWarm file =
         MakeFile("/volume1/a", {FakeExtent(0, 8, 1024, 1), FakeExtent(8, 8, 2048, 0),
-                                FakeExtent(16, 8, 3072, 2)}); // any other flag is data
+                                // Any other flag is data.
+                                FakeExtent(16, 8, 3072, 2), FakeExtent(24, 8, 4096, 3)});
     CapturedLog log(2);
     EXPECT_EQ(ReadFilesToCache("/volume1", {file}), WorkResult::Done);
-    EXPECT_EQ(device_->events, (Events{"read 1048576+4096", "read 1572864+4096"}));
+    EXPECT_EQ(device_->events,
+              (Events{"read 1048576+4096", "read 1572864+4096", "read 2097152+4096"}));
     EXPECT_EQ(log.Count("ReadMappingRangesToCache() [N]: Skip uninitialized range (disk start "
                         "sector = 1024 num sectors = 8)"),
               1);
