@@ -27,7 +27,8 @@ inline bool ThreadAwaitsConditionForGood(pid_t process, pid_t thread) {
     unsigned long long operation = 0;
     unsigned long long value = 0;
     unsigned long long limit = 0; // an address
+    const auto command = static_cast<unsigned>(FUTEX_CMD_MASK);
     return file >> number >> std::hex >> word >> operation >> value >> limit &&
-           (operation & FUTEX_CMD_MASK) == FUTEX_WAIT_BITSET && limit == 0;
+           (operation & command) == FUTEX_WAIT_BITSET && limit == 0;
 }
 } // namespace vesk
