@@ -7,6 +7,7 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <limits>
 #include <memory>
 #include <mutex>
@@ -36,20 +37,24 @@ public:
     void Read(int fd, const struct stat &folder) {
         entries_.clear();
         names_.clear();
-        status_ = folder;
+        status_ = {}; // of no folder, until all is read
         ScopedFd again(openat(fd, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
         const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(again.Get()));
         if (stream == nullptr) {
             return;
         }
         again.Release(); // the stream closes it from here on
+        errno = 0;
         while (const dirent *entry = readdir(stream.get())) {
             if (MayBeRegularFile(*entry)) {
                 entries_.push_back({entry->d_ino, names_.size()});
                 names_.append(entry->d_name).push_back('\0');
             }
         }
-        std::stable_sort(entries_.begin(), entries_.end(), IsBefore);
+        if (errno == 0) {
+            std::stable_sort(entries_.begin(), entries_.end(), IsBefore);
+            status_ = folder;
+        }
     }
     bool Search(InodeSearch &search) const {
         const auto [first, last] =

@@ -74,11 +74,13 @@ const MountEntry *MountFindByPath(const std::vector<MountEntry> &entries, const 
     for (size_t steps = 0; steps < entries.size(); ++steps) {
         const MountEntry *next = nullptr;
         for (const MountEntry &entry : entries) {
+            if (entry.target.empty() || !IsAtOrBelow(path, entry.target)) {
+                continue;
+            }
             const bool isHere = found == nullptr
                                     ? !HasParent(entry, entries)
                                     : entry.parentId == found->id && entry.id != found->id;
-            if (isHere && !entry.target.empty() && IsAtOrBelow(path, entry.target) &&
-                (next == nullptr || entry.target.size() < next->target.size())) {
+            if (isHere && (next == nullptr || entry.target.size() < next->target.size())) {
                 next = &entry;
             }
         }

@@ -4,6 +4,7 @@
 #include "files/file_replace.h"
 
 #include <cstring>
+#include <exception>
 #include <fstream>
 #include <iterator>
 #include <json/reader.h>
@@ -36,8 +37,10 @@ bool ParseStream(std::istream &stream, Json::Value *root) try {
         throw std::bad_alloc();
     }
     return false;
-} catch (const std::ios_base::failure &) {
-    return false; // what opens can be unreadable: a folder, a broken disk
+} catch (const std::bad_alloc &) {
+    throw;
+} catch (const std::exception &) {
+    return false; // what opens can be unreadable, too: a folder, a broken disk
 }
 
 // What toStyledString gives. That one writes to a stream which swallows a lack of memory, and would

@@ -150,7 +150,9 @@ FileReplaceResult WriteInPlace(const char *path, const std::string &content) {
         return WriteAll(file.Get(), content) ? FileReplaceResult::Done
                                              : FileReplaceResult::NotWritten;
     }
-    if (TakeRoom(file.Get(), status.st_size, content.size()) && Overwrite(file.Get(), content)) {
+    // Nothing to keep in a file that is new, and no memory to ask for that may not be there.
+    const bool hasRoom = created || TakeRoom(file.Get(), status.st_size, content.size());
+    if (hasRoom && Overwrite(file.Get(), content)) {
         return FileReplaceResult::Done;
     }
     if (created) {

@@ -15,6 +15,8 @@
 namespace vesk {
 int StartService(const ToolParameters *parameters) {
     LogTraceEntry();
+    // While signals still end the process by themselves: a folder can be large, or hang.
+    FileRemoveLeftovers(parameters->configPath);
     if (SetSignalHandler() < 0) {
         LogError("Can't get signal handler");
         LogTraceExit();
@@ -25,7 +27,6 @@ int StartService(const ToolParameters *parameters) {
         LogTraceExit();
         return -1;
     }
-    FileRemoveLeftovers(parameters->configPath);
     SetServiceThreads(2);
     pthread_t worker{};
     if (pthread_create(&worker, nullptr, DoRequests, const_cast<ToolParameters *>(parameters)) !=

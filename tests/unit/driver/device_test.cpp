@@ -130,7 +130,7 @@ TEST_F(DoIoctlTest, OpensTheDeviceForReadingAndWritingForEachRequest) {
         return 0;
     };
     const RecordedOpens opens;
-    for (int i = 1; i <= 2; ++i) {
+    for (size_t i = 1; i <= 2; ++i) {
         ASSERT_EQ(DoIoctl(device.c_str(), 0xFED1, nullptr, 0), 0);
         ASSERT_NE(flags, -1);
         EXPECT_EQ(flags & O_ACCMODE, O_RDWR);
