@@ -4,6 +4,7 @@
 #include "tests/support/leak_checked_test.h"
 #include "tests/support/ordinary_user.h"
 #include "tests/support/private_mounts.h"
+#include "tests/support/recorded_opens.h"
 #include "tests/support/temp_dir.h"
 
 #include <gtest/gtest.h>
@@ -130,5 +131,39 @@ TEST_F(FileTextTest, ReadFailsOnAnEmptyFileAndOnAFolder) {
         EXPECT_EQ(text, "before");
         EXPECT_EQ(log.Text(), "tool: Can't get a line from file (" + unreadable + ")\n");
     }
+}
+
+TEST_F(FileTextTest, ReadsAWholeFileWithoutWaiting) {
+    WriteWhole(path, "123\n456");
+    CapturedLog log(2);
+    const RecordedOpens opens;
+    std::string text = "before";
+    EXPECT_EQ(FileReadWhole(path.c_str(), &text), 0);
+    EXPECT_EQ(text, "123\n456");
+    EXPECT_EQ(opens.FlagsOf(path), std::vector<int>{O_RDONLY | O_NONBLOCK | O_CLOEXEC});
+    EXPECT_EQ(log.Messages(),
+              (std::vector<std::string>{"FileReadString() [N]: Get text = 123", "456"}));
+}
+
+TEST_F(FileTextTest, ReadingAWholeFileFailsAsReadingItsFirstLineDoes) {
+    CapturedLog log;
+    std::string text;
+    EXPECT_EQ(FileReadWhole(path.c_str(), &text), -1);
+    EXPECT_FALSE(std::filesystem::exists(path));
+    WriteWhole(path, "");
+    EXPECT_EQ(FileReadWhole(path.c_str(), &text), -1);
+    EXPECT_EQ(log.Text(), "tool: Can't open file (" + path +
+                              ")\ntool: Can't get a line from file (" + path + ")\n");
+}
+
+TEST_F(FileTextTest, WhatIsNoRegularFileIsNotRead) {
+    ASSERT_EQ(mkfifo(path.c_str(), 0600), 0);
+    CapturedLog log;
+    std::string text = "before";
+    for (const std::string &other : {path, folder.Path()}) {
+        EXPECT_EQ(FileReadWhole(other.c_str(), &text), -1);
+    }
+    EXPECT_EQ(text, "before");
+    EXPECT_EQ(log.Text(), "");
 }
 } // namespace vesk
