@@ -51,7 +51,10 @@ void ReceiverAwaitRest() {
     called = true;
     // Installed only now: at any other time the signal has its default action. Other calls than the
     // wait for messages go on after it.
-    if (signal(SIGUSR1, Interrupt) == SIG_ERR) {
+    struct sigaction action {};
+    action.sa_handler = Interrupt;
+    action.sa_flags = SA_RESTART;
+    if (sigaction(SIGUSR1, &action, nullptr) < 0) {
         return;
     }
     // Again and again: the signal may come just before the receiver begins to wait.
