@@ -85,6 +85,7 @@ int SetSignalHandler() {
 void StartSignalThread() {
     pthread_t waiter{};
     if (pthread_create(&waiter, nullptr, WaitForSignals, nullptr) == 0) {
+        pthread_setname_np(waiter, "signals");
         pthread_detach(waiter);
         return;
     }

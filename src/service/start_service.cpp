@@ -35,6 +35,7 @@ int StartService(const ToolParameters *parameters) {
         LogTraceExit();
         return -1;
     }
+    pthread_setname_np(worker, "worker");
     StartSignalThread();
     GetRequests(parameters->configPath);
 }

@@ -1,5 +1,5 @@
-// The pin service: shared state, signal handling, the worker on a thread of its own and the
-// receiver on the calling one.
+// The pin service: shared state, the worker and the wait for signals on threads of their own, named
+// "worker" and "signals" for those who look from outside, and the receiver on the calling one.
 #pragma once
 
 namespace vesk {

@@ -41,18 +41,18 @@ receiver_waits() { thread_is_in_call "$SERVICE_PID" ' 0x604 '; }
 # dealt with.
 messages_are_taken() { waiting_is 0 && receiver_waits; }
 
-# The worker waits for a request or in a pause. It is the first thread that is made; where it has ended,
-# the next is the one that waits for signals.
+# The worker waits for a request or in a pause, or has ended.
 worker_rests() {
     find_worker
-    thread_is_in_call "$WORKER_THREAD" "( 0x189 |$PAUSE_CALL| 0x0 0x8 )"
+    [ -z "$WORKER_THREAD" ] || thread_is_in_call "$WORKER_THREAD" "( 0x189 |$PAUSE_CALL)"
 }
 find_worker() {
-    local task
+    local task name
     WORKER_THREAD=
     for task in /proc/"$SERVICE_PID"/task/*; do
-        task=${task##*/}
-        [[ $task == *[!0-9]* || $task == "$SERVICE_PID" || (-n $WORKER_THREAD && $task -gt $WORKER_THREAD) ]] || WORKER_THREAD=$task
+        # A thread may end meanwhile.
+        { read -r name <"$task/comm"; } 2>/dev/null || continue
+        [ "$name" != worker ] || WORKER_THREAD=${task##*/}
     done
 }
 

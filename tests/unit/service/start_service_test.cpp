@@ -12,6 +12,7 @@
 #include <cerrno>
 #include <chrono>
 #include <csignal>
+#include <filesystem>
 #include <pthread.h>
 #include <sys/ipc.h>
 #include <sys/msg.h>
@@ -21,6 +22,8 @@
 #include <unistd.h>
 
 namespace vesk {
+namespace fs = std::filesystem;
+
 // The whole service in a process of its own.
 class StartServiceTest : public HandlerTest {
 protected:
@@ -85,6 +88,13 @@ protected:
         EXPECT_TRUE(service->AwaitOutput("Choosing"));
         Send(kRequestReloadPinBlocks, volume_);
         EXPECT_TRUE(ChildProcess::Await([&] { return CountMessages(queueId_) == 0; }));
+    }
+    static bool HasThread(const ChildProcess &process, const std::string &name) {
+        const auto threads =
+            fs::directory_iterator("/proc/" + std::to_string(process.Id()) + "/task");
+        return std::any_of(begin(threads), end(threads), [&](const fs::directory_entry &thread) {
+            return ReadWhole(thread.path() / "comm") == name + "\n";
+        });
     }
     static bool Contains(const Messages &all, const std::string &message) {
         return std::count(all.begin(), all.end(), message) > 0;
@@ -243,6 +253,15 @@ TEST_F(StartServiceTest, WithRoomForOneThreadMoreItIsTheWorkers) {
                          Service([] { FakeLibc::Fail("pthread_create", EAGAIN, 2); }));
     Send(kRequestReloadPinBlocks, "/volume9"); // of no cache: stored, woken for and dropped
     EXPECT_TRUE(AwaitConfig("\"requestQueue\" : null"));
+    service.Signal(SIGTERM);
+    EXPECT_EQ(service.AwaitEnd(), 0);
+}
+
+TEST_F(StartServiceTest, ItsThreadsAreCalledWhatTheyDo) {
+    ChildProcess service({1}, Service());
+    for (const char *name : {"worker", "signals"}) {
+        EXPECT_TRUE(ChildProcess::Await([&] { return HasThread(service, name); })) << name;
+    }
     service.Signal(SIGTERM);
     EXPECT_EQ(service.AwaitEnd(), 0);
 }
