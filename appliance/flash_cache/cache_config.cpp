@@ -2,8 +2,10 @@
 
 #include <json/json.h>
 
+#include <sys/stat.h>
+
+#include <cerrno>
 #include <cstdlib>
-#include <filesystem>
 #include <fstream>
 #include <memory>
 
@@ -60,15 +62,15 @@ std::string CacheConfigPath() {
 
 bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &entries) {
     entries.clear();
-    std::error_code error;
-    const std::filesystem::file_status status = std::filesystem::status(path, error);
-    if (status.type() == std::filesystem::file_type::not_found) {
-        return true;
+    // Not through the C++ library, which on a 32-bit machine knows no date past 2038.
+    struct stat status = {};
+    if (stat(path.c_str(), &status) != 0) {
+        return errno == ENOENT || errno == ENOTDIR;
     }
     // Opening a FIFO would wait for a writer.
     std::string text;
     Json::Value document;
-    if (!std::filesystem::is_regular_file(status) || !TextRead(path, text) ||
+    if (!S_ISREG(status.st_mode) || !TextRead(path, text) ||
         !JsonParse(text, document) || !document.isObject() || !document["caches"].isArray()) {
         return false;
     }

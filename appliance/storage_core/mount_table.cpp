@@ -44,11 +44,12 @@ bool HasParent(const MountEntry &entry, const std::vector<MountEntry> &entries) 
 
 bool MountTableRead(const char *path, std::vector<MountEntry> &entries) {
     entries.clear();
-    const std::unique_ptr<libmnt_table, Deleter<mnt_unref_table>> table(
-        mnt_new_table_from_file(path));
+    const std::unique_ptr<libmnt_table, Deleter<mnt_unref_table>> table(mnt_new_table());
     const std::unique_ptr<libmnt_iter, Deleter<mnt_free_iter>> iterator(
         mnt_new_iter(MNT_ITER_FORWARD));
-    if (table == nullptr || iterator == nullptr) {
+    // Not what makes a table of a file at once: that looks at the file's dates, where a 32-bit
+    // build of the library knows none past 2038.
+    if (table == nullptr || iterator == nullptr || mnt_table_parse_file(table.get(), path) != 0) {
         return false;
     }
     libmnt_fs *fs = nullptr;

@@ -1,9 +1,13 @@
 #include "tests/support/temp_dir.h"
 
+#include <gtest/gtest.h>
+
 #include <cstdlib>
+#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <sstream>
+#include <sys/stat.h>
 
 namespace vesk {
 TempDir::TempDir() : TempDir(std::filesystem::temp_directory_path().string()) {}
@@ -26,6 +30,13 @@ std::string TempDir::FileMake(const std::string &name, const std::string &conten
 
 void WriteWhole(const std::string &path, const std::string &content) {
     std::ofstream(path, std::ios::binary | std::ios::trunc) << content;
+}
+
+void DateFile(const std::string &path, int64_t seconds) {
+    const auto date = static_cast<time_t>(seconds);
+    ASSERT_EQ(date, seconds);
+    const timespec times[] = {{date, 0}, {date, 0}};
+    ASSERT_EQ(utimensat(AT_FDCWD, path.c_str(), times, 0), 0) << path;
 }
 
 std::string ReadWhole(const std::string &path) {

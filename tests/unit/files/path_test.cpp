@@ -139,11 +139,8 @@ TEST_F(PathTest, FilesOfEveryDateAreFiles) {
     CapturedLog log(3);
     const std::string path = folder.Path("file");
     WriteWhole(path, "12345");
-    for (const long long seconds : {-2524521600LL, 2208988800LL, 4291747200LL}) {
-        const auto date = static_cast<time_t>(seconds);
-        ASSERT_EQ(date, seconds);
-        const timespec times[] = {{date, 0}, {date, 0}};
-        ASSERT_EQ(utimensat(AT_FDCWD, path.c_str(), times, 0), 0);
+    for (const int64_t date : kFarDates) {
+        DateFile(path, date);
         uint64_t size = 0;
         uint32_t inode = 0;
         EXPECT_EQ(PathExists(path.c_str()), 1);

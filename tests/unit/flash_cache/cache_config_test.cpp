@@ -43,6 +43,17 @@ TEST(CacheConfigRead, GivesTheCachesInOrder) {
     EXPECT_EQ(entries[1].cachePath, "/run/c\xc3\xa9");
 }
 
+TEST(CacheConfigRead, TakesAFileOfEveryDate) {
+    const TestFolder folder;
+    const std::string path = folder.FileMake("config.json", kOne);
+    for (const int64_t date : kFarDates) {
+        DateFile(path, date);
+        std::vector<CacheConfigEntry> entries;
+        EXPECT_TRUE(CacheConfigRead(path, entries)) << date;
+        EXPECT_EQ(entries.size(), 1U);
+    }
+}
+
 TEST(CacheConfigRead, NoCaches) {
     std::vector<CacheConfigEntry> entries;
     EXPECT_TRUE(Reads(R"({"caches":[]})", entries));

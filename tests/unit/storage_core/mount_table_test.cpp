@@ -41,6 +41,17 @@ TEST(MountTable, ReadsEveryFieldDecoded) {
     EXPECT_EQ(entries[1].options, "rw,discard");
 }
 
+TEST(MountTable, TakesATableOfEveryDate) {
+    const TestFolder folder;
+    const std::string path = folder.FileMake("mountinfo", kTable);
+    for (const int64_t date : kFarDates) {
+        DateFile(path, date);
+        std::vector<MountEntry> entries;
+        EXPECT_TRUE(MountTableRead(path.c_str(), entries)) << date;
+        EXPECT_EQ(entries.size(), 8U);
+    }
+}
+
 TEST(MountTable, EmptyTableIsNoFailure) {
     EXPECT_TRUE(TableOf("").empty());
 }
