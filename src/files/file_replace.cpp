@@ -106,14 +106,15 @@ Attempt ReplaceByRename(const std::string &target, const struct stat *old,
 }
 
 // Grows the file with blanks, which mean nothing behind a document, to the size of what will be
-// written: the room for that is the file's own then. Without it the file is as it was.
+// written, as far as the storage, which may promise room that it has not: what is written there
+// then has its room. Without it the file is as it was.
 bool TakeRoom(int fd, off_t present, size_t needed) {
     const auto missing = static_cast<int64_t>(needed) - present;
     if (missing <= 0) {
         return true;
     }
     if (lseek(fd, present, SEEK_SET) == present &&
-        WriteAll(fd, std::string(static_cast<size_t>(missing), ' '))) {
+        WriteAll(fd, std::string(static_cast<size_t>(missing), ' ')) && fsync(fd) == 0) {
         return true;
     }
     if (ftruncate(fd, present) < 0) {
@@ -124,7 +125,7 @@ bool TakeRoom(int fd, off_t present, size_t needed) {
 
 bool Overwrite(int fd, const std::string &content) {
     return lseek(fd, 0, SEEK_SET) == 0 && WriteAll(fd, content) &&
-           ftruncate(fd, static_cast<off_t>(content.size())) == 0;
+           ftruncate(fd, static_cast<off_t>(content.size())) == 0 && fsync(fd) == 0;
 }
 
 // For what was created and could not be filled: an empty document would be a damaged one.

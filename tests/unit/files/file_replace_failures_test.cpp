@@ -112,6 +112,28 @@ TEST_F(FileReplaceFailureTest, LongerContentIsNotWrittenInPlaceWithoutItsRoom) {
     EXPECT_EQ(Status(path).st_ino, before);
 }
 
+TEST_F(FileReplaceFailureTest, RoomThatTheStorageDoesNotHaveIsNotUsed) {
+    // The temporary file's content is synced first, then the blanks.
+    for (const int error : {ENOSPC, EDQUOT, EIO}) {
+        FakeLibc::Fail("rename", EACCES);
+        FakeLibc::Fail("fsync", error, 2);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), std::string(10000, 'x')),
+                  FileReplaceResult::CannotOpen);
+        ExpectOldWhole();
+    }
+}
+
+TEST_F(FileReplaceFailureTest, ContentInPlaceIsSynced) {
+    for (const size_t size : {size_t{10}, size_t{10000}}) {
+        FakeLibc::Fail("rename", EACCES);
+        // After the temporary file's, the blanks' where there are any.
+        FakeLibc::Fail("fsync", EIO, size > old.size() ? 3 : 2);
+        EXPECT_EQ(FileReplaceContent(path.c_str(), std::string(size, 'x')),
+                  FileReplaceResult::CannotOpen);
+        WriteWhole(path, old);
+    }
+}
+
 TEST_F(FileReplaceFailureTest, CrashBeforeTheContentIsWrittenInPlaceLeavesBlanksBehindTheOld) {
     const std::string longer(old.size() + 5, 'x');
     FakeLibc::Fail("rename", EACCES);
