@@ -53,6 +53,9 @@ dev_t BlockDeviceNumber(const std::string &devicePath) {
 bool BlockDeviceHasOffset(dev_t device, const std::string &folder) {
     const std::string path =
         folder + "/" + std::to_string(major(device)) + ":" + std::to_string(minor(device));
+    if (access(path.c_str(), F_OK) != 0) {
+        return true;
+    }
     for (const char *mark : {"/partition", "/md", "/bcache"}) {
         if (access((path + mark).c_str(), F_OK) == 0) {
             return true;

@@ -25,7 +25,8 @@ dev_t BlockDeviceNumber(const std::string &devicePath);
 // Whether the device with this number begins somewhere inside another one, or within what another
 // one translates: a partition, a loop device with an offset or over such a device, a RAID, a cache
 // or a logical volume. Sectors counted from its start are others of the device below. `folder` is
-// where the kernel describes devices by their numbers.
+// where the kernel describes devices by their numbers; of a device that it does not know nothing
+// can be said, which counts as an offset.
 bool BlockDeviceHasOffset(dev_t device, const std::string &folder = "/sys/dev/block");
 
 // One value of the superblock found on a block device, by libblkid's name for it ("UUID", "TYPE").
