@@ -2,18 +2,19 @@
 # BIN, the built programs' folder, and HELPERS, the folder of the tests' own programs.
 # shellcheck shell=bash
 
+SYSTEM_TESTS=$(dirname "${BASH_SOURCE[0]}")
 # shellcheck source=../../scripts/lib/volume.bash
-. "$BATS_TEST_DIRNAME/../../scripts/lib/volume.bash"
+. "$SYSTEM_TESTS/../../scripts/lib/volume.bash"
 # shellcheck source=lib/wait.bash
-. "$BATS_TEST_DIRNAME/lib/wait.bash"
+. "$SYSTEM_TESTS/lib/wait.bash"
 # shellcheck source=lib/devices.bash
-. "$BATS_TEST_DIRNAME/lib/devices.bash"
+. "$SYSTEM_TESTS/lib/devices.bash"
 # shellcheck source=lib/service.bash
-. "$BATS_TEST_DIRNAME/lib/service.bash"
+. "$SYSTEM_TESTS/lib/service.bash"
 # shellcheck source=lib/blocks.bash
-. "$BATS_TEST_DIRNAME/lib/blocks.bash"
+. "$SYSTEM_TESTS/lib/blocks.bash"
 # shellcheck source=lib/messages.bash
-. "$BATS_TEST_DIRNAME/lib/messages.bash"
+. "$SYSTEM_TESTS/lib/messages.bash"
 
 # bats traces every command to tell where a test failed, which takes many times longer than most
 # commands. On a slow machine that is too much.
@@ -25,7 +26,7 @@ KEY_FILE=/var/run/veskcachepinfile-msg-server.key
 
 tool() { "$BIN/veskcachepinfiletool" "$@"; }
 
-usage() { cat "$BATS_TEST_DIRNAME/usage.txt"; }
+usage() { cat "$SYSTEM_TESTS/usage.txt"; }
 
 # answers STATUS ARGUMENT...: runs the tool, which must end with STATUS, write to standard output
 # exactly what comes on standard input, and to standard error ERRORS (nothing). ":" at the start of a

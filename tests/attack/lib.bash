@@ -1,0 +1,27 @@
+# What the attacks share: the system tests' helpers, and an ordinary user. Loaded by every .bats file here.
+# shellcheck shell=bash
+
+# shellcheck source=../system/lib.bash
+. "$BATS_TEST_DIRNAME/../system/lib.bash"
+
+ATTACKER=1234
+
+# attacker COMMAND...: runs it as a user with no rights but his own. What he runs must lie where he may look:
+# the checkout may not.
+attacker() {
+    (cd / && setpriv --reuid="$ATTACKER" --regid="$ATTACKER" --clear-groups --bounding-set=-all --inh-caps=-all \
+        --no-new-privs "$@")
+}
+
+# attacker_folder PATH: a folder of his own, as users of a volume have one.
+attacker_folder() { install -d -o "$ATTACKER" -g "$ATTACKER" -m 755 "$1"; }
+
+# attacker_tool ARGUMENT...: the tool, run by him from where he can.
+attacker_tool() {
+    if [ ! -d /tmp/attacker ]; then
+        mkdir -p /tmp/attacker/bin
+        cp "$BIN/veskcachepinfiletool" /tmp/attacker/bin/
+        cp -r "$LIB" /tmp/attacker/lib
+    fi
+    attacker /tmp/attacker/bin/veskcachepinfiletool "$@"
+}
