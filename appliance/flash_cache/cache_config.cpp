@@ -70,8 +70,8 @@ bool CacheConfigRead(const std::string &path, std::vector<CacheConfigEntry> &ent
     // Opening a FIFO would wait for a writer.
     std::string text;
     Json::Value document;
-    if (!S_ISREG(status.st_mode) || !TextRead(path, text) ||
-        !JsonParse(text, document) || !document.isObject() || !document["caches"].isArray()) {
+    if (!S_ISREG(status.st_mode) || !TextRead(path, text) || !JsonParse(text, document) ||
+        !document.isObject() || !document["caches"].isArray()) {
         return false;
     }
     std::vector<CacheConfigEntry> caches;

@@ -1,12 +1,15 @@
 #include "base/log.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstdarg>
 #include <cstdio>
+#include <cstring>
 #include <memory>
 #include <new>
 #include <sys/time.h>
 #include <syslog.h>
+#include <utility>
 
 namespace vesk {
 int LogToSyslog = 1;
@@ -17,6 +20,20 @@ namespace {
 // Readers of the log know the program by this one file name, in whichever source file a message
 // stands.
 const char kSourceFileName[] = "veskcachepinfiletool.cpp";
+
+bool IsControl(char character) {
+    return static_cast<unsigned char>(character) < 0x20 || character == 0x7f;
+}
+
+// How many characters at the end of a text are line feeds.
+size_t LineFeedsAtEnd(const char *text) {
+    const size_t length = strlen(text);
+    size_t count = 0;
+    while (count < length && text[length - count - 1] == '\n') {
+        ++count;
+    }
+    return count;
+}
 
 // One message text: a buffer on the stack, which a text that does not fit leaves for the heap.
 // Where no memory is left the text is cut: a log call never fails.
@@ -40,6 +57,33 @@ public:
         }
     }
     const char *Get() const { return grown_ ? grown_.get() : fixed_; }
+
+    // Names of files are their owners' choice: none may begin a line of its own in the log or give
+    // orders to the terminal that shows it. The last `kept` characters stay.
+    void WriteOutControls(size_t kept) {
+        char *text = grown_ ? grown_.get() : fixed_;
+        char *end = text + strlen(text) - kept;
+        const auto controls = static_cast<size_t>(std::count_if(text, end, IsControl));
+        if (controls == 0) {
+            return;
+        }
+        const size_t size = strlen(text) + 3 * controls + 1;
+        std::unique_ptr<char[]> written(new (std::nothrow) char[size]);
+        if (!written) {
+            std::replace_if(text, end, IsControl, '?');
+            return;
+        }
+        char *next = written.get();
+        for (const char *from = text; from < end; ++from) {
+            if (IsControl(*from)) {
+                next += snprintf(next, 5, "\\x%02x", static_cast<unsigned>(*from));
+            } else {
+                *next++ = *from;
+            }
+        }
+        memcpy(next, end, kept + 1);
+        grown_ = std::move(written);
+    }
 
 private:
     char fixed_[1024];
@@ -92,9 +136,16 @@ void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
     const int savedErrno = errno;
     va_list arguments;
     va_start(arguments, format);
-    const MessageText core(format, arguments);
+    MessageText core(format, arguments);
     va_end(arguments);
+    core.WriteOutControls(LineFeedsAtEnd(format));
     currentSink(logClass, place, core.Get());
+    errno = savedErrno;
+}
+
+void LogWriteDocument(const LogPlace &place, const std::string &text) {
+    const int savedErrno = errno;
+    currentSink(LogClass::Verbose, place, text.c_str());
     errno = savedErrno;
 }
 

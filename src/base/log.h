@@ -5,6 +5,9 @@
 //   level 1  errors and notices in the short form
 //   level 2  also verbose messages and the entry/exit trace, everything in the long form
 //   level 3  also debug messages
+// A control character in an argument is written as "\xNN", two lower-case hexadecimal digits; line
+// feeds at the end of a format stay.
+//
 // The facility never fails and leaves errno as it was, so a caller can log first and read errno
 // afterwards.
 //
@@ -13,6 +16,7 @@
 #pragma once
 
 #include <cstdint>
+#include <string>
 
 namespace vesk {
 extern int LogToSyslog;         // 1: system log, 0: standard output
@@ -34,6 +38,9 @@ struct LogPlace {
 void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
     __attribute__((format(printf, 3, 4)));
 
+// A verbose message of this very text.
+void LogWriteDocument(const LogPlace &place, const std::string &text);
+
 // Error and notice messages are always written, the error's long form carries a marker.
 #define LogErrorAt(place, ...) vesk::LogWrite(vesk::LogClass::Error, place, __VA_ARGS__)
 #define LogError(...) LogErrorAt(LogHere(), __VA_ARGS__)
@@ -49,6 +56,13 @@ void LogWrite(LogClass logClass, const LogPlace &place, const char *format, ...)
         }                                                                                          \
     } while (0)
 #define LogVerbose(...) LogVerboseAt(LogHere(), __VA_ARGS__)
+// With a whole document behind the title, whose lines stay as they are.
+#define LogVerboseDocument(title, document)                                                        \
+    do {                                                                                           \
+        if (vesk::LogLevel > 1) {                                                                  \
+            vesk::LogWriteDocument(LogHere(), (title) + (document));                               \
+        }                                                                                          \
+    } while (0)
 #define LogDebug(...)                                                                              \
     do {                                                                                           \
         if (vesk::LogLevel > 2) {                                                                  \

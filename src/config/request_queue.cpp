@@ -49,7 +49,7 @@ int JsonAddRequest(Json::Value &root, const RequestRecord *record) {
         }
         request["data"] = list;
     }
-    LogVerbose("After request is added: jsConf:%s", root.toStyledString().c_str());
+    LogVerboseDocument("After request is added: jsConf:", root.toStyledString());
     return 0;
 }
 

@@ -27,7 +27,8 @@ void Apply(const PlainSettings &settings) {
 
 void LogPlainly(const PlainMessage &message, const PlainSettings &settings) {
     Apply(settings);
-    plain_log::LogWrite(static_cast<plain_log::LogClass>(message.logClass),
-                        {message.function, message.line}, "%s", message.text);
+    // Formatted already.
+    plain_log::WriteOut(static_cast<plain_log::LogClass>(message.logClass),
+                        {message.function, message.line}, message.text);
 }
 } // namespace vesk

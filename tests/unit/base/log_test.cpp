@@ -91,6 +91,42 @@ TEST_F(LogToStdout, TextOfAnyLengthIsWrittenWhole) {
     }
 }
 
+TEST_F(LogToStdout, ControlCharactersOfArgumentsAreWrittenOut) {
+    CapturedLog log;
+    LogError("Can't open file (%s)", "/a\nb\x1b[2J\x01\x1f\x7f \xc3\xa9~\r");
+    EXPECT_EQ(log.Text(), "tool: Can't open file (/a\\x0ab\\x1b[2J\\x01\\x1f\\x7f \xc3\xa9~\\x0d)\n");
+}
+
+TEST_F(LogToStdout, OnlyAFormatsOwnLineFeedsStay) {
+    CapturedLog log;
+    LogError("Can't open file (%s) \n", "\n");
+    LogError("%s\n\n", "a\n");
+    LogError("%s", "a\n");
+    EXPECT_EQ(log.Text(), "tool: Can't open file (\\x0a) \n\ntool: a\\x0a\n\n\ntool: a\\x0a\n");
+}
+
+TEST_F(LogToStdout, ControlCharactersOfALongTextAreWrittenOut) {
+    for (const size_t length : {size_t{300}, size_t{1022}, size_t{1023}, size_t{5000}}) {
+        CapturedLog log;
+        LogError("%s", std::string(length, '\t').c_str());
+        std::string expected;
+        for (size_t i = 0; i < length; ++i) {
+            expected += "\\x09";
+        }
+        EXPECT_EQ(log.Text(), "tool: " + expected + "\n");
+    }
+}
+
+TEST_F(LogToStdout, ADocumentKeepsItsLines) {
+    CapturedLog silent;
+    LogVerboseDocument("jsConf:", std::string("{\n}\n"));
+    EXPECT_EQ(silent.Text(), "");
+    CapturedLog log(2);
+    LogVerboseDocument("jsConf:", std::string("{\n}\n"));
+    const std::string line = std::to_string(__LINE__ - 1);
+    EXPECT_EQ(log.Text(), "tool: TestBody() [" + line + "]: jsConf:{\n}\n\n");
+}
+
 TEST_F(LogToStdout, PercentSignsInArgumentsAreText) {
     CapturedLog log;
     LogError("File (%s) doesn't exist", "%s%n%d");

@@ -142,7 +142,7 @@ TEST_F(FileTextTest, ReadsAWholeFileWithoutWaiting) {
     EXPECT_EQ(text, "123\n456");
     EXPECT_EQ(opens.FlagsOf(path), std::vector<int>{O_RDONLY | O_NONBLOCK | O_CLOEXEC});
     EXPECT_EQ(log.Messages(),
-              (std::vector<std::string>{"FileReadString() [N]: Get text = 123", "456"}));
+              (std::vector<std::string>{"FileReadString() [N]: Get text = 123\\x0a456"}));
 }
 
 TEST_F(FileTextTest, ReadingAWholeFileFailsAsReadingItsFirstLineDoes) {

@@ -175,7 +175,7 @@ TEST_F(FileSimulateGetMappingFailedTest, ComparisonIsToldAtLevel3) {
     EXPECT_EQ(WithControl("/other"), 0);
     EXPECT_EQ(log.Messages(),
               (std::vector<std::string>{
-                  "FileReadString() [N]: Get text = /volume1/photo/a.jpg", "",
+                  "FileReadString() [N]: Get text = /volume1/photo/a.jpg\\x0a",
                   "FileSimulateGetMappingFailed() [N]: Simulate error file=/volume1/photo/a.jpg "
                   "failed failed=/volume1/photo/a.jpg ret=1",
                   "FileReadString() [N]: Get text = /other",

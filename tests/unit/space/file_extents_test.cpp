@@ -228,7 +228,7 @@ TEST_F(FileExtentsFaultTest, SimulatedFailureFailsTheLookupThatSucceeded) {
     EXPECT_EQ(log.Messages(),
               (Messages{"GetMappingTableFromFile() [N]: Start for file (/volume1/photo/a.jpg), "
                         "inode = 4711",
-                        "FileReadString() [N]: Get text = /volume1/photo/a.jpg", "",
+                        "FileReadString() [N]: Get text = /volume1/photo/a.jpg\\x0a",
                         "GetMappingTableFromFile() [N] : ***** Simulate /volume1/photo/a.jpg get "
                         "mapping failed",
                         "GetMappingTableFromFile() [N] : ***** Get mapping result fail."}));

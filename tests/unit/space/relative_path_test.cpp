@@ -10,12 +10,20 @@ namespace vesk {
 namespace {
 const char kRefused[] = "(refused)";
 
+// As the log shows a text with tabs.
+std::string WithTabsWritten(std::string text) {
+    for (size_t tab = text.find('\t'); tab != std::string::npos; tab = text.find('\t')) {
+        text.replace(tab, 1, "\\x09");
+    }
+    return text;
+}
+
 std::string Relative(const std::string &mountPath, const std::string &filePath) {
     CapturedLog log;
     const MallocText path(FileGetRelativePathByMountPath(mountPath.c_str(), filePath.c_str()));
     EXPECT_EQ(log.Text(), path ? ""
                                : "tool: Failed to Get relative path (Volume path=" + mountPath +
-                                     " File path=" + filePath + "\n");
+                                     " File path=" + WithTabsWritten(filePath) + "\n");
     return path ? path.get() : kRefused;
 }
 
