@@ -5,6 +5,7 @@
 #include "base/malloc_text.h"
 #include "base/scoped_fd.h"
 
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <fcntl.h>
@@ -28,14 +29,29 @@ int ReadAll(int fd, std::string *text) {
     text->resize(length);
     return result < 0 ? -1 : 0;
 }
+
+// A file that is made here is everybody's to read and its owner's to write, whatever the umask.
+int OpenForWriting(const char *path, int flags) {
+    const mode_t mode = 0644;
+    const int created = open(path, flags | O_CREAT | O_EXCL, mode);
+    if (created >= 0) {
+        fchmod(created, mode);
+        return created;
+    }
+    return errno == EEXIST ? open(path, flags | O_CREAT, mode) : -1;
+}
 } // namespace
 
 int FileWriteString(const char *path, const char *text, OldContent old) {
-    Stream stream(fopen(path, old == OldContent::Kept ? "a+e" : "w+e"));
+    const bool isKept = old == OldContent::Kept;
+    const int flags = O_RDWR | O_CLOEXEC | (isKept ? O_APPEND : O_TRUNC);
+    ScopedFd file(OpenForWriting(path, flags));
+    Stream stream(file.IsOpen() ? fdopen(file.Get(), isKept ? "a+" : "w+") : nullptr);
     if (!stream) {
         LogError("Can't open file (%s)", path);
         return -1;
     }
+    file.Release(); // the stream's from here on
     const size_t length = strlen(text);
     const bool written = fwrite(text, 1, length, stream.get()) == length;
     // The last bytes leave the buffer only here, so a full disk shows here.
@@ -69,7 +85,7 @@ int FileReadString(const char *path, std::string *text) {
 
 int FileReadWhole(const char *path, std::string *text) {
     const LogPlace place{"FileReadString", __LINE__};
-    const ScopedFd file(open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+    const ScopedFd file(open(path, O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
     struct stat status {};
     const int known = file.IsOpen() ? fstat(file.Get(), &status) : stat(path, &status);
     if (known == 0 && !S_ISREG(status.st_mode)) {

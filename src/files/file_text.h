@@ -7,8 +7,9 @@ namespace vesk {
 // What becomes of the content of a file that is there already.
 enum class OldContent { Emptied, Kept };
 
-// Creates or empties the file, or finds its end, and writes the text, nothing added. 0, or -1 after
-// an error message when it cannot be opened or not every byte was written.
+// Creates or empties the file, or finds its end, and writes the text, nothing added. A file that is
+// created has the mode 0644 whatever the umask. 0, or -1 after an error message when it cannot be
+// opened or not every byte was written.
 int FileWriteString(const char *path, const char *text, OldContent old = OldContent::Emptied);
 
 // The first line of the file, with its line feed if it has one. 0, or -1 after an error message

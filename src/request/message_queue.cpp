@@ -18,6 +18,21 @@ const int kKeyReadTries = 3;
 const int kSendTries = 3;
 const int kAckTries = 3;
 static_assert((IPC_CREAT | IPC_EXCL | 0644) == 0x7A4, "creation flags");
+
+// Anybody can make a queue at any key, and whoever made or owns one can send to it and give it
+// away. Only root's and the caller's own are trusted. False with errno.
+bool QueueIsTrusted(int queueId) {
+    msqid_ds status{};
+    if (msgctl(queueId, IPC_STAT, &status) < 0) {
+        return false;
+    }
+    const auto isTrusted = [](uid_t user) { return user == 0 || user == geteuid(); };
+    if (!isTrusted(status.msg_perm.uid) || !isTrusted(status.msg_perm.cuid)) {
+        errno = EPERM;
+        return false;
+    }
+    return true;
+}
 } // namespace
 
 int GetMsgKey(int *key, const char *path) {
@@ -90,7 +105,7 @@ int MsgQueueGet(const char *keyFile) {
         return -1;
     }
     queueId = msgget(key, 0);
-    if (queueId == -1) {
+    if (queueId == -1 || !QueueIsTrusted(queueId)) {
         LogError("Can't open message queue: %s", strerror(errno));
         return -1;
     }

@@ -42,7 +42,8 @@ int GetMsgKey(int *key, const char *path);
 // or -1: the queue exists already (only a verbose message) or, after an error message, failure.
 int MsgCreateExclusive(const char *keyFile);
 
-// Creates or opens the queue. Its identifier, or -1 after an error message. errno tells why.
+// Creates or opens the queue. Its identifier, or -1 after an error message. errno tells why: EPERM
+// for a queue whose creator or owner is neither root nor the caller.
 int MsgQueueGet(const char *keyFile);
 
 // Sends without blocking, up to three times, a second apart; a failing send takes three seconds.

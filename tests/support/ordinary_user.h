@@ -1,4 +1,4 @@
-// Takes root's power over file modes away for the length of a scope.
+// Acting for another user than root: for the length of a scope root's power over files is away.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -20,4 +20,10 @@ public:
     OrdinaryUser(const OrdinaryUser &) = delete;
     OrdinaryUser &operator=(const OrdinaryUser &) = delete;
 };
+
+#define SKIP_WITHOUT_ROOT()                                                                        \
+    if (geteuid() != 0) {                                                                          \
+        GTEST_SKIP() << "acting for another user needs root";                                      \
+    }                                                                                              \
+    static_assert(true, "a semicolon follows")
 } // namespace vesk

@@ -3,6 +3,7 @@
 
 #include "files/file_replace.h"
 #include "tests/support/leak_checked_test.h"
+#include "tests/support/ordinary_user.h"
 #include "tests/support/temp_dir.h"
 
 #include <algorithm>
@@ -89,10 +90,4 @@ protected:
 private:
     mode_t savedMask_ = 0;
 };
-
-#define SKIP_WITHOUT_ROOT()                                                                        \
-    if (geteuid() != 0) {                                                                          \
-        GTEST_SKIP() << "acting for another user needs root";                                      \
-    }                                                                                              \
-    static_assert(true, "a semicolon follows")
 } // namespace vesk

@@ -50,6 +50,29 @@ TEST_F(FileTextTest, WritesBehindTheOldContentWhereThatIsKept) {
     EXPECT_EQ(ReadWhole(path), "12");
 }
 
+TEST_F(FileTextTest, ANewFileIsEverybodysToReadWhateverTheUmask) {
+    const auto modeOf = [](const std::string &file) {
+        struct stat status {};
+        EXPECT_EQ(stat(file.c_str(), &status), 0);
+        return status.st_mode & 07777;
+    };
+    CapturedLog log;
+    for (const mode_t mask : {0, 022, 077}) {
+        const mode_t before = umask(mask);
+        for (const OldContent old : {OldContent::Kept, OldContent::Emptied}) {
+            EXPECT_EQ(FileWriteString(path.c_str(), "", old), 0);
+            EXPECT_EQ(modeOf(path), 0644U);
+            EXPECT_EQ(unlink(path.c_str()), 0);
+        }
+        umask(before);
+    }
+    // One that is there stays what it is.
+    WriteWhole(path, "");
+    ASSERT_EQ(chmod(path.c_str(), 0600), 0);
+    EXPECT_EQ(FileWriteString(path.c_str(), "1"), 0);
+    EXPECT_EQ(modeOf(path), 0600U);
+}
+
 TEST_F(FileTextTest, EmptyTextMakesAnEmptyFile) {
     CapturedLog log;
     EXPECT_EQ(FileWriteString(path.c_str(), ""), 0);
@@ -140,7 +163,7 @@ TEST_F(FileTextTest, ReadsAWholeFileWithoutWaiting) {
     std::string text = "before";
     EXPECT_EQ(FileReadWhole(path.c_str(), &text), 0);
     EXPECT_EQ(text, "123\n456");
-    EXPECT_EQ(opens.FlagsOf(path), std::vector<int>{O_RDONLY | O_NONBLOCK | O_CLOEXEC});
+    EXPECT_EQ(opens.FlagsOf(path), std::vector<int>{O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC});
     EXPECT_EQ(log.Messages(),
               (std::vector<std::string>{"FileReadString() [N]: Get text = 123\\x0a456"}));
 }

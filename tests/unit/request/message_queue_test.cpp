@@ -1,18 +1,39 @@
 #include "request/message_queue.h"
 
+#include "tests/support/ordinary_user.h"
 #include "tests/support/queue_fixture.h"
 
 #include <atomic>
 #include <cerrno>
 #include <cstddef>
+#include <optional>
 #include <stdexcept>
 #include <sys/ipc.h>
 #include <sys/msg.h>
+#include <sys/stat.h>
 #include <thread>
 
 namespace vesk {
 namespace {
 const bool kPrivateWorld = UsePrivateWorld();
+
+// A queue at a key of its own, made by root or by an ordinary user, and given to this user then.
+int MakeQueue(bool byOrdinaryUser, uid_t owner) {
+    const key_t key = 0x5a5a5a5a;
+    int id = -1;
+    {
+        std::optional<OrdinaryUser> user;
+        if (byOrdinaryUser) {
+            user.emplace();
+        }
+        id = msgget(key, IPC_CREAT | IPC_EXCL | 0666);
+    }
+    msqid_ds status{};
+    EXPECT_EQ(msgctl(id, IPC_STAT, &status), 0);
+    status.msg_perm.uid = owner;
+    EXPECT_EQ(msgctl(id, IPC_SET, &status), 0);
+    return id;
+}
 } // namespace
 
 class MessageQueueTest : public QueueTest {};
@@ -143,6 +164,47 @@ TEST_F(MessageQueueTest, WithoutAnyKeyTheGetFails) {
                                   "Can't find the message queue's key from file (" + path + ")",
                               }));
     EXPECT_EQ(FakeLibc::sleeps, 0);
+}
+
+TEST_F(MessageQueueTest, OnlyRootsAndTheCallersOwnQueuesAreUsed) {
+    SKIP_WITHOUT_ROOT();
+    const uid_t user = 65534;
+    const struct {
+        bool byOrdinaryUser;
+        uid_t owner;
+        bool rootUsesIt;
+        bool userUsesIt;
+    } queues[] = {{false, 0, true, true},
+                  {false, user, false, true},
+                  {true, 0, false, true},
+                  {true, user, false, true},
+                  {true, 1234, false, false}};
+    for (const auto &queue : queues) {
+        EmptyPrivateWorld();
+        const int id = MakeQueue(queue.byOrdinaryUser, queue.owner);
+        WriteWhole(keyFile_, "");
+        // Its key is not the one that the file gives, which is another's already.
+        const int taken = msgget(ftok(KeyFile(), 'x'), IPC_CREAT | 0644);
+        EXPECT_NE(taken, -1);
+        WriteWhole(keyFile_, std::to_string(0x5a5a5a5a));
+        CapturedLog log;
+        const Messages refused{"Can't open message queue: Operation not permitted"};
+        errno = 0;
+        EXPECT_EQ(MsgQueueGet(KeyFile()), queue.rootUsesIt ? id : -1);
+        EXPECT_EQ(log.Messages(), queue.rootUsesIt ? Messages{} : refused);
+        EXPECT_EQ(errno == EPERM, !queue.rootUsesIt);
+        chmod(folder_.Path().c_str(), 0755);
+        const OrdinaryUser caller;
+        EXPECT_EQ(MsgQueueGet(KeyFile()), queue.userUsesIt ? id : -1);
+    }
+}
+
+TEST_F(MessageQueueTest, AQueueThatCannotBeAskedAboutIsNotUsed) {
+    MsgQueueGet(KeyFile());
+    FakeLibc::Fail("msgctl", EACCES);
+    CapturedLog log;
+    EXPECT_EQ(MsgQueueGet(KeyFile()), -1);
+    EXPECT_EQ(log.Messages(), Messages{"Can't open message queue: Permission denied"});
 }
 
 TEST_F(MessageQueueTest, AKeyThatCannotBeMadeFails) {

@@ -102,7 +102,8 @@ TEST_F(FileSimulateGetMappingFailedTest, ControlFileIsOpenedForReadingWithoutWai
     CapturedLog log;
     const RecordedOpens opens;
     EXPECT_EQ(WithControl("/volume1/photo/a.jpg\n"), 1);
-    EXPECT_EQ(opens.FlagsOf(kControlFile), std::vector<int>{O_RDONLY | O_NONBLOCK | O_CLOEXEC});
+    EXPECT_EQ(opens.FlagsOf(kControlFile),
+              std::vector<int>{O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC});
 }
 
 TEST_F(FileSimulateGetMappingFailedTest, ControlFileIsReadAnewEveryTime) {
