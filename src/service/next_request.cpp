@@ -55,7 +55,7 @@ int DropRequests(const std::vector<std::string> &numbers, Json::Value &root, con
 } // namespace
 
 NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, RequestRecord *out,
-                                                  std::string *num) {
+                                                  std::string *num, const PutOffRequests &putOff) {
     const ServiceLockGuard lock;
     Json::Value root;
     if (WaitForQueuedRequest(configPath, &root, LogHere()) < 0) {
@@ -93,6 +93,9 @@ NextRequest ConfigParseAndGetNextAvailableRequest(const char *configPath, Reques
         }
         if (ServiceIsPendingSpace(mountPath)) {
             LogVerbose("Request num (%s) volume (%s) is pending", number.c_str(), mountPath);
+            continue;
+        }
+        if (PutOffPasses(putOff, mountPath)) {
             continue;
         }
         out->type = StringToRequestType(request["type"].asString());

@@ -5,6 +5,7 @@
 #include "config/request_queue.h"
 #include "request/tool_parameters.h"
 #include "service/next_request.h"
+#include "service/put_off.h"
 #include "service/request_handlers.h"
 #include "service/signal_handler.h"
 
@@ -14,16 +15,47 @@
 
 namespace vesk {
 namespace {
+void DropFailedRequest(const char *configPath, const RequestRecord *record, const std::string &num,
+                       const char *typeName) {
+    const LogPlace place{"HandleRequestAndModifyConfig", __LINE__};
+    LogErrorAt(place, "Handle request error (num = %s, type = %s), drop it.", num.c_str(),
+               typeName);
+    if (ConfigDropErrorRequest(configPath, record, num) < 0) {
+        LogErrorAt(place, "Can't drop request");
+    }
+}
+
+// Where memory is short the request is put off, which the caller is told by the exception, or given
+// up.
+WorkResult HandleOrPutOff(const char *configPath, RequestRecord *record, const std::string &num,
+                          PutOffRequests *putOff) {
+    WorkResult result = WorkResult::Failed;
+    try {
+        result = HandleRequestAndModifyConfig(configPath, record, num);
+    } catch (const std::exception &) {
+        if (PutOffNote(putOff, num, record->mountPath)) {
+            throw;
+        }
+        DropFailedRequest(configPath, record, num, RequestTypeForLog(record->type));
+    }
+    PutOffForget(putOff, num);
+    return result;
+}
+
 // Chooses one request and has it carried out. False when the choice has failed.
-bool DoNextRequest(const char *configPath, const LogPlace &place) {
+bool DoNextRequest(const char *configPath, PutOffRequests *putOff, const LogPlace &place) {
     RequestRecord record{};
     std::string num;
-    const NextRequest next = ConfigParseAndGetNextAvailableRequest(configPath, &record, &num);
+    const NextRequest next =
+        ConfigParseAndGetNextAvailableRequest(configPath, &record, &num, *putOff);
     if (next == NextRequest::Error) {
         return false;
     }
+    if (next == NextRequest::None) {
+        PutOffEnd(putOff);
+    }
     if (next == NextRequest::Taken) {
-        const WorkResult result = HandleRequestAndModifyConfig(configPath, &record, num);
+        const WorkResult result = HandleOrPutOff(configPath, &record, num, putOff);
         if (result == WorkResult::Failed) {
             return true;
         }
@@ -46,10 +78,11 @@ void *DoRequests(void *options) {
     {
         LogTraceScope();
         const char *configPath = static_cast<const ToolParameters *>(options)->configPath;
+        PutOffRequests putOff;
         bool choosing = true;
         while (choosing) {
             try {
-                choosing = DoNextRequest(configPath, LogHere());
+                choosing = DoNextRequest(configPath, &putOff, LogHere());
             } catch (const std::exception &error) {
                 // Memory is short. Whatever was going on, the request is still queued.
                 LogError("Request is put off: %s", error.what());
@@ -73,12 +106,7 @@ WorkResult HandleRequestAndModifyConfig(const char *configPath, RequestRecord *r
             LogError("Can't remove request (%s) from config file", num.c_str());
         }
         break;
-    case WorkResult::Failed:
-        LogError("Handle request error (num = %s, type = %s), drop it.", num.c_str(), typeName);
-        if (ConfigDropErrorRequest(configPath, record, num) < 0) {
-            LogError("Can't drop request");
-        }
-        break;
+    case WorkResult::Failed: DropFailedRequest(configPath, record, num, typeName); break;
     case WorkResult::Interrupted:
         LogVerbose("Handle request interruped (num = %s, type = %s)", num.c_str(), typeName);
         break;

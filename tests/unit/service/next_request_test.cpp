@@ -18,10 +18,10 @@ protected:
         ConfigTest::SetUp();
         FakeApplianceOneVolume("/dev/cachedev_0");
     }
-    NextRequest Next() {
+    NextRequest Next(const PutOffRequests &putOff = {}) {
         record_ = RequestRecord{};
         num_ = "old";
-        return ConfigParseAndGetNextAvailableRequest(path_.c_str(), &record_, &num_);
+        return ConfigParseAndGetNextAvailableRequest(path_.c_str(), &record_, &num_, putOff);
     }
     // Two queued requests, numbers 0 and 1, and records of both volumes.
     void StoreTwo(const std::string &first, const std::string &second) {
@@ -49,6 +49,22 @@ TEST_F(NextRequestTest, TheOldestRequestIsTakenAndStaysInTheFile) {
     EXPECT_STREQ(record_.data, "share/b.bin#5678");
     EXPECT_EQ(log.Messages(), Messages{});
     EXPECT_EQ(Stored(), kExampleDocument);
+}
+
+TEST_F(NextRequestTest, RequestsOfAVolumeThatIsPutOffArePassedOverAndKeepTheirPlace) {
+    FakeAppliance::spaces.push_back({"/dev/space9", "/volume9", "uuid-9"});
+    FakeAppliance::caches.push_back({"uuid-9", "/dev/ssd9", "/dev/cachedev_9"});
+    StoreTwo(kPinA, R"({"type" : "reloadPinBlocks", "mountPath" : "/volume9", "data" : null})");
+    const std::string before = Stored();
+    CapturedLog log;
+    EXPECT_EQ(Next({{}, {"/volume1"}}), NextRequest::Taken);
+    EXPECT_EQ(num_, "1");
+    EXPECT_STREQ(record_.mountPath, "/volume9");
+    EXPECT_EQ(Next({{}, {"/volume9"}}), NextRequest::Taken);
+    EXPECT_EQ(num_, "0");
+    EXPECT_EQ(Next({{}, {"/volume1", "/volume9"}}), NextRequest::None);
+    EXPECT_EQ(log.Messages(), Messages{});
+    EXPECT_EQ(Stored(), before);
 }
 
 TEST_F(NextRequestTest, ATakenRequestIsLoggedWithAnOpenParenthesis) {

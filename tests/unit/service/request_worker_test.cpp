@@ -265,6 +265,38 @@ TEST_F(RequestWorkerTest, ALackOfMemoryPutsTheChoiceOffForASecond) {
     EXPECT_EQ(FakeLibc::sleeps, 2);
 }
 
+TEST_F(RequestWorkerTest, ALackOfMemoryGivesOthersTheirTurnAndEndsAfterTenTries) {
+    const std::string other = folder_.Path("volume2");
+    std::filesystem::create_directory(other);
+    FakeAppliance::spaces.push_back({"/dev/space2", other, "uuid-2"});
+    FakeAppliance::caches.push_back({"uuid-2", "/dev/ssd2", device_->Path()});
+    const std::string reload = R"({"type" : "reloadPinBlocks", "mountPath" : ")";
+    WriteWhole(config_, R"({"nextRequestNum" : 3, "requestQueue" : ["0", "1", "2"], "requests" : {
+        "0" : )" + reload + volume_ +
+                            R"("}, "1" : )" + reload + volume_ + R"("}, "2" : )" + reload + other +
+                            R"("}}})");
+    WriteWhole(bitmapFile_, std::string(2, '\0'));
+    // As long as the first request is there, the volume's bitmap cannot be looked at.
+    FakeLibc::onOpen = [this](const std::string &path, int, unsigned) {
+        if (path == bitmapFile_ && ReadWhole(config_).find(R"("0")") != std::string::npos) {
+            throw std::bad_alloc();
+        }
+    };
+    // After each failure but the first and the last nothing else can be done.
+    EndInPause(1 + 1 + 2 * 8 + 1);
+    CapturedLog log;
+    RunWorker();
+    FakeLibc::onOpen = nullptr;
+    const std::string putOff = "Request is put off: std::bad_alloc";
+    const std::string done = "Handle request (type=reloadPinBlocks) OK ";
+    Messages expected = {putOff, done};
+    expected.insert(expected.end(), 8, putOff);
+    expected.insert(expected.end(),
+                    {"Handle request error (num = 0, type = reloadPinBlocks), drop it.", done});
+    expected.insert(expected.end(), end_.begin(), end_.end());
+    EXPECT_EQ(log.Messages(), expected);
+}
+
 TEST_F(RequestWorkerTest, AtLevel2TheThreadIsTracedAndItsMessagesAreItsOwn) {
     Queue({{"reloadPinBlocks", "null"}});
     EndInPause(1);
