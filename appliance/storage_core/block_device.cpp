@@ -8,11 +8,42 @@
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <fstream>
 #include <memory>
+#include <vector>
 
 namespace vesk {
 namespace {
+using TypeNames = std::vector<std::string>;
+
+// What libblkid may call a filesystem that is mounted as this type. One driver mounts all of ext.
+TypeNames ProbeTypesOfMount(const std::string &mountType) {
+    static const struct {
+        TypeNames mounted;
+        TypeNames probed;
+    } kNamedOtherwise[] = {{{"ext2", "ext3", "ext4"}, {"ext2", "ext3", "ext4"}},
+                           {{"msdos", "vfat"}, {"vfat"}},
+                           {{"ntfs", "ntfs3"}, {"ntfs"}},
+                           {{"fuseblk"}, {"ntfs", "exfat"}}};
+    const std::string driver = mountType.substr(0, mountType.find('.')); // "fuseblk.ntfs"
+    for (const auto &kind : kNamedOtherwise) {
+        if (std::find(kind.mounted.begin(), kind.mounted.end(), driver) != kind.mounted.end()) {
+            return kind.probed;
+        }
+    }
+    return {mountType};
+}
+
+bool ProbeOnlyTypes(blkid_probe probe, TypeNames types) {
+    std::vector<char *> names; // a list that ends with null, which libblkid does not change
+    for (std::string &type : types) {
+        names.push_back(&type[0]);
+    }
+    names.push_back(nullptr);
+    return blkid_probe_filter_superblocks_type(probe, BLKID_FLTR_ONLYIN, names.data()) == 0;
+}
+
 // Empty where there is no such file.
 std::string FirstLineOf(const std::string &path) {
     std::ifstream stream(path);
@@ -73,12 +104,14 @@ bool BlockDeviceHasOffset(dev_t device, const std::string &folder) {
            (below != 0 && below != device && BlockDeviceHasOffset(below, folder));
 }
 
-std::string BlockDeviceProbe(const std::string &devicePath, const char *name) {
+std::string BlockDeviceProbe(const std::string &devicePath, const char *name,
+                             const std::string &mountType) {
     const std::unique_ptr<blkid_struct_probe, Deleter<blkid_free_probe>> probe(
         blkid_new_probe_from_filename(devicePath.c_str()));
     if (probe == nullptr || blkid_probe_enable_superblocks(probe.get(), 1) != 0 ||
         blkid_probe_set_superblocks_flags(probe.get(), BLKID_SUBLKS_UUID | BLKID_SUBLKS_TYPE) !=
             0 ||
+        (!mountType.empty() && !ProbeOnlyTypes(probe.get(), ProbeTypesOfMount(mountType))) ||
         blkid_do_safeprobe(probe.get()) != 0) {
         return {};
     }

@@ -30,7 +30,11 @@ dev_t BlockDeviceNumber(const std::string &devicePath);
 bool BlockDeviceHasOffset(dev_t device, const std::string &folder = "/sys/dev/block");
 
 // One value of the superblock found on a block device, by libblkid's name for it ("UUID", "TYPE").
+// Of a filesystem that is mounted (`mountType`, the mount table's word) only superblocks of that
+// type count: whoever may write files on it can give their blocks the bytes of any other, a RAID's
+// at the device's end for instance. Empty type: not mounted, every kind counts.
 // Empty: no such value, or the device cannot be read or carries signatures that contradict each
 // other.
-std::string BlockDeviceProbe(const std::string &devicePath, const char *name);
+std::string BlockDeviceProbe(const std::string &devicePath, const char *name,
+                             const std::string &mountType);
 } // namespace vesk

@@ -63,7 +63,7 @@ std::string DeviceOfFile(const std::vector<MountEntry> &mounts, const std::strin
 }
 
 // What to know of the filesystem on a device: from the mount table, or, where it is not mounted,
-// from its superblock.
+// from its superblock. The latter may be a user's invention, but no file is found on such a device.
 MountEntry MountOfDevice(const std::string &devicePath, dev_t number) {
     std::vector<MountEntry> mounts;
     if (MountTableRead(kMountTablePath, mounts)) {
@@ -73,7 +73,7 @@ MountEntry MountOfDevice(const std::string &devicePath, dev_t number) {
     }
     MountEntry unmounted;
     unmounted.device = number;
-    unmounted.type = BlockDeviceProbe(devicePath, "TYPE");
+    unmounted.type = BlockDeviceProbe(devicePath, "TYPE", "");
     return unmounted;
 }
 } // namespace

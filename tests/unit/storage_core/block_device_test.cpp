@@ -4,11 +4,15 @@
 
 #include <gtest/gtest.h>
 
+#include <fcntl.h>
+#include <linux/fs.h>
+#include <sys/ioctl.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 #include <unistd.h>
 
 #include <filesystem>
+#include <fstream>
 
 namespace vesk {
 namespace {
@@ -92,11 +96,60 @@ TEST_F(BlockDevice, RelativeSourceIsNoPath) {
 }
 
 TEST_F(BlockDevice, ProbeTellsTypeAndUuid) {
-    EXPECT_EQ(BlockDeviceProbe(volume->device, "TYPE"), "ext4");
-    EXPECT_EQ(BlockDeviceProbe(volume->device, "UUID"), volume->uuid);
-    EXPECT_EQ(BlockDeviceProbe(volume->device, "NO_SUCH_VALUE"), "");
-    EXPECT_EQ(BlockDeviceProbe("/nonexistent", "UUID"), "");
-    EXPECT_EQ(BlockDeviceProbe("", "UUID"), "");
+    for (const char *mountType : {"", "ext4", "ext3", "ext2"}) {
+        EXPECT_EQ(BlockDeviceProbe(volume->device, "TYPE", mountType), "ext4") << mountType;
+        EXPECT_EQ(BlockDeviceProbe(volume->device, "UUID", mountType), volume->uuid) << mountType;
+        EXPECT_EQ(BlockDeviceProbe(volume->device, "NO_SUCH_VALUE", mountType), "") << mountType;
+        EXPECT_EQ(BlockDeviceProbe("/nonexistent", "UUID", mountType), "") << mountType;
+        EXPECT_EQ(BlockDeviceProbe("", "UUID", mountType), "") << mountType;
+    }
+    for (const char *mountType : {"xfs", "vfat", "fuseblk", "autofs", "ext4dev", "ext"}) {
+        EXPECT_EQ(BlockDeviceProbe(volume->device, "UUID", mountType), "") << mountType;
+    }
+}
+
+// Bytes as files of the volume may bring them to these places.
+class ForeignSignature : public BlockDevice {
+protected:
+    void Put(const std::string &bytes, uint64_t offset) {
+        std::fstream image(volume->imagePath, std::ios::in | std::ios::out | std::ios::binary);
+        image.seekp(static_cast<std::streamoff>(offset));
+        image << bytes;
+        image.close();
+        ASSERT_TRUE(image.good());
+        const ScopedFd fd(open(volume->device.c_str(), O_RDONLY | O_CLOEXEC));
+        ASSERT_EQ(ioctl(fd.Get(), BLKFLSBUF), 0);
+    }
+    void TearDown() override {
+        if (volume->skipReason.empty()) {
+            Put(std::string(kRaidEnd - kRaidPlace, '\0'), kRaidPlace);
+            Put(std::string(8, '\0'), kBtrfsMagicPlace);
+        }
+    }
+    std::string Uuid(const char *mountType) const {
+        return BlockDeviceProbe(volume->device, "UUID", mountType);
+    }
+    // A RAID's superblock, version 0.90: magic number and version, then the first part of its UUID.
+    static std::string Raid() {
+        return std::string("\xfc\x4e\x2b\xa9\0\0\0\0\x5a\0\0\0\0\0\0\0\0\0\0\0uuid", 24);
+    }
+    static constexpr uint64_t kRaidPlace = kExt4Bytes - 65536;
+    static constexpr uint64_t kRaidEnd = kRaidPlace + 4096;
+    static constexpr uint64_t kBtrfsMagicPlace = 65536 + 64;
+};
+
+TEST_F(ForeignSignature, OfARaidChangesNothingOfAMountedFilesystem) {
+    Put(Raid(), kRaidPlace);
+    EXPECT_EQ(BlockDeviceProbe(volume->device, "TYPE", ""), "linux_raid_member");
+    EXPECT_NE(Uuid(""), volume->uuid);
+    EXPECT_EQ(Uuid("ext4"), volume->uuid);
+    EXPECT_EQ(BlockDeviceProbe(volume->device, "TYPE", "ext4"), "ext4");
+}
+
+TEST_F(ForeignSignature, OfAnotherFilesystemChangesNothingOfAMountedOne) {
+    Put("_BHRfS_M", kBtrfsMagicPlace);
+    EXPECT_EQ(Uuid(""), "") << "two contradict each other";
+    EXPECT_EQ(Uuid("ext4"), volume->uuid);
 }
 
 // A folder as the kernel describes devices in, by number.

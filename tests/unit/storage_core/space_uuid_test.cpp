@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+#include <fcntl.h>
+
 #include <cstring>
 
 namespace vesk {
@@ -26,6 +28,27 @@ TEST(VESKSpaceUUIDGet, IsTheFilesystems) {
     }
     EXPECT_EQ(UuidOf(ext4.device), ext4.uuid);
     EXPECT_EQ(UuidOf(xfs.device), xfs.uuid);
+}
+
+TEST(VESKSpaceUUIDGet, IsTheFilesystemsOfABtrfs) {
+    const TestVolume btrfs("uuid-btrfs", kMakeBtrfs, kBtrfsBytes);
+    if (!btrfs.skipReason.empty()) {
+        GTEST_SKIP() << btrfs.skipReason;
+    }
+    EXPECT_EQ(UuidOf(btrfs.device), btrfs.uuid);
+}
+
+TEST(VESKSpaceUUIDGet, NullOfWhatIsNotMountedAnyMore) {
+    TestVolume volume("uuid-unmounted", kMakeExt4, kExt4Bytes);
+    if (!volume.skipReason.empty()) {
+        GTEST_SKIP() << volume.skipReason;
+    }
+    const std::string path = volume.device;
+    const ScopedFd held(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    ASSERT_TRUE(held.IsOpen());
+    EXPECT_EQ(UuidOf(path), volume.uuid);
+    volume.Unmount();
+    EXPECT_EQ(UuidOf(path), "(null)");
 }
 
 TEST(VESKSpaceUUIDGet, NullWithoutAFilesystem) {
