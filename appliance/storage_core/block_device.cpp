@@ -54,13 +54,18 @@ std::string FirstLineOf(const std::string &path) {
 } // namespace
 
 std::string BlockDeviceOfMount(const MountEntry &mount) {
+    // Any filesystem can be given a device path as its source ("mount -t tmpfs /dev/sda1 ..."),
+    // but of those without a device number only btrfs means it. The others' must not even be looked
+    // at: users name the sources of their FUSE mounts, and a look below one of these can last.
+    const bool hasNumber = major(mount.device) != 0;
+    if (!hasNumber && mount.type != "btrfs") {
+        return {};
+    }
     // A source such as "tank/data" or "none" must not be looked up in the current directory.
     const bool isPath = !mount.source.empty() && mount.source.front() == '/';
     const dev_t number = isPath ? BlockDeviceNumber(mount.source) : 0;
-    if (major(mount.device) == 0) {
-        // Any filesystem can be given a device path as its source ("mount -t tmpfs /dev/sda1 ..."),
-        // but of those without a device number only btrfs means it.
-        return mount.type == "btrfs" && number != 0 ? mount.source : std::string();
+    if (!hasNumber) {
+        return number != 0 ? mount.source : std::string();
     }
     return number == mount.device ? mount.source : BlockDeviceByNumber(mount.device);
 }
