@@ -1,6 +1,7 @@
 #include "storage_core/directory_entry.h"
 
 #include "base/deleter.h"
+#include "storage_core/folder_open.h"
 
 #include <dirent.h>
 #include <fcntl.h>
@@ -38,7 +39,7 @@ public:
         entries_.clear();
         names_.clear();
         status_ = {}; // of no folder, until all is read
-        ScopedFd again(openat(fd, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+        ScopedFd again(openat(fd, ".", kOpenForReading | O_DIRECTORY));
         const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(again.Get()));
         if (stream == nullptr) {
             return;
@@ -98,10 +99,9 @@ bool SearchFolder(int folder, bool remembered, InodeSearch &search) {
 }
 
 ScopedFd OpenFound(int folder, const InodeSearch &search) {
-    // Non-blocking: the entry may have become a FIFO meanwhile. What was opened is checked for the
-    // same reason.
-    ScopedFd file(
-        openat(folder, search.name.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    // The entry may have become a FIFO or a terminal meanwhile: opening neither waits nor takes it
+    // over, and what was opened is checked.
+    ScopedFd file(openat(folder, search.name.c_str(), kOpenForReading | O_NOFOLLOW));
     struct stat status = {};
     if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
         status.st_ino != search.candidate) {
@@ -133,13 +133,12 @@ bool InodeSearchFound(const InodeSearch &search) {
     return !search.name.empty() && (search.isExact || !search.isAmbiguous);
 }
 
-ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode) {
-    const ScopedFd folder(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+ScopedFd DirectoryOpenFile(int folder, uint64_t inode) {
     for (const bool remembered : {true, false}) {
         InodeSearch search;
         search.wanted = inode;
-        if (folder.IsOpen() && SearchFolder(folder.Get(), remembered, search)) {
-            ScopedFd file = OpenFound(folder.Get(), search);
+        if (SearchFolder(folder, remembered, search)) {
+            ScopedFd file = OpenFound(folder, search);
             if (file.IsOpen()) {
                 return file;
             }

@@ -27,7 +27,7 @@ void InodeSearchOffer(InodeSearch &search, uint64_t inode, const char *name);
 // Whether the search found one file; `candidate` and `name` are then its number and its entry.
 bool InodeSearchFound(const InodeSearch &search);
 
-// Opens the regular file with this inode number (or these low 32 bits of it) in a directory, for
-// reading, without following a symbolic link. Not open: no such file, or a failure.
-ScopedFd DirectoryOpenFile(const std::string &directory, uint64_t inode);
+// Opens the regular file with this inode number (or these low 32 bits of it) in an open directory,
+// for reading, without following a symbolic link. Not open: no such file, or a failure.
+ScopedFd DirectoryOpenFile(int directory, uint64_t inode);
 } // namespace vesk

@@ -4,6 +4,7 @@
 #include "storage_core/block_device.h"
 #include "storage_core/directory_entry.h"
 #include "storage_core/file_extents.h"
+#include "storage_core/folder_open.h"
 #include "storage_core/mount_table.h"
 
 #include <sys/stat.h>
@@ -30,7 +31,8 @@ int FiemapDevice::GetMappingByInode(const std::string &directory, uint64_t inode
                                     FileMappingTable &table) {
     table.entries.clear();
     try {
-        const ScopedFd file = DirectoryOpenFile(directory, inode);
+        const ScopedFd folder = FolderOpenOnDevice(directory, number_);
+        const ScopedFd file = folder.IsOpen() ? DirectoryOpenFile(folder.Get(), inode) : ScopedFd();
         struct stat status = {};
         if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || status.st_dev != number_) {
             return -1;

@@ -60,11 +60,16 @@ uint64_t InodeOfPath(const std::string &path) {
     return status.st_ino;
 }
 
+ScopedFd OpenIn(const std::string &directory, uint64_t inode) {
+    const ScopedFd folder(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    return DirectoryOpenFile(folder.Get(), inode);
+}
+
 TEST(DirectoryOpenFile, OpensJustThatFile) {
     const TestFolder folder;
     const std::string path = folder.FileMake("wanted", "text");
     folder.FileMake("other", "text");
-    const ScopedFd file = DirectoryOpenFile(folder.Path(), InodeOfPath(path));
+    const ScopedFd file = OpenIn(folder.Path(), InodeOfPath(path));
     ASSERT_TRUE(file.IsOpen());
     struct stat status = {};
     ASSERT_EQ(fstat(file.Get(), &status), 0);
@@ -83,9 +88,9 @@ TEST(DirectoryOpenFile, OpensNothingButRegularFilesOfThisDirectory) {
     std::filesystem::create_symlink(inner, link);
     ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
     for (const std::string &path : {link, fifo, below, inner}) {
-        EXPECT_FALSE(DirectoryOpenFile(folder.Path(), InodeOfPath(path)).IsOpen()) << path;
+        EXPECT_FALSE(OpenIn(folder.Path(), InodeOfPath(path)).IsOpen()) << path;
     }
-    EXPECT_TRUE(DirectoryOpenFile(below, InodeOfPath(inner)).IsOpen());
+    EXPECT_TRUE(OpenIn(below, InodeOfPath(inner)).IsOpen());
 }
 
 // The folder's files are remembered; what happens to them at once, within one tick of its clock,
@@ -93,16 +98,16 @@ TEST(DirectoryOpenFile, OpensNothingButRegularFilesOfThisDirectory) {
 TEST(DirectoryOpenFile, SeesWhatHappensBetweenItsCalls) {
     const TestFolder folder;
     const uint64_t first = InodeOfPath(folder.FileMake("first", "text"));
-    ASSERT_TRUE(DirectoryOpenFile(folder.Path(), first).IsOpen());
+    ASSERT_TRUE(OpenIn(folder.Path(), first).IsOpen());
     for (int i = 0; i < 100; ++i) {
         const std::string path = folder.FileMake("another", "text");
         const uint64_t another = InodeOfPath(path);
-        ASSERT_TRUE(DirectoryOpenFile(folder.Path(), another).IsOpen()) << i;
+        ASSERT_TRUE(OpenIn(folder.Path(), another).IsOpen()) << i;
         std::filesystem::rename(path, folder.Path("renamed"));
-        ASSERT_TRUE(DirectoryOpenFile(folder.Path(), another).IsOpen()) << i;
-        ASSERT_TRUE(DirectoryOpenFile(folder.Path(), first).IsOpen()) << i;
+        ASSERT_TRUE(OpenIn(folder.Path(), another).IsOpen()) << i;
+        ASSERT_TRUE(OpenIn(folder.Path(), first).IsOpen()) << i;
         std::filesystem::remove(folder.Path("renamed"));
-        ASSERT_FALSE(DirectoryOpenFile(folder.Path(), another).IsOpen()) << i;
+        ASSERT_FALSE(OpenIn(folder.Path(), another).IsOpen()) << i;
     }
 }
 
@@ -110,9 +115,9 @@ TEST(DirectoryOpenFile, FailsOnWhatIsNoDirectory) {
     const TestFolder folder;
     const std::string path = folder.FileMake("file", "text");
     const uint64_t inode = InodeOfPath(path);
-    EXPECT_FALSE(DirectoryOpenFile(path, inode).IsOpen());
-    EXPECT_FALSE(DirectoryOpenFile(folder.Path("missing"), inode).IsOpen());
-    EXPECT_FALSE(DirectoryOpenFile("", inode).IsOpen());
+    EXPECT_FALSE(OpenIn(path, inode).IsOpen());
+    EXPECT_FALSE(OpenIn(folder.Path("missing"), inode).IsOpen());
+    EXPECT_FALSE(OpenIn("", inode).IsOpen());
 }
 
 TEST(DirectoryOpenFile, LeavesNoDescriptorOpen) {
@@ -123,8 +128,8 @@ TEST(DirectoryOpenFile, LeavesNoDescriptorOpen) {
         return probe.Get();
     };
     const int before = lowestFree();
-    EXPECT_TRUE(DirectoryOpenFile(folder.Path(), inode).IsOpen());
-    EXPECT_FALSE(DirectoryOpenFile(folder.Path(), inode + 1000000).IsOpen());
+    EXPECT_TRUE(OpenIn(folder.Path(), inode).IsOpen());
+    EXPECT_FALSE(OpenIn(folder.Path(), inode + 1000000).IsOpen());
     EXPECT_EQ(lowestFree(), before);
 }
 
@@ -147,17 +152,17 @@ TEST(DirectoryOpenFile, FindsRealFilesByTheLow32Bits) {
     ASSERT_GE(high.size(), 2U);
     const uint64_t inode = InodeOfPath(high[0] + "/file");
     const uint64_t low = static_cast<uint32_t>(inode);
-    EXPECT_TRUE(DirectoryOpenFile(high[0], inode).IsOpen());
-    EXPECT_TRUE(DirectoryOpenFile(high[0], low).IsOpen());
-    EXPECT_FALSE(DirectoryOpenFile(high[0], inode + k4G).IsOpen());
+    EXPECT_TRUE(OpenIn(high[0], inode).IsOpen());
+    EXPECT_TRUE(OpenIn(high[0], low).IsOpen());
+    EXPECT_FALSE(OpenIn(high[0], inode + k4G).IsOpen());
 
     // A hard link brings a file with the same low bits into the directory.
     for (const std::string &other : high) {
         const uint64_t twin = InodeOfPath(other + "/file");
         if (twin != inode && static_cast<uint32_t>(twin) == low) {
             std::filesystem::create_hard_link(other + "/file", high[0] + "/twin");
-            EXPECT_FALSE(DirectoryOpenFile(high[0], low).IsOpen());
-            EXPECT_TRUE(DirectoryOpenFile(high[0], inode).IsOpen());
+            EXPECT_FALSE(OpenIn(high[0], low).IsOpen());
+            EXPECT_TRUE(OpenIn(high[0], inode).IsOpen());
             return;
         }
     }

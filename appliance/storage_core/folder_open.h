@@ -1,0 +1,29 @@
+// Opening a folder of a volume without leaving the volume.
+//
+// Thread rule: no state; the functions are independent of each other.
+#pragma once
+
+#include "base/scoped_fd.h"
+
+#include <fcntl.h>
+#include <sys/types.h>
+
+#include <string>
+
+namespace vesk {
+// How users' files and folders are opened beside O_NOFOLLOW and O_DIRECTORY: whatever they have
+// become meanwhile, opening it waits for nobody and changes nothing.
+constexpr int kOpenForReading = O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+
+// Opens a folder, an absolute path, on the filesystem with this device number, for reading. The way
+// to the mount point is the administrator's and is followed as usual. From there on the path is the
+// users': a symbolic link in it is a failure, and so is a ".." above the mount point. Not open: a
+// failure, or the path does not lead through a mount point of this filesystem.
+ScopedFd FolderOpenOnDevice(const std::string &path, dev_t device);
+
+// The second half: a relative path below an open folder; the folder itself where it is empty.
+ScopedFd FolderOpenBeneath(int folder, const std::string &path);
+
+// The same where the kernel has no call for it: step by step, each folder from the one above.
+ScopedFd FolderOpenStepwise(int folder, const std::string &path);
+} // namespace vesk
