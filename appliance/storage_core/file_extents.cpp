@@ -17,6 +17,15 @@ constexpr uint32_t kBatchExtents = 128; // extents per question; about 7 KiB
 constexpr uint32_t kFlagsWithoutPlace = FIEMAP_EXTENT_UNKNOWN | FIEMAP_EXTENT_DELALLOC |
                                         FIEMAP_EXTENT_ENCODED | FIEMAP_EXTENT_NOT_ALIGNED |
                                         FIEMAP_EXTENT_DATA_INLINE | FIEMAP_EXTENT_DATA_TAIL;
+
+bool Ask(int fd, uint64_t start, uint32_t extents, fiemap *answer) {
+    answer->fm_start = start;
+    answer->fm_length = FIEMAP_MAX_OFFSET - start;
+    answer->fm_flags = FIEMAP_FLAG_SYNC;
+    answer->fm_mapped_extents = 0;
+    answer->fm_extent_count = extents; // 0: they are only counted
+    return ioctl(fd, FS_IOC_FIEMAP, answer) == 0;
+}
 } // namespace
 
 bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry) {
@@ -37,14 +46,13 @@ bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
     if (batch == nullptr) {
         throw std::bad_alloc();
     }
+    // Growing would take three times the memory while a table of hundreds of thousands is copied.
+    if (Ask(fd, 0, 0, batch.get())) {
+        entries.reserve(entries.size() + batch->fm_mapped_extents);
+    }
     uint64_t start = 0;
     while (true) {
-        batch->fm_start = start;
-        batch->fm_length = FIEMAP_MAX_OFFSET - start;
-        batch->fm_flags = FIEMAP_FLAG_SYNC;
-        batch->fm_mapped_extents = 0;
-        batch->fm_extent_count = kBatchExtents;
-        if (ioctl(fd, FS_IOC_FIEMAP, batch.get()) != 0) {
+        if (!Ask(fd, start, kBatchExtents, batch.get())) {
             return false;
         }
         if (batch->fm_mapped_extents == 0) {

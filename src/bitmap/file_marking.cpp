@@ -3,6 +3,7 @@
 #include "base/log.h"
 #include "space/file_extents.h"
 
+#include <algorithm>
 #include <chrono>
 
 namespace vesk {
@@ -48,7 +49,8 @@ int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &f
         LogVerbose("Spend %f seconds", std::chrono::duration<double>(Clock::now() - start).count());
     }
     ApplyExtents(table, filePath, bitmap, nullptr, LogHere());
-    *tableOut = table;
+    // Of a file in many pieces the extents are what takes memory: handed over, not copied.
+    tableOut->entries.swap(table.entries);
     LogVerbose("Add file (%s) finish", filePath.c_str());
     return 0;
 }
@@ -60,6 +62,11 @@ int UnsetBitmapAndAppendUnpinInfos(const char * /*cachePath*/, PinBitmap *bitmap
     if (GetMappingTableFromFile(&table, mountPath, filePath, inode) < 0) {
         LogError("Get mapping table of file (%s) failed", filePath.c_str());
         return -1;
+    }
+    // Room for all at once, and for further files no more often than doubling needs.
+    const size_t needed = infos->size() + table.entries.size();
+    if (needed > infos->capacity()) {
+        infos->reserve(std::max(needed, 2 * infos->capacity()));
     }
     ApplyExtents(table, filePath, bitmap, infos, LogHere());
     return 0;

@@ -17,7 +17,7 @@
 #include <vector>
 
 namespace vesk {
-// Marks the file's blocks and copies its extents to `*tableOut`. 0, or -1 with the bitmap
+// Marks the file's blocks and hands its extents over in `*tableOut`. 0, or -1 with the bitmap
 // untouched.
 int BitmapAddFile(PinBitmap *bitmap, const char *mountPath, const std::string &filePath,
                   uint32_t inode, FileMappingTable *tableOut);

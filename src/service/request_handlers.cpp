@@ -52,19 +52,20 @@ WorkResult HandleRequest(const RequestRecord *record) {
 WorkResult HandlePinRequest(const std::vector<FileInfo> &files, PinBitmap *bitmap,
                             const char *mountPath, const char *cachePath, const char *bitmapPath) {
     std::vector<FileToWarm> filesToWarm;
+    filesToWarm.reserve(files.size()); // growing would copy every table
     for (const FileInfo &file : files) {
         if (file.szRelativePath[0] == '\0') {
             LogError("Info's relative path should not be NULL");
             return WorkResult::Failed;
         }
-        const std::string path = FullPath(mountPath, file);
-        FileMappingTable table;
-        if (BitmapAddFile(bitmap, mountPath, path, static_cast<uint32_t>(file.inodeNum), &table) <
-            0) {
-            LogError("Can't add file (%s) inode (%lu) to bitmap", path.c_str(), file.inodeNum);
+        filesToWarm.push_back({FullPath(mountPath, file), {}});
+        FileToWarm &added = filesToWarm.back();
+        if (BitmapAddFile(bitmap, mountPath, added.path, static_cast<uint32_t>(file.inodeNum),
+                          &added.table) < 0) {
+            LogError("Can't add file (%s) inode (%lu) to bitmap", added.path.c_str(),
+                     file.inodeNum);
             return WorkResult::Failed;
         }
-        filesToWarm.push_back({path, table});
     }
     if (BitmapWriteAndSend(bitmap, bitmapPath, cachePath, LogHere()) < 0) {
         return WorkResult::Failed;

@@ -1,4 +1,4 @@
-// system_fallocate FILE punch-hole|collapse-range FIRST STEP LENGTH COUNT
+// system_fallocate FILE allocate|punch-hole|collapse-range FIRST STEP LENGTH COUNT
 //
 // Does it to COUNT ranges of LENGTH bytes, the first at FIRST and the next each STEP bytes further,
 // from the last to the first: collapsing one moves what lies behind it. One process for a thousand
@@ -18,8 +18,10 @@ int main(int argc, char *argv[]) {
         fprintf(stderr, "system_fallocate: six arguments expected\n");
         return 2;
     }
-    const int mode = strcmp(argv[2], "punch-hole") == 0 ? FALLOC_FL_PUNCH_HOLE | FALLOC_FL_KEEP_SIZE
-                                                        : FALLOC_FL_COLLAPSE_RANGE;
+    const int mode = strcmp(argv[2], "allocate") == 0 ? 0
+                     : strcmp(argv[2], "punch-hole") == 0
+                         ? FALLOC_FL_PUNCH_HOLE | FALLOC_FL_KEEP_SIZE
+                         : FALLOC_FL_COLLAPSE_RANGE;
     const long long first = strtoll(argv[3], nullptr, 10);
     const long long step = strtoll(argv[4], nullptr, 10);
     const long long length = strtoll(argv[5], nullptr, 10);

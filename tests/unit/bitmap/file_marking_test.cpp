@@ -58,7 +58,22 @@ TEST_F(BitmapAddFileTest, MarksEveryExtentTheUninitialisedOnesToo) {
     EXPECT_EQ(log.Text(), "");
 }
 
-TEST_F(BitmapAddFileTest, HandsOutACopyOfTheExtents) {
+// A table of a file in many pieces is large: the one that the library fills is the caller's.
+TEST_F(BitmapAddFileTest, HandsOverTheTableItself) {
+    CapturedLog log;
+    const FileMappingEntry *filled = nullptr;
+    FakeAppliance::onLookup = [&filled](const std::string &, uint64_t, int,
+                                        FileMappingTable &answer) {
+        answer.entries = {FakeExtent(0, 128, 0), FakeExtent(128, 10, 1150)};
+        filled = answer.entries.data();
+        return 0;
+    };
+    EXPECT_EQ(Add(), 0);
+    ASSERT_NE(filled, nullptr);
+    EXPECT_EQ(table.entries.data(), filled);
+}
+
+TEST_F(BitmapAddFileTest, HandsOutTheExtents) {
     CapturedLog log;
     AnswerWithThreeExtents();
     table.entries.push_back(FakeExtent(9, 9, 9)); // replaced, not appended to
@@ -68,6 +83,18 @@ TEST_F(BitmapAddFileTest, HandsOutACopyOfTheExtents) {
     EXPECT_EQ(table.entries[1].numSectors, 10U);
     EXPECT_EQ(table.entries[1].deviceStartSector, 1150U);
     EXPECT_EQ(table.entries[1].flag, 1U);
+}
+
+TEST_F(UnsetBitmapTest, MakesRoomForAllRangesOfAFileAtOnce) {
+    CapturedLog log;
+    AnswerWith(0, std::vector<FileMappingEntry>(1000, FakeExtent(0, 128, 0)));
+    EXPECT_EQ(Unset(), 0);
+    EXPECT_EQ(infos.size(), 1000U);
+    EXPECT_EQ(infos.capacity(), 1000U);
+    AnswerWithThreeExtents();
+    EXPECT_EQ(Unset(), 0);
+    EXPECT_EQ(infos.size(), 1003U);
+    EXPECT_EQ(infos.capacity(), 2000U);
 }
 
 TEST_F(FileMarkingTest, InodeIsHandedOnWhole) {

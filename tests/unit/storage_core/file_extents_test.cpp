@@ -234,6 +234,7 @@ TEST_P(FileExtents, ManyBatches) {
     file->Sync();
     const Entries all = Read();
     EXPECT_EQ(all, Expected());
+    EXPECT_EQ(all.capacity(), all.size()) << "counted before";
     const Entries entries = Written(all);
     EXPECT_EQ(entries.size(), kCount);
     ExpectDataInPlace(entries);
