@@ -101,7 +101,7 @@ bool SearchFolder(int folder, bool remembered, InodeSearch &search) {
 ScopedFd OpenFound(int folder, const InodeSearch &search) {
     // The entry may have become a FIFO or a terminal meanwhile: opening neither waits nor takes it
     // over, and what was opened is checked.
-    ScopedFd file(openat(folder, search.name.c_str(), kOpenForReading | O_NOFOLLOW));
+    ScopedFd file = FileOpenInFolder(folder, search.name);
     struct stat status = {};
     if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
         status.st_ino != search.candidate) {

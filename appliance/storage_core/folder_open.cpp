@@ -3,6 +3,7 @@
 #include <linux/openat2.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
+#include <sys/sysmacros.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -13,9 +14,11 @@ namespace vesk {
 namespace {
 constexpr int kOpenAsPlace = O_PATH | O_DIRECTORY | O_CLOEXEC;
 
-bool IsOnDevice(int folder, dev_t device) {
-    struct stat status = {};
-    return fstat(folder, &status) == 0 && status.st_dev == device;
+// Its device number, 0 on failure. Asks no file system that answers when it likes.
+dev_t DeviceOf(int folder) {
+    struct statx status = {};
+    const bool isKnown = statx(folder, "", AT_EMPTY_PATH | AT_STATX_DONT_SYNC, 0, &status) == 0;
+    return isKnown ? makedev(status.stx_dev_major, status.stx_dev_minor) : 0;
 }
 
 // Above a mount point is another filesystem, above the root itself. A link from elsewhere into the
@@ -37,7 +40,7 @@ ScopedFd OpenMountPoint(const std::string &path, dev_t device, std::string &rest
         if (!folder.IsOpen()) {
             return ScopedFd();
         }
-        if (IsOnDevice(folder.Get(), device)) {
+        if (DeviceOf(folder.Get()) == device) {
             const size_t next = path.find_first_not_of('/', end);
             rest = next == std::string::npos ? std::string() : path.substr(next);
             return IsMountPoint(folder.Get()) ? std::move(folder) : ScopedFd();
@@ -62,18 +65,19 @@ ScopedFd FolderOpenOnDevice(const std::string &path, dev_t device) {
 ScopedFd FolderOpenBeneath(int folder, const std::string &path) {
     open_how how = {};
     how.flags = static_cast<uint64_t>(kOpenForReading | O_DIRECTORY);
-    how.resolve = RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS;
+    how.resolve = RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS | RESOLVE_NO_XDEV;
     const long fd =
         syscall(SYS_openat2, folder, path.empty() ? "." : path.c_str(), &how, sizeof(how));
-    // An old kernel does not know the call, a filter from before it may forbid it, and a ".." that
-    // something was renamed beside is not judged.
-    if (fd < 0 && (errno == ENOSYS || errno == EPERM || errno == EAGAIN)) {
+    // An old kernel does not know the call, a filter from before it may forbid it, a ".." that
+    // something was renamed beside is not judged, and a mount on the way may be one of the volume.
+    if (fd < 0 && (errno == ENOSYS || errno == EPERM || errno == EAGAIN || errno == EXDEV)) {
         return FolderOpenStepwise(folder, path);
     }
     return ScopedFd(static_cast<int>(fd));
 }
 
 ScopedFd FolderOpenStepwise(int folder, const std::string &path) {
+    const dev_t device = DeviceOf(folder);
     std::vector<ScopedFd> steps; // from the top down; ".." goes back the way that was come
     size_t start = path.find_first_not_of('/');
     while (start != std::string::npos) {
@@ -88,12 +92,24 @@ ScopedFd FolderOpenStepwise(int folder, const std::string &path) {
         } else if (name != ".") {
             const int here = steps.empty() ? folder : steps.back().Get();
             steps.emplace_back(openat(here, name.c_str(), kOpenAsPlace | O_NOFOLLOW));
-            if (!steps.back().IsOpen()) {
+            // A user's FUSE mount is left before it is asked for anything.
+            if (!steps.back().IsOpen() || DeviceOf(steps.back().Get()) != device) {
                 return ScopedFd();
             }
         }
     }
     const int last = steps.empty() ? folder : steps.back().Get();
     return ScopedFd(openat(last, ".", kOpenForReading | O_DIRECTORY));
+}
+
+ScopedFd FileOpenInFolder(int folder, const std::string &name) {
+    open_how how = {};
+    how.flags = static_cast<uint64_t>(kOpenForReading | O_NOFOLLOW);
+    how.resolve = RESOLVE_NO_XDEV;
+    const long fd = syscall(SYS_openat2, folder, name.c_str(), &how, sizeof(how));
+    if (fd < 0 && (errno == ENOSYS || errno == EPERM)) {
+        return ScopedFd(openat(folder, name.c_str(), kOpenForReading | O_NOFOLLOW));
+    }
+    return ScopedFd(static_cast<int>(fd));
 }
 } // namespace vesk

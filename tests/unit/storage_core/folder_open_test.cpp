@@ -157,5 +157,30 @@ TEST_F(FolderOpen, CrossesMountPoints) {
     ASSERT_EQ(mount((top + "/a").c_str(), (top + "/other").c_str(), nullptr, MS_BIND, nullptr), 0);
     ExpectOpens(top + "/other/b", top + "/a/b");
 }
+
+TEST_F(FolderOpen, LeavesOtherFilesystemsAlone) {
+    ASSERT_EQ(mount("none", (top + "/other").c_str(), "tmpfs", 0, nullptr), 0);
+    std::filesystem::create_directory(top + "/other/b");
+    EXPECT_FALSE(FolderOpenOnDevice(top + "/other", device).IsOpen());
+    EXPECT_FALSE(FolderOpenOnDevice(top + "/other/b", device).IsOpen());
+    EXPECT_FALSE(FolderOpenOnDevice(top + "/other/../a", device).IsOpen());
+}
+
+TEST_F(FolderOpen, OpensAFileButNothingMountedOnIt) {
+    const ScopedFd opened(open(top.c_str(), O_PATH | O_CLOEXEC));
+    EXPECT_TRUE(FileOpenInFolder(opened.Get(), "file").IsOpen());
+    EXPECT_FALSE(FileOpenInFolder(opened.Get(), "absolute").IsOpen()) << "a link";
+    EXPECT_FALSE(FileOpenInFolder(opened.Get(), "missing").IsOpen());
+    RunWithoutOpenat2(ENOSYS, [&] {
+        EXPECT_TRUE(FileOpenInFolder(opened.Get(), "file").IsOpen());
+        EXPECT_FALSE(FileOpenInFolder(opened.Get(), "absolute").IsOpen());
+    });
+    if (syscall(SYS_openat2, -1, nullptr, nullptr, 0) < 0 && errno == ENOSYS) {
+        GTEST_SKIP() << "no openat2 here";
+    }
+    const std::string mounted = folder.FileMake("mounted", "text");
+    ASSERT_EQ(mount(mounted.c_str(), (top + "/file").c_str(), nullptr, MS_BIND, nullptr), 0);
+    EXPECT_FALSE(FileOpenInFolder(opened.Get(), "file").IsOpen());
+}
 } // namespace
 } // namespace vesk
