@@ -42,6 +42,13 @@ endif()
 # A run path that LD_LIBRARY_PATH overrides: an appliance puts its own libraries in place that way.
 target_link_options(vesk_options INTERFACE -Wl,--gc-sections -Wl,--enable-new-dtags -Wl,--as-needed)
 
+# What makes a mistake end the program instead of letting others use it: guarded stacks, tables of addresses that
+# nobody can write to. The sanitizers do the same better.
+if(NOT VESK_SANITIZE)
+  target_compile_options(vesk_options INTERFACE -fstack-protector-strong)
+  target_link_options(vesk_options INTERFACE -Wl,-z,relro -Wl,-z,now)
+endif()
+
 if(VESK_WERROR)
   target_compile_options(vesk_options INTERFACE -Werror)
 endif()
