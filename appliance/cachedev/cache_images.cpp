@@ -1,12 +1,12 @@
 #include "cachedev/cache_images.h"
 
 #include "cachedev/driver_requests.h"
+#include "cachedev/image_access.h"
 
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <fcntl.h>
-#include <sys/file.h>
 #include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -63,10 +63,16 @@ bool OpenImage(const std::string &path, const char *what, ScopedFd &image, struc
         error = "the " + name + " is neither a regular file nor a block device";
         return false;
     }
-    // A second cache device on the same image would change it behind this one's back. Locks on
-    // block devices are left alone: udev takes them now and then while it probes.
-    if (S_ISREG(status.st_mode) && flock(image.Get(), LOCK_EX | LOCK_NB) != 0) {
-        error = "the " + name + " is in use by another cache device";
+    // Who may open a block device, and what locks it (udev now and then, while it probes), is the
+    // machine's affair.
+    if (S_ISREG(status.st_mode) && !ImageIsPrivate(status, path, name, error)) {
+        return false;
+    }
+    // A second cache device on the same image would change it behind this one's back.
+    const int locked = S_ISREG(status.st_mode) ? ImageLock(image.Get()) : 0;
+    if (locked != 0) {
+        error = locked == EAGAIN ? "the " + name + " is in use by another cache device"
+                                 : "cannot lock the " + name + ": " + strerror(locked);
         return false;
     }
     const off_t end = lseek(image.Get(), 0, SEEK_END); // also right for a block device

@@ -3,13 +3,12 @@
 #include "cachedev/cache_device.h"
 #include "cachedev/cachedev_mount.h"
 #include "cachedev/cachedev_options.h"
+#include "cachedev/pid_file.h"
 
-#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <ctime>
 #include <exception>
-#include <fstream>
 #include <unistd.h>
 
 using namespace vesk;
@@ -18,29 +17,6 @@ namespace {
 int Fail(const std::string &message) {
     fprintf(stderr, "veskcachedev: %s\n", message.c_str());
     return 1;
-}
-
-// The file that holds the daemon's process id; removed with the record.
-struct PidFile {
-    std::string path; // empty: none
-    PidFile() = default;
-    ~PidFile() {
-        if (!path.empty()) {
-            unlink(path.c_str());
-        }
-    }
-    PidFile(const PidFile &) = delete;
-    PidFile &operator=(const PidFile &) = delete;
-};
-
-bool WritePidFile(const std::string &path, PidFile &file) {
-    std::ofstream stream(path, std::ios::trunc);
-    stream << getpid() << '\n';
-    if (!stream.flush()) {
-        return false;
-    }
-    file.path = path;
-    return true;
 }
 
 int Run(int argc, char **argv) {
@@ -68,8 +44,8 @@ int Run(int argc, char **argv) {
         return Fail(error);
     }
     PidFile pidFile;
-    if (!options.pidFile.empty() && !WritePidFile(options.pidFile, pidFile)) {
-        return Fail("cannot write " + options.pidFile + ": " + strerror(errno));
+    if (!options.pidFile.empty() && !PidFileWrite(options.pidFile, pidFile, error)) {
+        return Fail(error);
     }
 
     ServedDevice served = {device,

@@ -16,8 +16,8 @@ volume_make() {
     shift 4
     device=$(volume_device "$n")
     mkdir -p "/tmp/volume$n"
-    truncate -s "$size" "/tmp/volume$n/backing"
-    truncate -s "$ssd_size" "/tmp/volume$n/ssd"
+    volume_image "/tmp/volume$n/backing" "$size"
+    volume_image "/tmp/volume$n/ssd" "$ssd_size"
     volume_serve --device "$device" --backing "/tmp/volume$n/backing" --ssd "/tmp/volume$n/ssd" "$@"
     loop=$(volume_attach "$device")
     # All that an ext file system has to write at first is written here; the kernel would do it by and by,
@@ -36,6 +36,9 @@ volume_make() {
     blkid -p -o value -s UUID "$loop" >"/tmp/volume$n/uuid"
     volume_configure
 }
+
+# volume_image FILE SIZE: an image that its owner alone may look into, as it holds everybody's files.
+volume_image() { (umask 077 && truncate -s "$2" "$1"); }
 
 # volume_attach FILE: prints the loop device; LOOP_OPTIONS, words, go to losetup. The devices are the machine's, which makes new ones as they
 # are asked for; the nodes are the world's own. Another world may be faster with the device, once or twice.

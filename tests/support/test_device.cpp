@@ -13,6 +13,7 @@
 namespace vesk {
 TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
     : backingPath(folder.Path("backing.img")), ssdPath(folder.Path("ssd.img")) {
+    TestMakeFile(backingPath, 0); // for its mode
     WriteWhole(backingPath, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(ssdPath, slots * kBlockBytes);
     std::string error;
@@ -38,6 +39,8 @@ std::string TestBytes(uint64_t offset, size_t size) {
 void TestMakeFile(const std::string &path, uint64_t size) {
     std::ofstream(path, std::ios::binary | std::ios::trunc).close();
     std::filesystem::resize_file(path, size);
+    // As images should be, whatever the mask of who runs the tests.
+    std::filesystem::permissions(path, std::filesystem::perms(0600));
 }
 
 std::string TestRead(CacheDevice &device, uint64_t offset, size_t size) {

@@ -15,8 +15,8 @@ spare_device() {
     local name=$1 size=$2
     shift 2
     mkdir -p "/tmp/$name"
-    truncate -s "$size" "/tmp/$name/backing"
-    truncate -s "${SSD_SIZE:-16M}" "/tmp/$name/ssd"
+    volume_image "/tmp/$name/backing" "$size"
+    volume_image "/tmp/$name/ssd" "${SSD_SIZE:-16M}"
     (
         close_descriptors
         volume_serve --device "/run/$name/cachedev" --backing "/tmp/$name/backing" \

@@ -6,7 +6,10 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <fcntl.h>
 #include <filesystem>
+#include <sys/file.h>
+#include <sys/stat.h>
 
 namespace vesk {
 namespace {
@@ -75,6 +78,54 @@ TEST_F(CacheImagesTest, ImagesBelongToOneDeviceAtATime) {
     CacheImages second;
     EXPECT_FALSE(CacheImagesOpen(Path("other"), Path("ssd"), second, error));
     EXPECT_TRUE(ErrorHas("in use")) << error;
+}
+
+TEST_F(CacheImagesTest, RefusesImagesThatOthersMayChange) {
+    TestMakeFile(Path("backing"), 512);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    for (const char *name : {"backing", "ssd"}) {
+        const std::string what = (*name == 'b' ? "backing image " : "SSD image ") + Path(name);
+        for (const mode_t mode : {0620U, 0602U}) {
+            ASSERT_EQ(chmod(Path(name).c_str(), mode), 0);
+            CacheImages fresh;
+            EXPECT_FALSE(CacheImagesOpen(Path("backing"), Path("ssd"), fresh, error)) << mode;
+            EXPECT_EQ(error, "others could change what the volume holds: they may write the " +
+                                 what + "; run: chmod 600 " + Path(name));
+        }
+        ASSERT_EQ(chmod(Path(name).c_str(), 0600), 0);
+    }
+    if (chown(Path("ssd").c_str(), 1234, 1234) == 0) { // as root
+        EXPECT_FALSE(Open());
+        EXPECT_EQ(error, "the SSD image " + Path("ssd") +
+                             " belongs to user 1234, who could change what the volume holds; "
+                             "run: chown root " +
+                             Path("ssd"));
+    }
+}
+
+TEST_F(CacheImagesTest, WarnsOfImagesThatOthersMayRead) {
+    TestMakeFile(Path("backing"), 512);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    ASSERT_EQ(chmod(Path("backing").c_str(), 0600), 0);
+    ASSERT_EQ(chmod(Path("ssd").c_str(), 0604), 0);
+    testing::internal::CaptureStderr();
+    EXPECT_TRUE(Open()) << error;
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "veskcachedev: warning: others could read what the volume holds: they may read the "
+              "SSD image " +
+                  Path("ssd") + "; run: chmod 600 " + Path("ssd") + "\n");
+}
+
+TEST_F(CacheImagesTest, ReadersLocksKeepNobodyOut) {
+    TestMakeFile(Path("backing"), 512);
+    TestMakeFile(Path("ssd"), kBlockBytes);
+    const ScopedFd reader(open(Path("ssd").c_str(), O_RDONLY | O_CLOEXEC));
+    ASSERT_EQ(flock(reader.Get(), LOCK_EX | LOCK_NB), 0);
+    struct flock lock = {};
+    lock.l_type = F_RDLCK;
+    lock.l_whence = SEEK_SET;
+    ASSERT_EQ(fcntl(reader.Get(), F_OFD_SETLK, &lock), 0);
+    EXPECT_TRUE(Open()) << error;
 }
 
 TEST_F(CacheImagesTest, TransfersGatherAndScatter) {

@@ -292,6 +292,40 @@ TEST(CachedevDaemonTest, RefusesToStart) {
     });
 }
 
+TEST(CachedevDaemonTest, WritesItsProcessIdIntoNobodyElsesFile) {
+    RunInPrivateWorld([] {
+        TestMakeFile(kDaemonBacking, kBlockBytes);
+        TestMakeFile(kDaemonSsd, kBlockBytes);
+        WriteWhole("/run/victim", "precious");
+        // Where everybody writes, the kernel may refuse some of it before the daemon can.
+        ASSERT_EQ(mkdir("/run/own", 0755), 0);
+        const auto refused = [] {
+            EXPECT_EQ(DaemonStart({"--pid-file", "/run/own/pid"}), 1);
+            EXPECT_EQ(
+                DaemonErrors(),
+                "veskcachedev: cannot write /run/own/pid: it is a link or no file of root's\n");
+            EXPECT_EQ(ReadWhole("/run/victim"), "precious");
+            EXPECT_EQ(unlink("/run/own/pid"), 0); // still there
+        };
+        EXPECT_EQ(symlink("/run/victim", "/run/own/pid"), 0);
+        refused();
+        EXPECT_EQ(symlink("/run/nowhere", "/run/own/pid"), 0);
+        refused();
+        EXPECT_NE(access("/run/nowhere", F_OK), 0);
+        EXPECT_EQ(link("/run/victim", "/run/own/pid"), 0);
+        refused();
+        EXPECT_EQ(mkfifo("/run/own/pid", 0666), 0);
+        refused();
+        WriteWhole("/run/own/pid", "another user's");
+        EXPECT_EQ(chown("/run/own/pid", 1234, 1234), 0);
+        refused();
+        WriteWhole("/run/own/pid", "what an earlier daemon has left");
+        ASSERT_EQ(DaemonStart({"--pid-file", "/run/own/pid"}), 0) << DaemonErrors();
+        EXPECT_EQ(ReadWhole("/run/own/pid"), std::to_string(DaemonPid()) + "\n");
+        EXPECT_EQ(DaemonStop(), 0);
+    });
+}
+
 TEST(CachedevDaemonTest, OrderedFaults) {
     RunInPrivateWorld([] {
         ASSERT_NO_FATAL_FAILURE(DaemonStartFresh(

@@ -89,6 +89,7 @@ int DaemonStart(const std::vector<std::string> &more) {
 }
 
 void DaemonStartFresh(uint64_t deviceBytes, uint64_t slots, const std::vector<std::string> &more) {
+    TestMakeFile(kDaemonBacking, 0); // for its mode
     WriteWhole(kDaemonBacking, TestBytes(0, static_cast<size_t>(deviceBytes)));
     TestMakeFile(kDaemonSsd, slots * kBlockBytes);
     ASSERT_EQ(DaemonStart(more), 0) << DaemonErrors();
