@@ -5,6 +5,20 @@ _veskcachepinfiletool_volumes() {
     awk '$2 ~ /^\/[^\/]+$/ && $1 ~ /^\// { print $2 }' "${VESK_MOUNTS:-/proc/self/mounts}"
 }
 
+# Offers the volumes that begin with what was typed, as the shell has to read them. Their names are others': compgen's
+# list of words would carry out what is in backticks in them. The table writes blanks and backslashes in octal.
+_veskcachepinfiletool_complete_volumes() {
+    local escaped name quoted
+    COMPREPLY=()
+    while IFS= read -r escaped; do
+        printf -v name '%b' "$escaped"
+        printf -v quoted '%q' "$name"
+        if [[ $name == "$1"* || $quoted == "$1"* ]]; then
+            COMPREPLY+=("$quoted")
+        fi
+    done < <(_veskcachepinfiletool_volumes)
+}
+
 # Files joined by ";", of which the last is completed.
 _veskcachepinfiletool_files() {
     local typed=${1#[\"\']} before=
@@ -16,7 +30,7 @@ _veskcachepinfiletool_files() {
     esac
     compopt -o filenames -o nospace 2>/dev/null
     mapfile -t COMPREPLY < <(compgen -f -- "${typed##*;}")
-    COMPREPLY=("${COMPREPLY[@]/#/$before}")
+    COMPREPLY=("${COMPREPLY[@]/#/"$before"}")
 }
 
 _veskcachepinfiletool() {
@@ -26,7 +40,7 @@ _veskcachepinfiletool() {
     COMPREPLY=()
     case "$previous" in
     --mount-path | -j)
-        mapfile -t COMPREPLY < <(compgen -W "$(_veskcachepinfiletool_volumes)" -- "$word")
+        _veskcachepinfiletool_complete_volumes "$word"
         return
         ;;
     --pin-files | --unpin-files | -a | -b)

@@ -66,6 +66,46 @@ complete_line() { # WORD...: what bash would offer for the last word
     [ "$(complete_line --mount-path /volume2)" = /volume22 ]
 }
 
+# Volumes whose names are commands, in every way in which a shell carries one out.
+hostile_mounts() { # FILE
+    printf '/dev/sdb /%s ext4 rw 0 0\n' 'volume1' 'v$(touch\040owned)' 'v`touch\040owned`' 'v;touch\040owned' \
+        'v:m:{touch\040owned}' 'v[$(touch\040owned)]' 'v&\134x' >"$1"
+}
+
+@test "bash carries out nothing that a volume or a file is called" {
+    cd "$BATS_TEST_TMPDIR"
+    export VESK_MOUNTS=$PWD/mounts
+    hostile_mounts mounts
+    local offered
+    offered=$(complete_line --mount-path /v)
+    echo "$offered"
+    [ ! -e owned ]
+    [ "$offered" = '/volume1
+/v\$\(touch\ owned\)
+/v\`touch\ owned\`
+/v\;touch\ owned
+/v:m:\{touch\ owned\}
+/v\[\$\(touch\ owned\)\]
+/v\&\\x' ]
+    [ "$(complete_line --mount-path '/v\$')" = '/v\$\(touch\ owned\)' ]
+    touch 'f$(touch owned)' 'f`touch owned`' 'f&'
+    [ "$(complete_line --pin-files 'a&;f' | sort)" = "$(printf 'a&;%s\n' 'f$(touch owned)' 'f`touch owned`' 'f&' | sort)" ]
+    [ "$(complete_line --check-pin f | sort)" = "$(printf '%s\n' 'f$(touch owned)' 'f`touch owned`' 'f&' | sort)" ]
+    [ ! -e owned ]
+}
+
+@test "zsh carries out nothing that a volume is called" {
+    cd "$BATS_TEST_TMPDIR"
+    hostile_mounts mounts
+    run timeout 120 zsh -f "$BATS_TEST_DIRNAME/complete.zsh" "$PACKAGING/completions" "--mount-path /v" \
+        "--mount-path /vo" '--mount-path /v\$' '--mount-path /v:'
+    echo "$output"
+    [ ! -e owned ]
+    [[ "$output" == *"<veskcachepinfiletool --mount-path /volume1>"* ]]
+    [[ "$output" == *'<veskcachepinfiletool --mount-path /v\$\(touch\ owned\)>'* ]]
+    [[ "$output" == *'<veskcachepinfiletool --mount-path /v:m:\{touch\ owned\}>'* ]]
+}
+
 @test "bash completes files, also behind ';'" {
     cd "$BATS_TEST_TMPDIR"
     touch film1 film2 other
