@@ -1,5 +1,8 @@
 #!/usr/bin/env bats
 # What the packages say about the options agrees with the program: manual pages and completions.
+# Names that are commands stand in single quotes, so that they stay names.
+# Every test sets its own table of mounts.
+# shellcheck disable=SC2016,SC2030,SC2031
 
 # Every long option that a program takes, from its own table.
 options_of() { sed -n 's/^    {"\([a-z-]*\)", [a-z]*_argument.*/--\1/p' "$1"; }

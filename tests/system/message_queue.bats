@@ -210,7 +210,7 @@ END
         echo ": Can't get server messsage queue: File exists"
     )
     # The way out that docs/operations.md has.
-    bash -c "$(grep '^printf %d' "$BATS_TEST_DIRNAME/../../docs/operations.md")"
+    recipe 'queues_of_root()'
     send_pin
     waiting_is 2
 }

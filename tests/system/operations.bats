@@ -31,6 +31,8 @@ block() { awk -v wanted="== $1" '/^== / { inside = $0 == wanted; next } inside' 
     random "/volume1/photos/not these/1.raw" 4K
     touch /volume1/photos/empty.raw
     truncate -s 1M /volume1/photos/hole.raw
+    # Its attribute takes a block of its own, in which there is nothing of the file.
+    python3 -c 'import os; os.setxattr("/volume1/photos/hole.raw", "user.note", b"x" * 300)'
     sync
     # The record of a file that is gone.
     mkdir /run/operations
@@ -54,7 +56,9 @@ END
     }
     same Yes "$(block 3)"
     same Yes "$(block 5 | sed -n 1p)"
-    same "$({ echo gone && seq -f 'photos/%g.raw' 40; } | sort)" \
+    same "$(printf 'cannot be named: /volume1/photos/not\\ %s\n' 'these/1.raw' 'this\ one'
+        printf 'has nothing to pin: /volume1/photos/%s.raw\n' empty hole)" "$(block 4 | sort)"
+    same "$({ echo '"gone"' && seq -f '"photos/%g.raw"' 40; } | sort)" \
         "$(block 5 | sed -n '2,/^[0-9]*$/{/^[0-9]*$/!p}' | sort)"
     same "$(volume_state 1 pinnedBlocks)" 0
     [ "$(block 6)" -ge 1 ]
