@@ -18,6 +18,7 @@ setup() { fresh_volume; }
 $(usage)
 END
     name=$'x\e[2J\x7f' shown='x\x1b[2J\x7f'
+    # shellcheck disable=SC2016
     attacker sh -c 'echo >"$1"' - "/volume1/home/$name"
     start_service
     tool --pin-files "/volume1/home/$name" --mount-path /volume1

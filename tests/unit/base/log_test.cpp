@@ -94,7 +94,8 @@ TEST_F(LogToStdout, TextOfAnyLengthIsWrittenWhole) {
 TEST_F(LogToStdout, ControlCharactersOfArgumentsAreWrittenOut) {
     CapturedLog log;
     LogError("Can't open file (%s)", "/a\nb\x1b[2J\x01\x1f\x7f \xc3\xa9~\r");
-    EXPECT_EQ(log.Text(), "tool: Can't open file (/a\\x0ab\\x1b[2J\\x01\\x1f\\x7f \xc3\xa9~\\x0d)\n");
+    EXPECT_EQ(log.Text(),
+              "tool: Can't open file (/a\\x0ab\\x1b[2J\\x01\\x1f\\x7f \xc3\xa9~\\x0d)\n");
 }
 
 TEST_F(LogToStdout, OnlyAFormatsOwnLineFeedsStay) {

@@ -57,7 +57,7 @@ TEST_F(FileTextTest, ANewFileIsEverybodysToReadWhateverTheUmask) {
         return status.st_mode & 07777;
     };
     CapturedLog log;
-    for (const mode_t mask : {0, 022, 077}) {
+    for (const mode_t mask : {0U, 022U, 077U}) {
         const mode_t before = umask(mask);
         for (const OldContent old : {OldContent::Kept, OldContent::Emptied}) {
             EXPECT_EQ(FileWriteString(path.c_str(), "", old), 0);
