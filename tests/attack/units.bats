@@ -89,6 +89,8 @@ remove_all_queues() { awk 'NR > 1 { print $2 }' /proc/sysvipc/msg | xargs -r -n 
     same "" "$(find "${CONF%/*}" -name '*tmp*')"
 }
 
+device_is_dead() { ! head -c 1 "$1" >/dev/null 2>&1; }
+
 @test "a volume's records stay unless it is known that its cache cannot pin" {
     local list=$VESK_FLASHCACHE_CONFIG uuid
     uuid=$(volume_uuid 1)
@@ -98,6 +100,13 @@ remove_all_queues() { awk 'NR > 1 { print $2 }' /proc/sysvipc/msg | xargs -r -n 
     refute volume-mounted /volume1 "$CONF"
     map_cache "$uuid" /run/none
     refute volume-mounted /volume1 "$CONF"
+    map_cache "$uuid" "$(spare_device killed 4M)"
+    same yes "$(cache-verdict /volume1)"
+    look_at_device /run/killed/cachedev
+    kill -s KILL "$DEVICE_PID"
+    wait_until device_is_dead /run/killed/cachedev
+    refute volume-mounted /volume1 "$CONF"
+    umount /run/killed
     refute volume-mounted /volume2 "$CONF"
     same "$RECORDS" "$(cat "$CONF")"
     # A device without the requests answers, and is a cache that cannot pin.

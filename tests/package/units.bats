@@ -80,6 +80,7 @@ waiting() { awk 'NR > 1 { n += $5 } END { print n + 0 }' /proc/sysvipc/msg; }
 is_waiting() { [ "$(waiting)" = "$1" ]; }
 logged() { journalctl --no-pager -o cat | grep -qF -e "$1"; }
 recorded() { jq -e --arg name "$1" '.volumes["/volume1"].files | to_entries | any(.value == $name)' "$DOCUMENT"; } >/dev/null 2>&1
+not_recorded() { ! recorded "$1"; }
 
 # user COMMAND...: as one without rights.
 user() { setpriv --reuid=1234 --regid=1234 --clear-groups "$@"; }
@@ -200,6 +201,47 @@ put_document() { install -d -m 700 "${DOCUMENT%/*}" && printf '%s\n' "$1" >"$DOC
     systemctl start "$HOOK"
     refute recorded a
     [ "$(cat "$DOCUMENT.before-volume1")" = "$RECORDS" ]
+}
+
+# drop_in UNIT LINE...: of its section [Service].
+drop_in() {
+    mkdir -p "/run/systemd/system/$1.d"
+    printf '%s\n' '[Service]' "${@:2}" >"/run/systemd/system/$1.d/test.conf"
+    systemctl daemon-reload
+}
+
+@test "an emulated device does without the capabilities of real drivers" {
+    drop_in "$UNIT" "CapabilityBoundingSet=~CAP_SYS_ADMIN CAP_SYS_RAWIO"
+    drop_in veskcachepinfiletool-volume@.service "CapabilityBoundingSet=~CAP_SYS_ADMIN CAP_SYS_RAWIO"
+    systemctl start "$HOOK"
+    echo text >/volume1/few
+    veskcachepinfiletool --pin-files /volume1/few --mount-path /volume1
+    await 20 recorded few
+    veskcachepinfiletool --unpin-files /volume1/few --mount-path /volume1
+    await 20 not_recorded few
+}
+
+is_stopped() { grep -q '^State:.*T' "/proc/$1/status"; }
+
+@test "a service that stands in one look is noticed from inside the watch's sandbox, and restarted" {
+    local pid device=/run/stand/cachedev stand
+    drop_in "$WATCH" Environment=VESK_WATCH_SECONDS=4
+    mkdir -p /run/stand /volume1/user
+    truncate -s 4M /tmp/stand.backing /tmp/stand.ssd
+    alone veskcachedev --device "$device" --backing /tmp/stand.backing --ssd /tmp/stand.ssd
+    mount --bind /run/stand /volume1/user
+    stand=$(jq .pid "$device.json")
+    veskcachepinfiletool --pin-files /volume1/user/cachedev --mount-path /volume1
+    kill -STOP "$stand"
+    await 10 is_stopped "$stand"
+    systemctl start "$UNIT"
+    pid=$(main_pid)
+    await 20 is_new "$pid"
+    logged "$UNIT has stood in one look for a minute: it is restarted"
+    kill -CONT "$stand"
+    umount /volume1/user /run/stand
+    send_reload
+    await 20 is_waiting 0
 }
 
 queues() { awk 'NR > 1' /proc/sysvipc/msg; }
