@@ -18,10 +18,20 @@ attacker_folder() { install -d -o "$ATTACKER" -g "$ATTACKER" -m 755 "$1"; }
 
 # attacker_tool ARGUMENT...: the tool, run by him from where he can.
 attacker_tool() {
-    if [ ! -d /tmp/attacker ]; then
-        mkdir -p /tmp/attacker/bin
-        cp "$BIN/veskcachepinfiletool" /tmp/attacker/bin/
-        cp -r "$LIB" /tmp/attacker/lib
-    fi
+    attacker_programs
     attacker /tmp/attacker/bin/veskcachepinfiletool "$@"
+}
+
+# attacker_message ARGUMENT...: the same with system_message.
+attacker_message() {
+    attacker_programs
+    attacker /tmp/attacker/system_message "$@"
+}
+
+attacker_programs() {
+    [ ! -d /tmp/attacker ] || return 0
+    mkdir -p /tmp/attacker/bin
+    cp "$BIN/veskcachepinfiletool" /tmp/attacker/bin/
+    cp "$HELPERS/system_message" /tmp/attacker/
+    cp -r "$LIB" /tmp/attacker/lib
 }

@@ -1,11 +1,13 @@
 // system_message send KEY_FILE TYPE [COUNT] <TEXT
 // system_message receive KEY_FILE TYPE >TEXT
+// system_message make KEY_FILE MODE
 // system_message record TYPE MOUNT_PATH DATA >TEXT
 //
-// Puts messages of any type and text on the queue that the key file names, or takes one off it.
-// The third prints a request record: 4 bytes of type, then the texts, each cut or filled with NUL
-// bytes to its field of 512 and 1024 bytes. Ends with 1 where the queue refuses: it is full, or
-// holds no message of that type.
+// Puts messages of any type and text on the queue that the key file names, or takes one off it, or
+// makes one at the key that the tool makes of the file, with an octal mode. The last prints a
+// request record: 4 bytes of type, then the texts, each cut or filled with NUL bytes to its field
+// of 512 and 1024 bytes. Ends with 1 where the queue refuses: it is full, or holds no message of
+// that type.
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -36,6 +38,11 @@ int OpenQueue(const char *keyFile) {
     int key = 0;
     stream >> key;
     return stream.fail() ? -1 : msgget(key, 0);
+}
+
+int Make(const char *keyFile, const char *mode) {
+    const int flags = static_cast<int>(strtol(mode, nullptr, 8)) | IPC_CREAT | IPC_EXCL;
+    return msgget(ftok(keyFile, 'x'), flags) < 0 ? Fail("make") : 0;
 }
 
 int Send(int queue, Message &message, long count) {
@@ -83,12 +90,16 @@ int PrintRecord(const char *type, const std::string &mountPath, const std::strin
 int main(int argc, char **argv) {
     if (argc < 4) {
         fputs("usage: system_message send|receive KEY_FILE TYPE [COUNT]\n"
+              "       system_message make KEY_FILE MODE\n"
               "       system_message record TYPE MOUNT_PATH DATA\n",
               stderr);
         return 2;
     }
     if (strcmp(argv[1], "record") == 0 && argc == 5) {
         return PrintRecord(argv[2], argv[3], argv[4]);
+    }
+    if (strcmp(argv[1], "make") == 0) {
+        return Make(argv[2], argv[3]);
     }
     const int queue = OpenQueue(argv[2]);
     if (queue < 0) {
