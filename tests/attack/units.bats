@@ -16,8 +16,8 @@ setup() {
 RECORDS='{"volumes":{"/volume1":{"files":{"12":"a"}}}}'
 
 # user_queue KEY: a queue that the attacker has made, everybody may use it.
-user_queue() { attacker /usr/bin/python3 -c "import ctypes, sys; sys.exit(ctypes.CDLL(None).msgget($1, 0o1666) < 0)"; }
-root_queue() { /usr/bin/python3 -c "import ctypes, sys; sys.exit(ctypes.CDLL(None).msgget($1, 0o1644) < 0)"; }
+user_queue() { attacker perl -e 'exit(!defined(msgget(shift, 01666)))' -- "$1"; }
+root_queue() { perl -e 'exit(!defined(msgget(shift, 01644)))' -- "$1"; }
 keys() { awk 'NR > 1 { print $1 ":" $10 }' /proc/sysvipc/msg | sort -n; }
 tried_key() {
     : >>"$KEY_FILE"

@@ -87,7 +87,7 @@ user() { setpriv --reuid=1234 --regid=1234 --clear-groups "$@"; }
 
 
 # queue_of_user KEY: a message queue that an ordinary user has made.
-queue_of_user() { user python3 -c "import ctypes; assert ctypes.CDLL(None).msgget($1, 0o1666) >= 0"; }
+queue_of_user() { user perl -e 'exit(!defined(msgget(shift, 01666)))' -- "$1"; }
 keys_of_user() { awk '$8 == 1234 { print $1 }' /proc/sysvipc/msg; }
 
 # Sends while nobody receives.
@@ -266,7 +266,7 @@ inside() { nsenter --ipc="/proc/$(main_pid)/ns/ipc" "$@"; }
     inside veskcachepinfiletool --pin-files /volume1/inside --mount-path /volume1
     await 20 recorded inside
     # The namespace outlives the service.
-    inside setpriv --reuid=1234 --clear-groups python3 -c "import ctypes; ctypes.CDLL(None).msgget(1, 0o1666)"
+    inside setpriv --reuid=1234 --clear-groups perl -e 'msgget(1, 01666)'
     pid=$(main_pid)
     systemctl restart "$UNIT"
     [ "$(main_pid)" != "$pid" ]
