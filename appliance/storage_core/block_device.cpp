@@ -10,38 +10,32 @@
 
 #include <algorithm>
 #include <fstream>
+#include <iterator>
 #include <memory>
-#include <vector>
 
 namespace vesk {
 namespace {
-using TypeNames = std::vector<std::string>;
+// Filesystems that libblkid may call otherwise than the mount table. One driver mounts all of ext.
+struct OtherNames {
+    const char *mounted;
+    const char *probed[3]; // null: no further one
+};
+constexpr OtherNames kOtherNames[] = {
+    {"ext2", {"ext2", "ext3", "ext4"}},    {"ext3", {"ext2", "ext3", "ext4"}},
+    {"ext4", {"ext2", "ext3", "ext4"}},    {"msdos", {"vfat", nullptr, nullptr}},
+    {"ntfs3", {"ntfs", nullptr, nullptr}}, {"fuseblk", {"ntfs", "exfat", nullptr}},
+};
 
-// What libblkid may call a filesystem that is mounted as this type. One driver mounts all of ext.
-TypeNames ProbeTypesOfMount(const std::string &mountType) {
-    static const struct {
-        TypeNames mounted;
-        TypeNames probed;
-    } kNamedOtherwise[] = {{{"ext2", "ext3", "ext4"}, {"ext2", "ext3", "ext4"}},
-                           {{"msdos", "vfat"}, {"vfat"}},
-                           {{"ntfs", "ntfs3"}, {"ntfs"}},
-                           {{"fuseblk"}, {"ntfs", "exfat"}}};
-    const std::string driver = mountType.substr(0, mountType.find('.')); // "fuseblk.ntfs"
-    for (const auto &kind : kNamedOtherwise) {
-        if (std::find(kind.mounted.begin(), kind.mounted.end(), driver) != kind.mounted.end()) {
-            return kind.probed;
+bool ProbeOnlyMounted(blkid_probe probe, const std::string &mountType) {
+    std::string driver = mountType.substr(0, mountType.find('.')); // "fuseblk.ntfs"
+    char *names[4] = {&driver[0]}; // a list that ends with null, which libblkid does not change
+    for (const OtherNames &other : kOtherNames) {
+        if (driver == other.mounted) {
+            std::transform(std::begin(other.probed), std::end(other.probed), names,
+                           [](const char *name) { return const_cast<char *>(name); });
         }
     }
-    return {mountType};
-}
-
-bool ProbeOnlyTypes(blkid_probe probe, TypeNames types) {
-    std::vector<char *> names; // a list that ends with null, which libblkid does not change
-    for (std::string &type : types) {
-        names.push_back(&type[0]);
-    }
-    names.push_back(nullptr);
-    return blkid_probe_filter_superblocks_type(probe, BLKID_FLTR_ONLYIN, names.data()) == 0;
+    return blkid_probe_filter_superblocks_type(probe, BLKID_FLTR_ONLYIN, names) == 0;
 }
 
 // Empty where there is no such file.
@@ -116,7 +110,7 @@ std::string BlockDeviceProbe(const std::string &devicePath, const char *name,
     if (probe == nullptr || blkid_probe_enable_superblocks(probe.get(), 1) != 0 ||
         blkid_probe_set_superblocks_flags(probe.get(), BLKID_SUBLKS_UUID | BLKID_SUBLKS_TYPE) !=
             0 ||
-        (!mountType.empty() && !ProbeOnlyTypes(probe.get(), ProbeTypesOfMount(mountType))) ||
+        (!mountType.empty() && !ProbeOnlyMounted(probe.get(), mountType)) ||
         blkid_do_safeprobe(probe.get()) != 0) {
         return {};
     }
