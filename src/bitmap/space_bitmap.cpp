@@ -88,10 +88,18 @@ int BitmapAllocateAndInitialize(const char *spaceUUID, PinBitmap **bitmap, bool 
 }
 
 int VolumeBitmapLoad(VolumeBitmap *volume, const LogPlace &place) {
-    PinBitmap *loaded = nullptr;
-    const int result =
-        BitmapAllocateAndInitialize(volume->uuid.get(), &loaded, &volume->sizeChanged);
-    volume->bitmap.reset(loaded);
+    // Handed over however the load ends.
+    struct Loaded {
+        BitmapHolder &holder;
+        PinBitmap *bitmap = nullptr;
+        ~Loaded() { holder.reset(bitmap); }
+    };
+    int result = -1;
+    {
+        Loaded loaded{volume->bitmap};
+        result =
+            BitmapAllocateAndInitialize(volume->uuid.get(), &loaded.bitmap, &volume->sizeChanged);
+    }
     if (result < 0) {
         LogErrorAt(place, "Allocate bitmap failed");
     }
