@@ -106,8 +106,8 @@ Attempt ReplaceByRename(const std::string &target, const struct stat *old,
 }
 
 // Grows the file with blanks, which mean nothing behind a document, to the size of what will be
-// written, as far as the storage, which may promise room that it has not: what is written there
-// then has its room. Without it the file is as it was.
+// written, and syncs them: storage may promise room that it has not got. Without the room the file
+// is as it was.
 bool TakeRoom(int fd, off_t present, size_t needed) {
     const auto missing = static_cast<int64_t>(needed) - present;
     if (missing <= 0) {

@@ -29,7 +29,7 @@ attacker_message() {
 }
 
 attacker_programs() {
-    [ ! -d /tmp/attacker ] || return 0
+    [ ! -e /tmp/attacker/system_message ] || return 0
     mkdir -p /tmp/attacker/bin
     cp "$BIN/veskcachepinfiletool" /tmp/attacker/bin/
     cp "$HELPERS/system_message" /tmp/attacker/
