@@ -1,7 +1,7 @@
 #include "storage_core/directory_entry.h"
 
 #include "base/deleter.h"
-#include "storage_core/folder_open.h"
+#include "files/folder_open.h"
 
 #include <dirent.h>
 #include <fcntl.h>

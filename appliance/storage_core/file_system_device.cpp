@@ -1,10 +1,10 @@
 #include "vesk/storage_core.h"
 
 #include "base/malloc_text.h"
+#include "files/folder_open.h"
 #include "storage_core/block_device.h"
 #include "storage_core/directory_entry.h"
 #include "storage_core/file_extents.h"
-#include "storage_core/folder_open.h"
 #include "storage_core/mount_table.h"
 
 #include <sys/stat.h>

@@ -66,6 +66,24 @@ std::vector<BitRun> BitRunsOf(const unsigned char *bytes, size_t size) {
     return runs;
 }
 
+uint64_t BitCountIn(const unsigned char *bytes, size_t size, const BitRun &run) {
+    const uint64_t bits = uint64_t{size} * 8;
+    if (run.first >= bits) {
+        return 0;
+    }
+    const uint64_t end = run.first + std::min(run.count, bits - run.first);
+    uint64_t count = 0;
+    for (uint64_t bit = run.first; bit < end;) {
+        const auto at = static_cast<size_t>(bit >> 3);
+        const unsigned within = bit & 7;
+        const auto taken = static_cast<unsigned>(std::min<uint64_t>(8 - within, end - bit));
+        const unsigned byte = bytes[at] >> within & (0xFFU >> (8 - taken));
+        count += static_cast<unsigned>(__builtin_popcount(byte));
+        bit += taken;
+    }
+    return count;
+}
+
 bool BitIsSet(const unsigned char *bytes, size_t size, uint64_t bit) {
     return bit >> 3 < size && (bytes[static_cast<size_t>(bit >> 3)] >> (bit & 7) & 1) != 0;
 }

@@ -33,6 +33,9 @@ bool BitScanStep(BitScan &scan, BitRun &run);
 // All runs in ascending order, no two of them adjacent.
 std::vector<BitRun> BitRunsOf(const unsigned char *bytes, size_t size);
 
+// How many bits of the run are set; those past the end are not.
+uint64_t BitCountIn(const unsigned char *bytes, size_t size, const BitRun &run);
+
 // A bit past the end is not set.
 bool BitIsSet(const unsigned char *bytes, size_t size, uint64_t bit);
 } // namespace vesk

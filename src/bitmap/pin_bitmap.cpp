@@ -60,15 +60,21 @@ void BitmapFree(PinBitmap *bitmap) {
     free(bitmap);
 }
 
+BitRun BitmapBlocksOf(uint64_t startSector, uint64_t numSectors) {
+    const uint64_t first = startSector >> kBitmapSectorShift;
+    const uint64_t last = (startSector + numSectors - 1) >> kBitmapSectorShift;
+    return {first, first > last ? 0 : last - first + 1};
+}
+
 int BitmapOperation(PinBitmap *bitmap, uint64_t startSector, uint64_t numSectors, int op) {
     LogDebug("Disk start sector=%llu num sectors=%llu\n", LogU64(startSector), LogU64(numSectors));
     const uint64_t bits = static_cast<uint64_t>(bitmap->size) * 8;
-    const uint64_t first = startSector >> kBitmapSectorShift;
-    const uint64_t last = (startSector + numSectors - 1) >> kBitmapSectorShift;
-    if (first > last || first >= bits) {
+    const BitRun blocks = BitmapBlocksOf(startSector, numSectors);
+    if (blocks.count == 0 || blocks.first >= bits) {
         return 0;
     }
-    ApplyBits(bitmap->data, bitmap->size, first, std::min(last, bits - 1), op == 1);
+    const uint64_t last = std::min(blocks.first + blocks.count, bits) - 1;
+    ApplyBits(bitmap->data, bitmap->size, blocks.first, last, op == 1);
     return 0;
 }
 

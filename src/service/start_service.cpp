@@ -35,7 +35,7 @@ int StartService(const ToolParameters *parameters) {
         LogTraceExit();
         return -1;
     }
-    pthread_setname_np(worker, "worker");
+    pthread_setname_np(worker, kWorkerThreadName);
     StartSignalThread();
     GetRequests(parameters->configPath);
 }

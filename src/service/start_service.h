@@ -5,6 +5,8 @@
 namespace vesk {
 struct ToolParameters;
 
+const char kWorkerThreadName[] = "worker";
+
 // Runs the service. `parameters` must outlive the process's threads. -1 after an error message when
 // it cannot start; otherwise it does not return: the receiver ends the calling thread, a signal the
 // process.

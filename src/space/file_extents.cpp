@@ -38,6 +38,11 @@ FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path) {
     return device;
 }
 
+int FileExtentsAsk(FileSystemDevice &device, const std::string &filePath, uint32_t inode,
+                   FileMappingTable *table) {
+    return device.GetMappingByInode(DirectoryOf(filePath), inode, *table) < 0 ? -1 : 0;
+}
+
 int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,
                             const std::string &filePath, uint32_t inode) {
     LogVerbose("Start for file (%s), inode = %lu", filePath.c_str(),

@@ -10,12 +10,13 @@
 
 namespace vesk {
 namespace {
-using SpaceList = std::unique_ptr<VESKSpaceInfo, Deleter<VESKSpaceInfoFree>>;
+using SpaceInfoList = std::unique_ptr<VESKSpaceInfo, Deleter<VESKSpaceInfoFree>>;
 
 // Shows the spaces to `visit` until it answers something else than NoSpace, which is the result.
 // The list is the caller's, who logs the answer before it is freed.
 template <typename Visit>
-SpaceCause Walk(const Visit &visit, SpaceList *spaces, SpaceCause *asked, const LogPlace &place) {
+SpaceCause Walk(const Visit &visit, SpaceInfoList *spaces, SpaceCause *asked,
+                const LogPlace &place) {
     VESKSpaceInfo *list = nullptr;
     const int result = VESKSpaceInfoEnum(1, &list);
     spaces->reset(list); // the library may set a list even when it fails
@@ -45,7 +46,7 @@ char *SpaceGetReferencePath(const char *uuid, SpaceCause *cause) {
         referencePath = strdup(space.referencePath);
         return SpaceCause::Found;
     };
-    SpaceList spaces;
+    SpaceInfoList spaces;
     if (Walk(visit, &spaces, cause, place) != SpaceCause::CannotEnumerate) {
         LogVerbose("Get reference path = %s", referencePath);
     }
@@ -66,7 +67,7 @@ char *SpaceGetDevicePath(const char *referencePath, SpaceCause *cause) {
         devicePath = strdup(space.devicePath);
         return SpaceCause::Found;
     };
-    SpaceList spaces;
+    SpaceInfoList spaces;
     const SpaceCause result = Walk(visit, &spaces, cause, place);
     if (result == SpaceCause::Found || result == SpaceCause::NoSpace) {
         LogVerbose("Get device path = %s", devicePath);
@@ -83,11 +84,27 @@ char *SpaceGetUUID(const char *referencePath, SpaceCause *cause) {
         uuid = VESKSpaceUUIDGet(&space);
         return uuid != nullptr ? SpaceCause::Found : SpaceCause::NoUuid;
     };
-    SpaceList spaces;
+    SpaceInfoList spaces;
     if (Walk(visit, &spaces, cause, LogHere()) != SpaceCause::CannotEnumerate) {
         LogVerbose("Get UUID = %s", uuid);
     }
     return uuid;
+}
+
+std::vector<SpaceEntry> SpaceList(SpaceCause *cause) {
+    VESKSpaceInfo *list = nullptr;
+    const int result = VESKSpaceInfoEnum(1, &list);
+    const SpaceInfoList owner(list);
+    if (result < 0) {
+        LogError("Can't enum spaces");
+    }
+    SpaceTell(cause, result < 0 ? SpaceCause::CannotEnumerate : SpaceCause::Found);
+    std::vector<SpaceEntry> spaces;
+    for (; list != nullptr; list = list->next) {
+        const MallocText uuid(VESKSpaceUUIDGet(list));
+        spaces.push_back({list->referencePath, list->devicePath, uuid ? uuid.get() : ""});
+    }
+    return spaces;
 }
 
 char *SpaceGetBitmapPath(const char *uuid) {

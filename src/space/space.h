@@ -11,6 +11,9 @@
 #include "base/log.h"
 #include "base/malloc_text.h"
 
+#include <string>
+#include <vector>
+
 namespace vesk {
 // Why a look-up here or in space/space_cache.h has come to its answer.
 enum class SpaceCause {
@@ -37,6 +40,17 @@ char *SpaceGetBitmapPath(const char *uuid);
 
 // The same below this reference path, cut to 511 characters. Null only when memory runs out.
 char *BitmapGetPathByReferencePath(const char *referencePath);
+
+// One space, as the platform lists it.
+struct SpaceEntry {
+    std::string referencePath; // empty: missing
+    std::string devicePath;
+    std::string uuid; // empty: cannot be read
+};
+
+// All spaces in the platform's order. The cause is Found, or CannotEnumerate after an error
+// message; then what was listed all the same.
+std::vector<SpaceEntry> SpaceList(SpaceCause *cause = nullptr);
 
 // Tells the cause to a caller that has asked for it.
 inline void SpaceTell(SpaceCause *asked, SpaceCause cause) {

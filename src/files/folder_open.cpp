@@ -1,4 +1,4 @@
-#include "storage_core/folder_open.h"
+#include "files/folder_open.h"
 
 #include <linux/openat2.h>
 #include <sys/stat.h>

@@ -1,4 +1,4 @@
-#include "storage_core/folder_open.h"
+#include "files/folder_open.h"
 
 #include "tests/support/test_volume.h"
 

@@ -1,0 +1,106 @@
+#include "json/json_text.h"
+
+#include "text/utf8.h"
+
+#include <json/json.h>
+
+#include <memory>
+
+namespace vesk {
+namespace {
+std::string Quoted(std::string_view text) {
+    const std::string valid = Utf8IsValid(text) ? std::string(text) : Utf8Repaired(text);
+    return Json::valueToQuotedString(valid.c_str());
+}
+} // namespace
+
+void JsonWriter::Begin(std::string_view name) {
+    if (needsComma_) {
+        sink_.Put(",");
+    }
+    if (!name.empty()) {
+        sink_.Put("\"");
+        sink_.Put(name);
+        sink_.Put("\":");
+    }
+    needsComma_ = true;
+}
+
+void JsonWriter::BeginObject(std::string_view name) {
+    Begin(name);
+    sink_.Put("{");
+    needsComma_ = false;
+}
+
+void JsonWriter::BeginArray(std::string_view name) {
+    Begin(name);
+    sink_.Put("[");
+    needsComma_ = false;
+}
+
+void JsonWriter::EndObject() {
+    sink_.Put("}");
+    needsComma_ = true;
+}
+
+void JsonWriter::EndArray() {
+    sink_.Put("]");
+    needsComma_ = true;
+}
+
+void JsonWriter::Text(std::string_view name, std::string_view value) {
+    Begin(name);
+    sink_.Put(Quoted(value));
+}
+
+void JsonWriter::Text(std::string_view name, const std::optional<std::string> &value) {
+    value ? Text(name, std::string_view(*value)) : Null(name);
+}
+
+void JsonWriter::Number(std::string_view name, const std::optional<uint64_t> &value) {
+    Begin(name);
+    sink_.Put(value ? std::to_string(*value) : "null");
+}
+
+void JsonWriter::Signed(std::string_view name, const std::optional<int64_t> &value) {
+    Begin(name);
+    sink_.Put(value ? std::to_string(*value) : "null");
+}
+
+void JsonWriter::Bool(std::string_view name, const std::optional<bool> &value) {
+    Begin(name);
+    sink_.Put(!value ? "null" : *value ? "true" : "false");
+}
+
+void JsonWriter::Null(std::string_view name) {
+    Begin(name);
+    sink_.Put("null");
+}
+
+void JsonWriter::Path(std::string_view name, const std::string &path) {
+    Text(name, std::string_view(path));
+    if (!Utf8IsValid(path)) {
+        Text(std::string(name) + "Bytes", std::string_view(Base64Of(path)));
+    }
+}
+
+std::optional<std::map<std::string, uint64_t>> JsonReadNumbers(const std::string &text) {
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    Json::Value root;
+    try {
+        if (!reader->parse(text.data(), text.data() + text.size(), &root, nullptr) ||
+            !root.isObject()) {
+            return std::nullopt;
+        }
+    } catch (const Json::Exception &) {
+        return std::nullopt; // nested too deeply
+    }
+    std::map<std::string, uint64_t> numbers;
+    for (auto member = root.begin(); member != root.end(); ++member) {
+        if (member->isUInt64()) {
+            numbers.emplace(member.name(), member->asUInt64());
+        }
+    }
+    return numbers;
+}
+} // namespace vesk

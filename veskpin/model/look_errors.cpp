@@ -1,0 +1,45 @@
+#include "model/look_errors.h"
+
+#include "base/log.h"
+
+#include <algorithm>
+
+namespace vesk {
+namespace {
+std::string loggedErrors;
+const size_t kLoggedMax = 1000; // bytes: one look's, not those of a hundred thousand
+
+void KeepError(LogClass logClass, const LogPlace & /*place*/, const char *text) {
+    if (logClass != LogClass::Error || loggedErrors.size() > kLoggedMax) {
+        return;
+    }
+    std::string line = text;
+    line.erase(line.find_last_not_of(" \n") + 1);
+    loggedErrors += (loggedErrors.empty() ? "" : ": ") + line;
+}
+} // namespace
+
+void LookErrorAdd(LookErrors *errors, const std::string &path, const std::string &text) {
+    const auto isSame = [&](const LookError &error) {
+        return error.path == path && error.text == text;
+    };
+    if (std::none_of(errors->list.begin(), errors->list.end(), isSame)) {
+        errors->list.push_back({path, text});
+    }
+}
+
+void LookUnknownAdd(LookErrors *errors, const std::string &path, const std::string &text) {
+    LookErrorAdd(errors, path, text);
+    errors->isUnknown = true;
+}
+
+void LookLogBegin() {
+    LogSetSink(KeepError);
+}
+
+std::string LookLogTake(const std::string &otherwise) {
+    const std::string taken = loggedErrors.empty() ? otherwise : loggedErrors;
+    loggedErrors.clear();
+    return taken;
+}
+} // namespace vesk

@@ -1,0 +1,79 @@
+#include "model/path_walk.h"
+
+#include "base/deleter.h"
+#include "base/scoped_fd.h"
+#include "files/folder_open.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <memory>
+#include <vector>
+
+namespace vesk {
+namespace {
+// The names in an open folder, sorted. 0 or an errno, and then those before the failure.
+int NamesIn(int folder, std::vector<std::string> *names) {
+    ScopedFd again(openat(folder, ".", kOpenForReading | O_DIRECTORY));
+    const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(again.Get()));
+    if (stream == nullptr) {
+        return errno;
+    }
+    again.Release(); // the stream closes it from here on
+    errno = 0;
+    while (const dirent *entry = readdir(stream.get())) {
+        const std::string name = entry->d_name;
+        if (name != "." && name != "..") {
+            names->push_back(name);
+        }
+    }
+    const int error = errno;
+    std::sort(names->begin(), names->end());
+    return error;
+}
+
+WalkKind KindOf(const FileStat &status, dev_t device) {
+    if (status.device != device) {
+        return WalkKind::OtherFileSystem;
+    }
+    return S_ISREG(status.mode) ? WalkKind::File : WalkKind::Other;
+}
+} // namespace
+
+void PathWalk(const FileLooker &looker, const std::string &folder,
+              const std::function<void(const WalkEntry &)> &visit) {
+    std::vector<std::string> waiting{folder}; // the next one last
+    while (!waiting.empty()) {
+        const std::string here = std::move(waiting.back());
+        waiting.pop_back();
+        errno = 0;
+        const ScopedFd fd = FolderOpenBeneath(looker.Root(), here);
+        std::vector<std::string> names;
+        const int error = fd.IsOpen() ? NamesIn(fd.Get(), &names) : errno != 0 ? errno : ENOENT;
+        if (error != 0) {
+            visit({here, WalkKind::Unreadable, {}, error});
+        }
+        std::vector<std::string> folders;
+        for (const std::string &name : names) {
+            const std::string path = here.empty() ? name : here + "/" + name;
+            FileStat status{};
+            const int failure = FileStatAt(fd.Get(), name.c_str(), &status);
+            if (failure == ENOENT) {
+                continue; // gone since its name was read
+            }
+            if (failure != 0) {
+                visit({path, WalkKind::Unreadable, {}, failure});
+            } else if (S_ISDIR(status.mode) && status.device == looker.Device()) {
+                folders.push_back(path);
+            } else {
+                visit({path, KindOf(status, looker.Device()), status, 0});
+            }
+        }
+        waiting.insert(waiting.end(), std::make_move_iterator(folders.rbegin()),
+                       std::make_move_iterator(folders.rend()));
+    }
+}
+} // namespace vesk

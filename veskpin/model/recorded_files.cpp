@@ -1,0 +1,104 @@
+#include "model/recorded_files.h"
+
+#include "model/look_errors.h"
+#include "request/file_inode_list.h"
+
+#include <algorithm>
+#include <map>
+
+namespace vesk {
+namespace {
+// The last stored request for each path, with the inode that it names.
+using Wanted = std::map<std::string, std::pair<int, uint32_t>>;
+
+Wanted WantedOf(const std::string &mountPath, const std::vector<StoredRequest> &requests,
+                KnownFiles *known) {
+    Wanted wanted;
+    for (const StoredRequest &request : requests) {
+        if (request.mountPath != mountPath) {
+            continue;
+        }
+        ++known->requests;
+        std::vector<FileInfo> infos;
+        if (RequestHasFiles(request.type) &&
+            RequestDataGetFileInfos(request.data.c_str(), &infos) < 0) {
+            known->problems.push_back("request " + request.number + ": " +
+                                      LookLogTake("its list of files cannot be read"));
+        }
+        for (const FileInfo &info : infos) {
+            wanted[info.szRelativePath] = {request.type, static_cast<uint32_t>(info.inodeNum)};
+        }
+    }
+    return wanted;
+}
+
+bool IsBefore(const KnownFile &a, const KnownFile &b) {
+    return a.relativePath < b.relativePath;
+}
+} // namespace
+
+KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
+                        const std::vector<StoredRequest> &requests) {
+    KnownFiles known;
+    Wanted wanted = WantedOf(mountPath, requests, &known);
+    if (volume != nullptr) {
+        known.recorded = volume->files.size();
+        known.files.reserve(volume->files.size() + wanted.size());
+        for (RecordedFile &file : volume->files) {
+            known.files.push_back({std::move(file.relativePath), file.inode, kRequestUnknown});
+        }
+        volume->files.clear();
+    }
+    const size_t recorded = known.files.size();
+    for (auto &[path, request] : wanted) {
+        const auto [first, last] =
+            std::equal_range(known.files.begin(),
+                             known.files.begin() + static_cast<std::ptrdiff_t>(recorded),
+                             KnownFile{path, std::nullopt, 0}, IsBefore);
+        for (auto file = first; file != last; ++file) {
+            file->stored = request.first;
+        }
+        if (first == last) {
+            known.files.push_back({path, std::nullopt, request.first});
+        }
+    }
+    std::inplace_merge(known.files.begin(),
+                       known.files.begin() + static_cast<std::ptrdiff_t>(recorded),
+                       known.files.end(), IsBefore);
+    for (size_t i = 0; i < known.files.size(); ++i) {
+        if (known.files[i].inode) {
+            known.byInode.emplace_back(*known.files[i].inode, i);
+        }
+    }
+    std::sort(known.byInode.begin(), known.byInode.end());
+    return known;
+}
+
+std::pair<size_t, size_t> KnownFilesAt(const KnownFiles &known, const std::string &relativePath) {
+    const auto [first, last] =
+        std::equal_range(known.files.begin(), known.files.end(),
+                         KnownFile{relativePath, std::nullopt, 0}, IsBefore);
+    return {first - known.files.begin(), last - known.files.begin()};
+}
+
+std::pair<size_t, size_t> KnownFilesBelow(const KnownFiles &known, const std::string &folder) {
+    if (folder.empty()) {
+        return {0, known.files.size()};
+    }
+    // "0" is the character after "/".
+    const auto at = [&](const std::string &text) {
+        return std::lower_bound(known.files.begin(), known.files.end(),
+                                KnownFile{text, std::nullopt, 0}, IsBefore) -
+               known.files.begin();
+    };
+    return {at(folder + "/"), at(folder + "0")};
+}
+
+const KnownFile *KnownFileByInode(const KnownFiles &known, uint64_t inode) {
+    const auto wanted = static_cast<uint32_t>(inode);
+    const auto found = std::lower_bound(known.byInode.begin(), known.byInode.end(),
+                                        std::make_pair(wanted, size_t{0}));
+    return found == known.byInode.end() || found->first != wanted ? nullptr
+                                                                  : &known.files[found->second];
+}
+} // namespace vesk

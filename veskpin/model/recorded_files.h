@@ -1,0 +1,42 @@
+// The files of a volume that the configuration knows: recorded, or in a stored request.
+//
+// Thread rule: no state.
+#pragma once
+
+#include "config/config_records.h"
+#include "request/request_record.h"
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace vesk {
+struct KnownFile {
+    std::string relativePath;
+    std::optional<uint32_t> inode; // the recorded one, absent where there is only a request
+    int stored = kRequestUnknown;  // the last stored request for it: pin, unpin or none
+};
+
+// In ascending order of paths; a path stands there once for each inode recorded under it, since a
+// file that was replaced and pinned again leaves its old record.
+struct KnownFiles {
+    std::vector<KnownFile> files;
+    uint64_t recorded = 0;                             // records
+    uint64_t requests = 0;                             // stored requests of the volume
+    std::vector<std::pair<uint32_t, size_t>> byInode;  // recorded inode, index in `files`; sorted
+    std::vector<std::string> problems;
+};
+
+// Takes the records out of `volume`, which may be null, and of the requests those of `mountPath`.
+KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
+                        const std::vector<StoredRequest> &requests);
+
+// The entries of this path, and those at and below this folder (empty: all), as a range of indexes.
+std::pair<size_t, size_t> KnownFilesAt(const KnownFiles &known, const std::string &relativePath);
+std::pair<size_t, size_t> KnownFilesBelow(const KnownFiles &known, const std::string &folder);
+
+// The entry whose recorded inode has these low 32 bits, or null.
+const KnownFile *KnownFileByInode(const KnownFiles &known, uint64_t inode);
+} // namespace vesk

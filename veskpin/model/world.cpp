@@ -1,0 +1,123 @@
+#include "model/world.h"
+
+#include "config/config_records.h"
+
+#include <algorithm>
+#include <set>
+
+namespace vesk {
+namespace {
+ConfigRecords ReadRecords(World *world) {
+    ConfigRecords records;
+    world->isConfigKnown = ConfigReadRecords(world->configPath.c_str(), &records) == 0;
+    const std::string logged = LookLogTake("cannot be read");
+    if (!world->isConfigKnown) {
+        LookUnknownAdd(&world->errors, world->configPath, logged);
+    }
+    for (const std::string &problem : records.problems) {
+        LookErrorAdd(&world->errors, world->configPath, problem);
+    }
+    return records;
+}
+
+RecordedVolume *RecordsOf(ConfigRecords *records, const std::string &mountPath) {
+    const auto found =
+        std::find_if(records->volumes.begin(), records->volumes.end(),
+                     [&](const RecordedVolume &volume) { return volume.mountPath == mountPath; });
+    return found == records->volumes.end() ? nullptr : &*found;
+}
+
+// The mount paths that records and requests name.
+std::set<std::string> PathsNamed(const ConfigRecords &records) {
+    std::set<std::string> paths;
+    for (const RecordedVolume &volume : records.volumes) {
+        paths.insert(volume.mountPath);
+    }
+    for (const StoredRequest &request : records.requests) {
+        paths.insert(request.mountPath);
+    }
+    return paths;
+}
+
+void AddVolume(World *world, Volume volume, ConfigRecords *records) {
+    WorldVolume added;
+    added.known = KnownFilesOf(volume.mountPath, RecordsOf(records, volume.mountPath),
+                               records->requests);
+    for (const std::string &problem : added.known.problems) {
+        LookErrorAdd(&world->errors, world->configPath, problem);
+    }
+    added.volume = std::move(volume);
+    world->volumes.push_back(std::move(added));
+}
+} // namespace
+
+World WorldLook(const std::string &configPath) {
+    World world;
+    world.configPath = configPath;
+    LookLogTake("");
+    ConfigRecords records = ReadRecords(&world);
+    world.storedRequests = records.requests.size();
+    std::set<std::string> named = PathsNamed(records);
+    SpaceCause cause = SpaceCause::Found;
+    const std::vector<SpaceEntry> spaces = SpaceList(&cause);
+    if (cause != SpaceCause::Found) {
+        LookUnknownAdd(&world.errors, "", LookLogTake("the volumes cannot be listed"));
+    }
+    for (const SpaceEntry &space : spaces) {
+        Volume volume = VolumeLook(space, &world.errors);
+        if (named.erase(volume.mountPath) == 0 && !volume.hasCache) {
+            world.withoutCache.push_back(volume.mountPath);
+        } else {
+            AddVolume(&world, std::move(volume), &records);
+        }
+    }
+    for (const std::string &mountPath : named) {
+        Volume volume;
+        volume.mountPath = mountPath;
+        AddVolume(&world, std::move(volume), &records);
+    }
+    std::sort(world.volumes.begin(), world.volumes.end(),
+              [](const WorldVolume &a, const WorldVolume &b) {
+                  return a.volume.mountPath < b.volume.mountPath;
+              });
+    return world;
+}
+
+const WorldVolume *WorldVolumeFind(const World &world, const std::string &mountPath) {
+    const auto found =
+        std::find_if(world.volumes.begin(), world.volumes.end(), [&](const WorldVolume &volume) {
+            return volume.volume.mountPath == mountPath;
+        });
+    return found == world.volumes.end() ? nullptr : &*found;
+}
+
+std::vector<const WorldVolume *> WorldVolumesWanted(World &world,
+                                                    const std::vector<std::string> &wanted) {
+    std::vector<const WorldVolume *> volumes;
+    if (wanted.empty()) {
+        for (const WorldVolume &volume : world.volumes) {
+            volumes.push_back(&volume);
+        }
+        return volumes;
+    }
+    for (const std::string &given : wanted) {
+        std::string mountPath = given;
+        while (mountPath.size() > 1 && mountPath.back() == '/') {
+            mountPath.pop_back();
+        }
+        if (const WorldVolume *volume = WorldVolumeFind(world, mountPath)) {
+            if (volume->volume.isMounted && !volume->volume.hasCache) {
+                LookUnknownAdd(&world.errors, mountPath, "has no cache");
+            }
+            if (std::find(volumes.begin(), volumes.end(), volume) == volumes.end()) {
+                volumes.push_back(volume);
+            }
+            continue;
+        }
+        const auto &others = world.withoutCache;
+        const bool isMounted = std::find(others.begin(), others.end(), mountPath) != others.end();
+        LookUnknownAdd(&world.errors, mountPath, isMounted ? "has no cache" : "is no volume");
+    }
+    return volumes;
+}
+} // namespace vesk

@@ -1,0 +1,59 @@
+#include "verbs/answer.h"
+
+#include "text/escape.h"
+
+#include <cstdio>
+#include <cstdlib>
+
+namespace vesk {
+namespace {
+const uint64_t kSchema = 1;
+} // namespace
+
+void AnswerBegin(JsonWriter &json, const char *command) {
+    json.BeginObject();
+    json.Text("command", std::string_view(command));
+    json.Number("schema", kSchema);
+}
+
+void AnswerEnd(JsonWriter &json, TextSink &out, const LookErrors &errors) {
+    json.BeginArray("errors");
+    for (const LookError &error : errors.list) {
+        json.BeginObject();
+        json.Path("path", error.path);
+        json.Text("text", std::string_view(error.text));
+        json.EndObject();
+    }
+    json.EndArray();
+    json.EndObject();
+    out.Put("\n");
+}
+
+void AnswerErrors(const LookErrors &errors) {
+    for (const LookError &error : errors.list) {
+        const std::string path = error.path.empty() ? "" : TextEscaped(error.path) + ": ";
+        fprintf(stderr, "veskpin: %s%s\n", path.c_str(), TextEscaped(error.text).c_str());
+    }
+}
+
+std::string TableRow(const std::vector<std::string> &cells, const std::vector<int> &widths) {
+    std::string row;
+    for (size_t i = 0; i < cells.size(); ++i) {
+        if (i >= widths.size()) {
+            row += cells[i];
+            continue;
+        }
+        const auto width = static_cast<size_t>(abs(widths[i]));
+        const size_t blanks = width > cells[i].size() ? width - cells[i].size() : 0;
+        row += widths[i] < 0 ? cells[i] + std::string(blanks, ' ')
+                             : std::string(blanks, ' ') + cells[i];
+        row += "  ";
+    }
+    row.erase(row.find_last_not_of(' ') + 1);
+    return row + "\n";
+}
+
+std::string Colored(const std::string &text, int code, bool color) {
+    return color ? "\033[" + std::to_string(code) + "m" + text + "\033[0m" : text;
+}
+} // namespace vesk

@@ -1,0 +1,156 @@
+#include "verbs/plan.h"
+
+#include "model/path_walk.h"
+#include "model/targets.h"
+#include "verbs/answer.h"
+#include "verbs/file_state.h"
+#include "verbs/verbs.h"
+
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <memory>
+
+namespace vesk {
+namespace {
+// The plan for one volume.
+class VolumePlanner {
+public:
+    VolumePlanner(const WorldVolume &world, Plan &plan)
+        : world_(world), plan_(plan), looker_(world.volume.mountPath), sum_(world) {}
+
+    const WorldVolume &World() const { return world_; }
+
+    void AddFile(const std::string &relativePath, const FileStat *status) {
+        const FileLook &look = looker_.Look(relativePath, status);
+        const std::string &mountPath = world_.volume.mountPath;
+        if (const auto reason = SkipReasonOf(mountPath, relativePath, look)) {
+            Skip(relativePath, *reason);
+        } else if (!sum_.Add(relativePath, look, IsPinned(look))) {
+            Skip(relativePath, SkipReason::SameInode);
+        }
+    }
+
+    void AddFolder(const std::string &folder) {
+        PathWalk(looker_, folder, [&](const WalkEntry &entry) {
+            switch (entry.kind) {
+            case WalkKind::File: AddFile(entry.relativePath, &entry.status); break;
+            case WalkKind::Other: Skip(entry.relativePath, SkipReason::NotRegular); break;
+            case WalkKind::OtherFileSystem:
+                Skip(entry.relativePath, SkipReason::OtherFileSystem);
+                break;
+            case WalkKind::Unreadable:
+                Skip(entry.relativePath, SkipReasonOfError(entry.error));
+                break;
+            }
+        });
+    }
+
+    PlannedVolume Total(unsigned reservePercent) {
+        for (const KnownFile &known : world_.known.files) {
+            if (known.stored == kRequestPinFiles) {
+                sum_.AddStored(looker_.Look(known.relativePath));
+            }
+        }
+        return {world_.volume.mountPath, sum_.Total(reservePercent)};
+    }
+
+private:
+    bool IsPinned(const FileLook &look) const {
+        const KnownFile *known = KnownFileByInode(world_.known, look.status.inode);
+        const FileFigures figures = FileFiguresOf(look, world_.volume);
+        return FileStateOf(known, look, figures, world_.volume) == FileState::Pinned;
+    }
+
+    void Skip(const std::string &relativePath, SkipReason reason) {
+        plan_.skipped.push_back({world_.volume.mountPath + "/" + relativePath, reason});
+    }
+
+    const WorldVolume &world_;
+    Plan &plan_;
+    FileLooker looker_;
+    PlanSum sum_;
+};
+
+SkipReason ReasonOfTarget(const Target &target) {
+    return target.error != 0 ? SkipReasonOfError(target.error) : SkipReason::NoVolume;
+}
+
+bool CanBePlanned(const Target &target) {
+    return target.error == 0 && target.volume != nullptr && !target.isWithoutCache &&
+           target.volume->volume.isMounted;
+}
+
+// Without those that are, or lie below, another one.
+std::vector<Target> ResolveOnce(const World &world, const std::vector<std::string> &paths) {
+    std::vector<Target> targets;
+    for (const std::string &path : paths) {
+        targets.push_back(TargetResolve(world, path));
+    }
+    std::stable_sort(targets.begin(), targets.end(),
+                     [](const Target &a, const Target &b) { return a.path < b.path; });
+    std::vector<Target> once;
+    std::string folder; // the last one taken, with "/"
+    for (Target &target : targets) {
+        const bool isBelow = !folder.empty() && target.path.compare(0, folder.size(), folder) == 0;
+        const bool isSame = !once.empty() && once.back().path == target.path;
+        if (isBelow || isSame) {
+            continue;
+        }
+        if (target.status && S_ISDIR(target.status->mode)) {
+            folder = target.path + (target.path == "/" ? "" : "/");
+        }
+        once.push_back(std::move(target));
+    }
+    return once;
+}
+} // namespace
+
+Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent) {
+    Plan plan;
+    std::vector<std::unique_ptr<VolumePlanner>> planners;
+    const auto plannerOf = [&](const WorldVolume &volume) -> VolumePlanner & {
+        for (const auto &planner : planners) {
+            if (&planner->World() == &volume) {
+                return *planner;
+            }
+        }
+        planners.push_back(std::make_unique<VolumePlanner>(volume, plan));
+        return *planners.back();
+    };
+    const std::vector<Target> targets = ResolveOnce(world, paths);
+    size_t failed = 0;
+    for (const Target &target : targets) {
+        if (!CanBePlanned(target)) {
+            plan.skipped.push_back({target.path, ReasonOfTarget(target)});
+            ++failed;
+            if (target.error == EACCES || target.error == EPERM) {
+                LookUnknownAdd(&world.errors, target.path, strerror(target.error));
+            }
+        } else if (S_ISDIR(target.status->mode)) {
+            plannerOf(*target.volume).AddFolder(target.relativePath);
+        } else {
+            plannerOf(*target.volume).AddFile(target.relativePath, nullptr);
+        }
+    }
+    plan.isAllFailed = failed == targets.size();
+    for (const auto &planner : planners) {
+        plan.volumes.push_back(planner->Total(reservePercent));
+    }
+    return plan;
+}
+
+ExitStatus PlanCommand(const Settings &settings, TextSink &out) {
+    World world = WorldLook(settings.configPath);
+    const Plan plan = PlanLook(world, settings.paths, settings.reservePercent);
+    if (settings.json) {
+        PlanShowJson(plan, world.errors, out);
+    } else {
+        PlanShowTable(plan, settings.color, out);
+        AnswerErrors(world.errors);
+    }
+    return PlanStatus(plan, world.errors);
+}
+} // namespace vesk

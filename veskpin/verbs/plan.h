@@ -1,0 +1,36 @@
+// The answer of `plan`. Thread rule: no state.
+#pragma once
+
+#include "model/world.h"
+#include "text/text_sink.h"
+#include "verbs/plan_figures.h"
+#include "verbs/plan_reason.h"
+#include "verbs/settings.h"
+
+#include <string>
+#include <vector>
+
+namespace vesk {
+struct SkippedPath {
+    std::string path;
+    SkipReason reason;
+};
+
+struct PlannedVolume {
+    std::string mountPath;
+    PlanFigures figures;
+};
+
+struct Plan {
+    std::vector<PlannedVolume> volumes;
+    std::vector<SkippedPath> skipped;
+    bool isAllFailed = false; // none of the paths could be looked at
+};
+
+// What pinning these files and folders would do.
+Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent);
+
+ExitStatus PlanStatus(const Plan &plan, const LookErrors &errors);
+void PlanShowJson(const Plan &plan, const LookErrors &errors, TextSink &out);
+void PlanShowTable(const Plan &plan, bool color, TextSink &out);
+} // namespace vesk
