@@ -15,6 +15,8 @@ SYSTEM_TESTS=$(dirname "${BASH_SOURCE[0]}")
 . "$SYSTEM_TESTS/lib/blocks.bash"
 # shellcheck source=lib/messages.bash
 . "$SYSTEM_TESTS/lib/messages.bash"
+# shellcheck source=lib/veskpin.bash
+. "$SYSTEM_TESTS/lib/veskpin.bash"
 
 # bats traces every command to tell where a test failed, which takes many times longer than most
 # commands. On a slow machine that is too much.

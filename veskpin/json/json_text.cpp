@@ -12,6 +12,16 @@ std::string Quoted(std::string_view text) {
     const std::string valid = Utf8IsValid(text) ? std::string(text) : Utf8Repaired(text);
     return Json::valueToQuotedString(valid.c_str());
 }
+
+bool ParseObject(const std::string &text, Json::Value *root) {
+    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+    try {
+        return reader->parse(text.data(), text.data() + text.size(), root, nullptr) &&
+               root->isObject();
+    } catch (const Json::Exception &) {
+        return false; // nested too deeply
+    }
+}
 } // namespace
 
 void JsonWriter::Begin(std::string_view name) {
@@ -85,15 +95,9 @@ void JsonWriter::Path(std::string_view name, const std::string &path) {
 }
 
 std::optional<std::map<std::string, uint64_t>> JsonReadNumbers(const std::string &text) {
-    const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
     Json::Value root;
-    try {
-        if (!reader->parse(text.data(), text.data() + text.size(), &root, nullptr) ||
-            !root.isObject()) {
-            return std::nullopt;
-        }
-    } catch (const Json::Exception &) {
-        return std::nullopt; // nested too deeply
+    if (!ParseObject(text, &root)) {
+        return std::nullopt;
     }
     std::map<std::string, uint64_t> numbers;
     for (auto member = root.begin(); member != root.end(); ++member) {
@@ -102,5 +106,27 @@ std::optional<std::map<std::string, uint64_t>> JsonReadNumbers(const std::string
         }
     }
     return numbers;
+}
+
+std::optional<std::vector<JsonRecord>> JsonReadRecords(const std::string &text,
+                                                       const std::string &name) {
+    Json::Value root;
+    if (!ParseObject(text, &root) || !root[name].isArray()) {
+        return std::nullopt;
+    }
+    std::vector<JsonRecord> records;
+    for (const Json::Value &element : root[name]) {
+        if (!element.isObject()) {
+            return std::nullopt;
+        }
+        JsonRecord record;
+        for (auto member = element.begin(); member != element.end(); ++member) {
+            if (member->isString() || member->isIntegral()) {
+                record.emplace(member.name(), member->asString());
+            }
+        }
+        records.push_back(std::move(record));
+    }
+    return records;
 }
 } // namespace vesk

@@ -11,6 +11,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace vesk {
 // Values and members in the order of the calls. An empty name: an element of an array, or the
@@ -41,4 +42,10 @@ private:
 
 // The members of a JSON object that are whole numbers from 0 on. Nothing: no object.
 std::optional<std::map<std::string, uint64_t>> JsonReadNumbers(const std::string &text);
+
+// The objects in the array of this name, each with its members that are texts or whole numbers, as
+// texts. Nothing: no object, or no such array of objects.
+using JsonRecord = std::map<std::string, std::string>;
+std::optional<std::vector<JsonRecord>> JsonReadRecords(const std::string &text,
+                                                       const std::string &name);
 } // namespace vesk

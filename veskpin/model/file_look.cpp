@@ -12,15 +12,22 @@
 #include <cerrno>
 
 namespace vesk {
+namespace {
+const unsigned kWanted = STATX_TYPE | STATX_INO | STATX_SIZE | STATX_BTIME;
+const int64_t kNanoseconds = 1000000000; // in a second
+} // namespace
+
 int FileStatAt(int folder, const char *name, FileStat *status) {
     struct statx answer {};
     const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | AT_STATX_DONT_SYNC |
                       (*name == '\0' ? AT_EMPTY_PATH : 0);
-    if (statx(folder, name, flags, STATX_TYPE | STATX_INO | STATX_SIZE, &answer) != 0) {
+    if (statx(folder, name, flags, kWanted, &answer) != 0) {
         return errno;
     }
+    const bool hasBirth = (answer.stx_mask & STATX_BTIME) != 0;
     *status = {answer.stx_ino, answer.stx_size, answer.stx_mode,
-               makedev(answer.stx_dev_major, answer.stx_dev_minor)};
+               makedev(answer.stx_dev_major, answer.stx_dev_minor),
+               hasBirth ? answer.stx_btime.tv_sec * kNanoseconds + answer.stx_btime.tv_nsec : 0};
     return 0;
 }
 
@@ -48,8 +55,6 @@ int FileLooker::OpenFolder(const std::string &folder) {
 }
 
 void FileLooker::AskExtents(const std::string &relativePath) {
-    look_.table.entries.clear();
-    look_.blocks.clear();
     look_.hasExtents = extents_ != nullptr && S_ISREG(look_.status.mode) &&
                        FileExtentsAsk(*extents_, mountPath_ + "/" + relativePath,
                                       static_cast<uint32_t>(look_.status.inode),
@@ -59,23 +64,30 @@ void FileLooker::AskExtents(const std::string &relativePath) {
     }
 }
 
+int FileLooker::Stat(const std::string &relativePath, FileStat *status) {
+    if (error_ != 0) {
+        return error_;
+    }
+    const size_t slash = relativePath.rfind('/');
+    const std::string folder = slash == std::string::npos ? "" : relativePath.substr(0, slash);
+    int error = OpenFolder(folder);
+    if (error == 0) {
+        const size_t name = slash == std::string::npos ? 0 : slash + 1;
+        error = FileStatAt(folder_.Get(), relativePath.c_str() + name, status);
+    }
+    return error == 0 && status->device != device_ ? EXDEV : error;
+}
+
 const FileLook &FileLooker::Look(const std::string &relativePath, const FileStat *status) {
     look_.error = error_;
-    if (error_ == 0 && status == nullptr) {
-        const size_t slash = relativePath.rfind('/');
-        const std::string folder = slash == std::string::npos ? "" : relativePath.substr(0, slash);
-        look_.error = OpenFolder(folder);
-        if (look_.error == 0) {
-            const char *name = relativePath.c_str() + (slash == std::string::npos ? 0 : slash + 1);
-            look_.error = FileStatAt(folder_.Get(), name, &look_.status);
-        }
-        if (look_.error == 0 && look_.status.device != device_) {
-            look_.error = EXDEV;
-        }
-    } else if (status != nullptr) {
+    if (status != nullptr) {
         look_.status = *status;
+    } else {
+        look_.error = Stat(relativePath, &look_.status);
     }
     look_.hasExtents = false;
+    look_.table.entries.clear();
+    look_.blocks.clear();
     if (look_.error == 0) {
         AskExtents(relativePath);
     }

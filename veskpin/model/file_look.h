@@ -24,6 +24,7 @@ struct FileStat {
     uint64_t bytes;
     mode_t mode;
     dev_t device;
+    int64_t birth; // nanoseconds since 1970; 0: the file system does not know
 };
 
 // Of an entry of an open folder, not of a link's target; asks no file system that answers when it
@@ -46,6 +47,10 @@ public:
     int Error() const { return error_; }
     int Root() const { return root_.Get(); }
     dev_t Device() const { return device_; }
+
+    // Of the file at this path below the mount point. 0 or an errno, ENOENT where nothing is, EXDEV
+    // where another file system is.
+    int Stat(const std::string &relativePath, FileStat *status);
 
     // Looks at the file at this path below the mount point, or at one whose status is known. The
     // result is the looker's, until the next call.

@@ -192,8 +192,10 @@ bool IsYoung(const Thread &leader, const std::string &procFolder) {
            seconds;
 }
 
-// The worker waits while nothing is stored that it could carry out.
+// The worker waits while nothing is stored that it could carry out. What it sleeps for, between two
+// requests or for want of one, does not show in its thread.
 std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const Service &service,
+                                     const std::set<std::string> &heldVolumes,
                                      const std::string &procFolder) {
     const bool isThere =
         std::any_of(threads.begin(), threads.end(), [](const Thread &thread) {
@@ -208,7 +210,11 @@ std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const S
         LookLogTake("");
         return std::nullopt;
     }
-    return records.requests.empty() ? ThreadLook::Waiting : ThreadLook::Busy;
+    const bool hasWork = std::any_of(records.requests.begin(), records.requests.end(),
+                                     [&](const StoredRequest &request) {
+                                         return heldVolumes.count(request.mountPath) == 0;
+                                     });
+    return hasWork ? ThreadLook::Busy : ThreadLook::Waiting;
 }
 
 // By the process's effective user. The owner of its folder is root's also where it hides itself.
@@ -225,7 +231,8 @@ bool IsTrusted(const std::string &process) {
 }
 
 // The service that this process is; nothing where it is none.
-std::optional<Service> ServiceOf(pid_t pid, const std::string &procFolder, LookErrors *errors) {
+std::optional<Service> ServiceOf(pid_t pid, const std::set<std::string> &heldVolumes,
+                                 const std::string &procFolder, LookErrors *errors) {
     const std::string process = procFolder + "/" + std::to_string(pid);
     const std::string name = ReadProc(process + "/comm").value_or("");
     if (name != std::string(kToolName) + "\n" || !IsTrusted(process)) {
@@ -252,7 +259,7 @@ std::optional<Service> ServiceOf(pid_t pid, const std::string &procFolder, LookE
     }
     service.otherNamespaces = OtherNamespaces(*living, procFolder);
     service.receiver = ReceiverLook(threads.front());
-    service.worker = WorkerLook(threads, service, procFolder);
+    service.worker = WorkerLook(threads, service, heldVolumes, procFolder);
     if (!service.receiver || !service.otherNamespaces) {
         LookUnknownAdd(errors, process, "no permission to see what the service's threads do");
     }
@@ -260,10 +267,11 @@ std::optional<Service> ServiceOf(pid_t pid, const std::string &procFolder, LookE
 }
 } // namespace
 
-std::vector<Service> ServicesLook(LookErrors *errors, const std::string &procFolder) {
+std::vector<Service> ServicesLook(const std::set<std::string> &heldVolumes, LookErrors *errors,
+                                  const std::string &procFolder) {
     std::vector<Service> services;
     for (const pid_t pid : NumbersIn(procFolder)) {
-        if (auto service = ServiceOf(pid, procFolder, errors)) {
+        if (auto service = ServiceOf(pid, heldVolumes, procFolder, errors)) {
             services.push_back(std::move(*service));
         }
     }

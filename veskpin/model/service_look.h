@@ -10,6 +10,7 @@
 #include <sys/types.h>
 
 #include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -26,9 +27,11 @@ struct Service {
     std::optional<std::vector<std::string>> otherNamespaces;
 };
 
-// The services of root and of the caller's own user, in ascending order of their pids. `procFolder`
-// is where the kernel shows processes.
-std::vector<Service> ServicesLook(LookErrors *errors, const std::string &procFolder = "/proc");
+// The services of root and of the caller's own user, in ascending order of their pids. Of volumes
+// in `heldVolumes` (mount paths) no request is carried out. `procFolder` is where the kernel shows
+// processes.
+std::vector<Service> ServicesLook(const std::set<std::string> &heldVolumes, LookErrors *errors,
+                                  const std::string &procFolder = "/proc");
 
 struct Queue {
     MsgQueueCause cause = MsgQueueCause::NoKeyFile;

@@ -2,6 +2,7 @@
 
 #include "bitmap/pin_bitmap.h"
 #include "model/path_walk.h"
+#include "model/renamed.h"
 #include "model/targets.h"
 #include "verbs/verbs.h"
 
@@ -24,8 +25,11 @@ struct Sum {
 // The listing of one volume.
 class VolumeLister {
 public:
-    VolumeLister(const WorldVolume &world, LookErrors &errors, const Visit &visit)
+    VolumeLister(const WorldVolume &world, bool search, LookErrors &errors, const Visit &visit)
         : world_(world), errors_(errors), visit_(visit), looker_(world.volume.mountPath) {
+        if (search) {
+            renamed_ = RenamedFind(world, &errors);
+        }
         absent_.error = looker_.Error() != 0 ? looker_.Error() : ENODEV;
         if (!world.volume.isMounted) {
             LookUnknownAdd(&errors_, world.volume.mountPath, "is not mounted");
@@ -114,12 +118,18 @@ private:
     void ListPath(const std::string &relativePath, const FileStat *status,
                   std::pair<size_t, size_t> range, Sum *sum) {
         const Volume &volume = world_.volume;
-        const FileLook &look =
-            volume.isMounted ? looker_.Look(relativePath, status) : absent_;
+        const FileLook &look = volume.isMounted ? looker_.Look(relativePath, status) : absent_;
         const KnownFile *known = KnownOf(range, look);
         const FileFigures figures = FileFiguresOf(look, volume);
         const auto state = FileStateOf(known, look, figures, volume);
         const std::string path = PathOf(relativePath);
+        if (state == FileState::Missing || state == FileState::Replaced) {
+            const auto now = renamed_.find(*known->inode);
+            if (now != renamed_.end()) {
+                ListRenamed(path, *known->inode, now->second);
+                return;
+            }
+        }
         std::optional<uint64_t> inode;
         if (known != nullptr && known->inode) {
             inode = *known->inode;
@@ -137,6 +147,13 @@ private:
         }
     }
 
+    // With the figures of the file where it is now.
+    void ListRenamed(const std::string &path, uint32_t inode, const std::string &relativePath) {
+        const std::string pathNow = PathOf(relativePath);
+        const FileFigures figures = FileFiguresOf(looker_.Look(relativePath), world_.volume);
+        visit_({world_.volume.mountPath, path, inode, FileState::Renamed, &pathNow, figures});
+    }
+
     // Root may look at everything; for others a "cannot be read" may be a lack of rights.
     void NoteWhatIsHidden(const std::string &path, const FileLook &look) {
         if (look.error == EACCES || look.error == EPERM) {
@@ -151,6 +168,7 @@ private:
     LookErrors &errors_;
     const Visit &visit_;
     FileLooker looker_;
+    RenamedFiles renamed_;
     FileLook absent_; // of every file where the volume is not there
 };
 
@@ -180,12 +198,13 @@ void ListElsewhere(const Target &target, LookErrors &errors, const Visit &visit,
     }
 }
 
-void ListTarget(const Target &target, World &world, const Visit &visit, ListResult *result) {
+void ListTarget(const Target &target, bool search, World &world, const Visit &visit,
+                ListResult *result) {
     if (target.volume == nullptr || target.isWithoutCache) {
         ListElsewhere(target, world.errors, visit, result);
         return;
     }
-    VolumeLister lister(*target.volume, world.errors, visit);
+    VolumeLister lister(*target.volume, search, world.errors, visit);
     const KnownFiles &known = target.volume->known;
     const auto below = KnownFilesBelow(known, target.relativePath);
     const bool isFolder = target.status && S_ISDIR(target.status->mode);
@@ -207,18 +226,19 @@ void ListTarget(const Target &target, World &world, const Visit &visit, ListResu
 }
 } // namespace
 
-ListResult ListLook(World &world, const std::vector<std::string> &paths, const Visit &visit) {
+ListResult ListLook(World &world, const std::vector<std::string> &paths, bool search,
+                    const Visit &visit) {
     ListResult result;
     if (paths.empty()) {
         for (const WorldVolume &volume : world.volumes) {
             if (!volume.known.files.empty()) {
-                VolumeLister(volume, world.errors, visit)
+                VolumeLister(volume, search, world.errors, visit)
                     .ListKnown({0, volume.known.files.size()}, nullptr);
             }
         }
     }
     for (const std::string &path : paths) {
-        ListTarget(TargetResolve(world, path), world, visit, &result);
+        ListTarget(TargetResolve(world, path), search, world, visit, &result);
     }
     return result;
 }
@@ -227,7 +247,8 @@ ExitStatus ListCommand(const Settings &settings, TextSink &out) {
     World world = WorldLook(settings.configPath);
     ListView view(out, settings.json, settings.color);
     const ListResult result =
-        ListLook(world, settings.paths, [&](const ListedFile &file) { view.Put(file); });
+        ListLook(world, settings.paths, settings.search,
+                 [&](const ListedFile &file) { view.Put(file); });
     view.End(result.folders, world.errors);
     const bool allFailed = !settings.paths.empty() && result.failedPaths == settings.paths.size();
     return ExitStatusOf(world.errors.isUnknown || allFailed,

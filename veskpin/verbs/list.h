@@ -56,7 +56,7 @@ struct ListResult {
 };
 
 // Looks at everything that is recorded or requested, or at the paths, and gives each file to
-// `visit`.
-ListResult ListLook(World &world, const std::vector<std::string> &paths,
+// `visit`. With `search` renamed files are looked for.
+ListResult ListLook(World &world, const std::vector<std::string> &paths, bool search,
                     const std::function<void(const ListedFile &)> &visit);
 } // namespace vesk

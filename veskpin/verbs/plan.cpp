@@ -137,6 +137,10 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
     }
     plan.isAllFailed = failed == targets.size();
     for (const auto &planner : planners) {
+        const Volume &volume = planner->World().volume;
+        if (volume.supportsPin.has_value() && !*volume.supportsPin) {
+            LookUnknownAdd(&world.errors, volume.mountPath, "its cache is not up or cannot pin");
+        }
         plan.volumes.push_back(planner->Total(reservePercent));
     }
     return plan;

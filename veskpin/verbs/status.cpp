@@ -179,7 +179,13 @@ StatusView StatusLook(World &world, const std::vector<std::string> &volumes) {
     StatusView view;
     view.configPath = world.configPath;
     view.volumes = WorldVolumesWanted(world, volumes);
-    view.services = ServicesLook(&world.errors);
+    std::set<std::string> held;
+    for (const WorldVolume &volume : world.volumes) {
+        if (volume.volume.held.value_or(false)) {
+            held.insert(volume.volume.mountPath);
+        }
+    }
+    view.services = ServicesLook(held, &world.errors);
     view.queue = QueueLook(&world.errors);
     view.isConfigKnown = world.isConfigKnown;
     view.storedRequests = IfKnown(world.storedRequests, world.isConfigKnown);
