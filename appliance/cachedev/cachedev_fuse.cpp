@@ -18,13 +18,34 @@ constexpr unsigned kIoctlFrom32Bit = 1U << 3;
 
 constexpr fuse_ino_t kRootInode = FUSE_ROOT_ID;
 constexpr fuse_ino_t kDeviceInode = 2;
-constexpr fuse_ino_t kStateInode = 3;
+constexpr fuse_ino_t kFirstStateInode = 3; // that of the first state file; the others follow
 
 constexpr double kNameTimeout = 60;     // seconds; the names never change
-constexpr double kAttributeTimeout = 0; // seconds; the state file changes its length
+constexpr double kAttributeTimeout = 0; // seconds; a state file may change its length
 
 ServedDevice &Served(fuse_req_t request) {
     return *static_cast<ServedDevice *>(fuse_req_userdata(request));
+}
+
+// The state file of an inode, or null.
+StateFile *StateFileOf(ServedDevice &served, fuse_ino_t inode) {
+    if (inode < kFirstStateInode || inode - kFirstStateInode >= served.stateFiles.size()) {
+        return nullptr;
+    }
+    return &served.stateFiles[static_cast<size_t>(inode - kFirstStateInode)];
+}
+
+// The inode of a name, or 0.
+fuse_ino_t InodeOf(const ServedDevice &served, const std::string &name) {
+    if (served.deviceName == name) {
+        return kDeviceInode;
+    }
+    for (size_t i = 0; i < served.stateFiles.size(); ++i) {
+        if (served.stateFiles[i].name == name) {
+            return kFirstStateInode + i;
+        }
+    }
+    return 0;
 }
 
 // Runs the body of a callback: it replies and returns 0, or does not reply and returns an errno,
@@ -50,10 +71,10 @@ struct stat StatusOf(ServedDevice &served, fuse_ino_t inode, const struct fuse_f
     if (inode == kDeviceInode) {
         status.st_mode = S_IFREG | 0600;
         bytes = served.device.images.deviceBytes;
-    } else if (inode == kStateInode) {
+    } else if (StateFile *file = StateFileOf(served, inode)) {
         status.st_mode = S_IFREG | 0444;
-        bytes = info != nullptr ? OpenStatesText(served.openStates, info->fh)->size()
-                                : OpenStatesBytes(served.openStates, served.device);
+        bytes = info != nullptr ? OpenStatesContent(file->openStates, info->fh)->size()
+                                : OpenStatesBytes(file->openStates, served.device);
     } else {
         status.st_mode = S_IFDIR | 0755;
     }
@@ -82,11 +103,8 @@ void LookUp(fuse_req_t request, fuse_ino_t, const char *name) {
     Guarded(request, [=] {
         ServedDevice &served = Served(request);
         struct fuse_entry_param entry = {};
-        if (served.deviceName == name) {
-            entry.ino = kDeviceInode;
-        } else if (served.stateName == name) {
-            entry.ino = kStateInode;
-        } else {
+        entry.ino = InodeOf(served, name);
+        if (entry.ino == 0) {
             return ENOENT;
         }
         entry.attr = StatusOf(served, entry.ino, nullptr);
@@ -132,10 +150,12 @@ void ReadFolder(fuse_req_t request, fuse_ino_t, size_t size, off_t offset,
             fuse_ino_t inode;
             mode_t type;
         };
-        const std::array<Entry, 4> entries = {{{".", kRootInode, S_IFDIR},
-                                               {"..", kRootInode, S_IFDIR},
-                                               {served.deviceName.c_str(), kDeviceInode, S_IFREG},
-                                               {served.stateName.c_str(), kStateInode, S_IFREG}}};
+        std::vector<Entry> entries = {{".", kRootInode, S_IFDIR},
+                                      {"..", kRootInode, S_IFDIR},
+                                      {served.deviceName.c_str(), kDeviceInode, S_IFREG}};
+        for (const StateFile &file : served.stateFiles) {
+            entries.push_back({file.name.c_str(), InodeOf(served, file.name), S_IFREG});
+        }
         std::vector<char> buffer(size);
         size_t used = 0;
         for (auto index = static_cast<size_t>(offset); index < entries.size(); ++index) {
@@ -162,36 +182,39 @@ void Open(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
         info->direct_io = 1; // every read of the device reaches the cache
         info->noflush = 1;   // nothing happens at close
         info->fh = 0;
-        if (inode == kStateInode) {
+        StateFile *file = StateFileOf(served, inode);
+        if (file != nullptr) {
             if ((info->flags & O_ACCMODE) != O_RDONLY) {
                 return EACCES;
             }
-            info->fh = OpenStatesOpen(served.openStates, served.device);
+            info->fh = OpenStatesOpen(file->openStates, served.device);
         }
         // Whoever gave up waiting never closes the file that it did not get.
-        if (fuse_reply_open(request, info) != 0) {
-            OpenStatesClose(served.openStates, info->fh);
+        if (fuse_reply_open(request, info) != 0 && file != nullptr) {
+            OpenStatesClose(file->openStates, info->fh);
         }
         return 0;
     });
 }
 
-void Release(fuse_req_t request, fuse_ino_t, struct fuse_file_info *info) {
-    OpenStatesClose(Served(request).openStates, info->fh);
+void Release(fuse_req_t request, fuse_ino_t inode, struct fuse_file_info *info) {
+    if (StateFile *file = StateFileOf(Served(request), inode)) {
+        OpenStatesClose(file->openStates, info->fh);
+    }
     fuse_reply_err(request, 0);
 }
 
-void ReadState(fuse_req_t request, size_t size, off_t offset, const std::string &text) {
+void ReadState(fuse_req_t request, size_t size, off_t offset, const std::string &content) {
     const size_t start =
-        static_cast<size_t>(std::min<uint64_t>(static_cast<uint64_t>(offset), text.size()));
-    fuse_reply_buf(request, text.data() + start, std::min(size, text.size() - start));
+        static_cast<size_t>(std::min<uint64_t>(static_cast<uint64_t>(offset), content.size()));
+    fuse_reply_buf(request, content.data() + start, std::min(size, content.size() - start));
 }
 
 void Read(fuse_req_t request, fuse_ino_t inode, size_t size, off_t offset,
           struct fuse_file_info *info) {
     Guarded(request, [=] {
-        if (inode == kStateInode) {
-            ReadState(request, size, offset, *OpenStatesText(Served(request).openStates, info->fh));
+        if (StateFile *file = StateFileOf(Served(request), inode)) {
+            ReadState(request, size, offset, *OpenStatesContent(file->openStates, info->fh));
             return 0;
         }
         const auto reply = [request](const ImagePieces &pieces) {

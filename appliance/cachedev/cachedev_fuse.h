@@ -1,7 +1,7 @@
 // The files that the cache device shows through FUSE, as callbacks of libfuse's low-level
 // interface.
 //
-// The tree is one folder with two files: the device and, read-only, its state. The low-level
+// The tree is one folder: the device and, read-only, the files that show its state. The low-level
 // interface is used because it lets a read answer while the cache slots that hold its data are
 // still reserved for it: no copy in between, and nobody overwrites them meanwhile. The callbacks
 // run in libfuse's threads, several at once; all they share is the cache device, which is
@@ -11,6 +11,7 @@
 #include "cachedev/cache_device.h"
 #include "cachedev/open_states.h"
 
+#include <array>
 #include <ctime>
 #include <functional>
 #include <string>
@@ -20,13 +21,18 @@
 #include <fuse_lowlevel.h>
 
 namespace vesk {
+// A read-only file beside the device; who opens it sees the state of that moment.
+struct StateFile {
+    std::string name; // file name
+    OpenStates openStates;
+};
+
 struct ServedDevice {
     CacheDevice &device;
-    std::string deviceName;        // file name of the device
-    std::string stateName;         // file name of the state
-    time_t startTime;              // what both files show as their times
+    std::string deviceName; // file name of the device
+    std::array<StateFile, 1> stateFiles;
+    time_t startTime;              // what all files show as their times
     std::function<void()> onReady; // called once, when requests are being served; must not throw
-    OpenStates openStates;
 };
 
 // The callbacks; to be registered with a ServedDevice as user data, which must outlive the session.

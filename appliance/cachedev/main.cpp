@@ -4,6 +4,7 @@
 #include "cachedev/cachedev_mount.h"
 #include "cachedev/cachedev_options.h"
 #include "cachedev/pid_file.h"
+#include "cachedev/state_json.h"
 
 #include <cstdio>
 #include <cstring>
@@ -50,10 +51,9 @@ int Run(int argc, char **argv) {
 
     ServedDevice served = {device,
                            options.deviceName,
-                           options.deviceName + ".json",
+                           {{{options.deviceName + ".json", {StateJsonOf}}}},
                            time(nullptr),
-                           [&background] { BackgroundReady(background); },
-                           {}};
+                           [&background] { BackgroundReady(background); }};
     const bool isServed = CachedevServe(served, options.folder);
     const int synced = CacheImagesSyncAll(device.images);
     if (synced != 0) {

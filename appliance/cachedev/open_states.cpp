@@ -1,30 +1,26 @@
 #include "cachedev/open_states.h"
 
-#include "cachedev/state_json.h"
-
-#include <unistd.h>
 #include <utility>
 
 namespace vesk {
 uint64_t OpenStatesOpen(OpenStates &states, CacheDevice &device) {
-    auto text =
-        std::make_shared<const std::string>(StateJsonText(CacheDeviceSnapshot(device), getpid()));
+    auto content = std::make_shared<const std::string>(states.make(device));
     const std::lock_guard<std::mutex> hold(states.mutex);
-    states.lastBytes = text->size();
+    states.lastBytes = content->size();
     const uint64_t handle = states.lastHandle + 1;
-    states.texts.emplace(handle, std::move(text));
+    states.contents.emplace(handle, std::move(content));
     states.lastHandle = handle;
     return handle;
 }
 
-StateText OpenStatesText(OpenStates &states, uint64_t handle) {
+StateContent OpenStatesContent(OpenStates &states, uint64_t handle) {
     const std::lock_guard<std::mutex> hold(states.mutex);
-    return states.texts.at(handle);
+    return states.contents.at(handle);
 }
 
 void OpenStatesClose(OpenStates &states, uint64_t handle) {
     const std::lock_guard<std::mutex> hold(states.mutex);
-    states.texts.erase(handle);
+    states.contents.erase(handle);
 }
 
 uint64_t OpenStatesBytes(OpenStates &states, CacheDevice &device) {
@@ -34,6 +30,6 @@ uint64_t OpenStatesBytes(OpenStates &states, CacheDevice &device) {
             return states.lastBytes;
         }
     }
-    return StateJsonText(CacheDeviceSnapshot(device), getpid()).size();
+    return states.make(device).size();
 }
 } // namespace vesk

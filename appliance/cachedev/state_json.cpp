@@ -3,6 +3,7 @@
 #include "bitmap/bit_runs.h"
 
 #include <json/json.h>
+#include <unistd.h>
 
 namespace vesk {
 namespace {
@@ -70,5 +71,9 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     Json::StreamWriterBuilder writer;
     writer["indentation"] = ""; // one line: some thousand slots are polled often
     return Json::writeString(writer, state) + "\n";
+}
+
+std::string StateJsonOf(CacheDevice &device) {
+    return StateJsonText(CacheDeviceSnapshot(device), getpid());
 }
 } // namespace vesk
