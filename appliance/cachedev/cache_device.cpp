@@ -19,6 +19,10 @@ BlockRun TouchedBlocks(const SectorRange &range) {
     const uint64_t last = (range.startSector + range.sectorCount - 1) / kBlockSectors;
     return {first, last - first + 1};
 }
+
+uint64_t RoundUpDivide(uint64_t value, uint64_t divisor) {
+    return value / divisor + (value % divisor != 0 ? 1 : 0);
+}
 } // namespace
 
 void CacheDeviceStart(CacheDevice &device) {
@@ -83,21 +87,31 @@ void CacheDeviceCountRequest(CacheDevice &device, uint64_t RequestCounters::*kin
 
 CacheSnapshot CacheDeviceSnapshot(CacheDevice &device) {
     CacheSnapshot snapshot = {};
-    snapshot.slotBlocks.reserve(
-        device.images.slots); // fixed: the lock need not cover the allocation
     const std::lock_guard<std::mutex> hold(device.stateMutex);
     snapshot.deviceBytes = device.images.deviceBytes;
     snapshot.bitmap = device.bitmap;
     snapshot.pinned = BlockCachePinnedRuns(device.cache);
     snapshot.pinnedBlocks = device.cache.pinnedBlocks.size();
+    snapshot.slots = device.images.slots;
     snapshot.cachedBlocks = device.cache.slotOfBlock.size();
-    for (const CacheSlot &slot : device.cache.slots) {
-        snapshot.slotBlocks.push_back(slot.block);
-    }
     snapshot.evictions = device.cache.evictions;
     snapshot.counters = device.counters;
     snapshot.requests = device.requests;
     snapshot.lastUnpin = device.lastUnpin;
     return snapshot;
+}
+
+std::string CacheDeviceCachedBits(CacheDevice &device) {
+    const uint64_t blocks = RoundUpDivide(device.images.deviceBytes, kBlockBytes);
+    // Made before the lock is taken, which then covers one pass over the slots and no more.
+    std::string bits(static_cast<size_t>(RoundUpDivide(blocks, 8)), '\0');
+    const std::lock_guard<std::mutex> hold(device.stateMutex);
+    for (const CacheSlot &slot : device.cache.slots) {
+        if (slot.block != kNoBlock) {
+            char &byte = bits[static_cast<size_t>(slot.block / 8)];
+            byte = static_cast<char>(byte | (1U << (slot.block % 8)));
+        }
+    }
+    return bits;
 }
 } // namespace vesk

@@ -24,6 +24,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <string>
 #include <vector>
 
 namespace vesk {
@@ -83,8 +84,8 @@ struct CacheSnapshot {
     SharedBitmap bitmap; // null: none set
     std::vector<BlockRun> pinned;
     uint64_t pinnedBlocks;
+    uint32_t slots;
     uint64_t cachedBlocks;
-    std::vector<uint64_t> slotBlocks; // per slot its block, kNoBlock for none
     uint64_t evictions;
     CacheCounters counters;
     RequestCounters requests;
@@ -132,4 +133,9 @@ void CacheDeviceCountRequest(CacheDevice &device, uint64_t RequestCounters::*kin
 
 // A consistent picture of the device; changes nothing.
 CacheSnapshot CacheDeviceSnapshot(CacheDevice &device);
+
+// The blocks that are cached at this moment as set bits, numbered as in the pin bitmap; changes
+// nothing. Longer than a pin bitmap where the device does not end with 8 whole blocks: every block
+// has its bit, and those behind the last one, up to a whole byte, are 0.
+std::string CacheDeviceCachedBits(CacheDevice &device);
 } // namespace vesk

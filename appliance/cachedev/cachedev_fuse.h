@@ -30,7 +30,7 @@ struct StateFile {
 struct ServedDevice {
     CacheDevice &device;
     std::string deviceName; // file name of the device
-    std::array<StateFile, 1> stateFiles;
+    std::array<StateFile, 2> stateFiles;
     time_t startTime;              // what all files show as their times
     std::function<void()> onReady; // called once, when requests are being served; must not throw
 };

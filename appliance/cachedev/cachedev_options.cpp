@@ -158,8 +158,9 @@ const char *CachedevUsage() {
     return R"(Usage: veskcachedev --device PATH --backing IMAGE --ssd IMAGE [OPTION]...
 
 Serves an emulated cache device: the file PATH, with a real block cache behind it, and its state
-as JSON in PATH.json. The folder of PATH becomes a FUSE mount point; it is created if missing and
-has to be empty. Goes to the background once the device can be used.
+as JSON in PATH.json and as one bit for each cached block in PATH.cached. The folder of PATH becomes
+a FUSE mount point; it is created if missing and has to be empty. Goes to the background once the
+device can be used.
 
   --device PATH            the device, for instance /run/vesk/cachedev_0
   --backing IMAGE          what the device holds: a file or block device, its size is the device's

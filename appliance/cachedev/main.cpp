@@ -51,7 +51,8 @@ int Run(int argc, char **argv) {
 
     ServedDevice served = {device,
                            options.deviceName,
-                           {{{options.deviceName + ".json", {StateJsonOf}}}},
+                           {{{options.deviceName + ".json", {StateJsonOf}},
+                             {options.deviceName + ".cached", {CacheDeviceCachedBits}}}},
                            time(nullptr),
                            [&background] { BackgroundReady(background); }};
     const bool isServed = CachedevServe(served, options.folder);

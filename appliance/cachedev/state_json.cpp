@@ -44,7 +44,7 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     state["pid"] = static_cast<Json::Int64>(pid);
     state["deviceBytes"] = Number(snapshot.deviceBytes);
     state["blockBytes"] = Number(kBlockBytes);
-    state["slots"] = Number(snapshot.slotBlocks.size());
+    state["slots"] = Number(snapshot.slots);
     state["bitmapSet"] = snapshot.bitmap != nullptr;
     state["bitmapBits"] =
         RunArray(snapshot.bitmap ? BitRunsOf(snapshot.bitmap->data(), snapshot.bitmap->size())
@@ -52,10 +52,6 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     state["pinned"] = RunArray(snapshot.pinned);
     state["pinnedBlocks"] = Number(snapshot.pinnedBlocks);
     state["cachedBlocks"] = Number(snapshot.cachedBlocks);
-    Json::Value &slotBlocks = state["slotBlocks"] = Json::Value(Json::arrayValue);
-    for (const uint64_t block : snapshot.slotBlocks) {
-        slotBlocks.append(block == kNoBlock ? Json::Value(-1) : Number(block));
-    }
     state["hits"] = Number(snapshot.counters.hits);
     state["misses"] = Number(snapshot.counters.misses);
     state["ssdReads"] = Number(snapshot.counters.ssdReads);
@@ -69,7 +65,7 @@ std::string StateJsonText(const CacheSnapshot &snapshot, pid_t pid) {
     }
 
     Json::StreamWriterBuilder writer;
-    writer["indentation"] = ""; // one line: some thousand slots are polled often
+    writer["indentation"] = ""; // one line: shell scripts look for members in it
     return Json::writeString(writer, state) + "\n";
 }
 

@@ -1,4 +1,4 @@
-// The state file of the cache device: a snapshot as JSON.
+// The state file PATH.json of the cache device: a snapshot as JSON.
 #pragma once
 
 #include "cachedev/cache_device.h"

@@ -4,13 +4,24 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <stdexcept>
 #include <unistd.h>
 
 namespace vesk {
+namespace {
+std::vector<uint64_t> BlocksOf(const std::vector<BlockRun> &runs) {
+    std::vector<uint64_t> blocks;
+    for (const BlockRun &run : runs) {
+        for (uint64_t i = 0; i < run.count; ++i) {
+            blocks.push_back(run.first + i);
+        }
+    }
+    return blocks;
+}
+} // namespace
+
 TestDevice::TestDevice(uint64_t deviceBytes, uint32_t slots)
     : backingPath(folder.Path("backing.img")), ssdPath(folder.Path("ssd.img")) {
     TestMakeFile(backingPath, 0); // for its mode
@@ -78,20 +89,12 @@ std::vector<uint8_t> TestBitmap(const CacheDevice &device, const std::vector<uin
 }
 
 std::vector<uint64_t> TestCached(CacheDevice &device) {
-    std::vector<uint64_t> blocks = CacheDeviceSnapshot(device).slotBlocks;
-    blocks.erase(std::remove(blocks.begin(), blocks.end(), kNoBlock), blocks.end());
-    std::sort(blocks.begin(), blocks.end());
-    return blocks;
+    const std::string bits = CacheDeviceCachedBits(device);
+    return BlocksOf(BitRunsOf(reinterpret_cast<const unsigned char *>(bits.data()), bits.size()));
 }
 
 std::vector<uint64_t> TestPinned(CacheDevice &device) {
-    std::vector<uint64_t> blocks;
-    for (const BlockRun &run : CacheDeviceSnapshot(device).pinned) {
-        for (uint64_t i = 0; i < run.count; ++i) {
-            blocks.push_back(run.first + i);
-        }
-    }
-    return blocks;
+    return BlocksOf(CacheDeviceSnapshot(device).pinned);
 }
 
 bool TestHasCallerMemory() {

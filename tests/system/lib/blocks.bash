@@ -51,7 +51,7 @@ expand_runs() {
 }
 driver_blocks() { expand_runs "$1" bitmapBits; }
 pinned_blocks() { expand_runs "$1" pinned; }
-cached_blocks() { jq '.slotBlocks[] | select(. >= 0)' "$(volume_state_file "$1")" | sort -n; }
+cached_blocks() { bits_of "$(volume_device "$1").cached"; }
 
 # is_subset LIST LIST
 is_subset() {
@@ -65,12 +65,10 @@ is_subset() {
 # common LIST LIST: what both hold.
 common() { comm -12 <(sort -u <<<"$1") <(sort -u <<<"$2"); }
 
-# Every cached block's slot on the SSD of volume N holds the bytes of the backing image.
+# The SSD of volume N holds, for every cached block, the bytes of the backing image.
 ssd_holds_the_data() { while_still "$1" compare_ssd "$1"; }
 compare_ssd() {
-    jq '.slotBlocks[]' "$(volume_state_file "$1")" |
-        awk '$1 >= 0 { printf "%d %.0f 65536\n", (NR - 1) * 65536, $1 * 65536 }' |
-        "$HELPERS/system_compare" "/tmp/volume$1/ssd" "/tmp/volume$1/backing"
+    cached_blocks "$1" | "$HELPERS/system_slots" "/tmp/volume$1/ssd" "/tmp/volume$1/backing"
 }
 
 # The written extents of FILE lie on the device of volume N where the file system says they do.

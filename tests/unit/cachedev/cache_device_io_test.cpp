@@ -53,15 +53,15 @@ int StatusOfProcess(const std::function<void()> &body) {
 void ExpectSlotsAgree(TestDevice &test) {
     const std::string backing = ReadWhole(test.backingPath);
     const std::string ssd = ReadWhole(test.ssdPath);
-    const Blocks slots = CacheDeviceSnapshot(test.device).slotBlocks;
+    const std::vector<CacheSlot> &slots = test.device.cache.slots;
     for (size_t slot = 0; slot < slots.size(); ++slot) {
-        if (slots[slot] == kNoBlock) {
+        if (slots[slot].block == kNoBlock) {
             continue;
         }
-        const auto start = static_cast<size_t>(slots[slot] * kBlockBytes);
+        const auto start = static_cast<size_t>(slots[slot].block * kBlockBytes);
         const std::string block = backing.substr(start, kBlockBytes);
         EXPECT_EQ(ssd.compare(static_cast<size_t>(slot * kBlockBytes), block.size(), block), 0)
-            << "block " << slots[slot] << " in slot " << slot;
+            << "block " << slots[slot].block << " in slot " << slot;
     }
 }
 } // namespace
@@ -262,6 +262,7 @@ TEST(CacheDeviceDelayTest, OnlyMissesAreDelayedAndNobodyElseWaits) {
                       EXPECT_EQ(Write(test.device, 7 * kBlockBytes, "x"), 1);
                       CacheDeviceSetBitmap(test.device, {1});
                       CacheDeviceSnapshot(test.device);
+                      CacheDeviceCachedBits(test.device);
                   }
                   EndProcess();
               }),

@@ -34,6 +34,17 @@ TEST(OpenStatesTest, AClosedFileIsGoneButNotUnderAReader) {
     EXPECT_NE(OpenStatesOpen(states, test.device), handle); // never used again
 }
 
+TEST(OpenStatesTest, EachFileShowsItsOwn) {
+    TestDevice test(16 * kBlockBytes + 512, 2);
+    OpenStates states{CacheDeviceCachedBits};
+    const uint64_t before = OpenStatesOpen(states, test.device);
+    TestTouch(test.device, {9, 16});
+    const uint64_t after = OpenStatesOpen(states, test.device);
+    EXPECT_EQ(*OpenStatesContent(states, before), std::string("\0\0\0", 3));
+    EXPECT_EQ(*OpenStatesContent(states, after), std::string("\x00\x02\x01", 3));
+    EXPECT_EQ(OpenStatesBytes(states, test.device), 3U);
+}
+
 TEST(OpenStatesTest, ShowsALengthWithoutMakingTheContentEachTime) {
     TestDevice test(4 * kBlockBytes, 2);
     OpenStates states{StateJsonOf};

@@ -15,6 +15,7 @@ namespace vesk {
 constexpr const char *kDaemonFolder = "/run/vesk";
 constexpr const char *kDaemonDevice = "/run/vesk/cachedev_0";
 constexpr const char *kDaemonState = "/run/vesk/cachedev_0.json";
+constexpr const char *kDaemonCached = "/run/vesk/cachedev_0.cached";
 constexpr const char *kDaemonBacking = "/run/backing.img";
 constexpr const char *kDaemonSsd = "/run/ssd.img";
 
