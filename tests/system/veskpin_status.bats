@@ -136,7 +136,7 @@ worker_is_told_ended() {
     cd /run
     (
         close_descriptors
-        exec "$BIN/veskcachepinfiletool" --start --config=pin/config.json
+        exec "$BIN/veskcachepinfiletool" --start-serv --config=pin/config.json
     ) >/dev/null 2>&1 &
     SERVICE_PID=$!
     wait_until service_is_ready
