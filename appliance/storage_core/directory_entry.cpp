@@ -83,11 +83,11 @@ private:
     std::string names_; // each with its NUL
 };
 
-// Looks for the file in the folder, or only in what is remembered of it.
-bool SearchFolder(int folder, bool remembered, InodeSearch &search) {
+// Looks for the file in the folder, or only in what is remembered of it; `status` becomes the
+// folder's.
+bool SearchFolder(int folder, bool remembered, struct stat &status, InodeSearch &search) {
     static std::mutex lock; // guards lastScan
     static auto *lastScan = new FolderScan;
-    struct stat status = {};
     if (fstat(folder, &status) != 0) {
         return false;
     }
@@ -98,13 +98,13 @@ bool SearchFolder(int folder, bool remembered, InodeSearch &search) {
     return lastScan->IsOf(status) && lastScan->Search(search);
 }
 
-ScopedFd OpenFound(int folder, const InodeSearch &search) {
+ScopedFd OpenFound(int folder, dev_t device, const InodeSearch &search) {
     // The entry may have become a FIFO or a terminal meanwhile: opening neither waits nor takes it
     // over, and what was opened is checked.
     ScopedFd file = FileOpenInFolder(folder, search.name);
     struct stat status = {};
     if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
-        status.st_ino != search.candidate) {
+        status.st_ino != search.candidate || status.st_dev != device) {
         return ScopedFd();
     }
     return file;
@@ -137,8 +137,9 @@ ScopedFd DirectoryOpenFile(int folder, uint64_t inode) {
     for (const bool remembered : {true, false}) {
         InodeSearch search;
         search.wanted = inode;
-        if (SearchFolder(folder, remembered, search)) {
-            ScopedFd file = OpenFound(folder, search);
+        struct stat status = {};
+        if (SearchFolder(folder, remembered, status, search)) {
+            ScopedFd file = OpenFound(folder, status.st_dev, search);
             if (file.IsOpen()) {
                 return file;
             }

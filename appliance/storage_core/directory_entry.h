@@ -28,6 +28,7 @@ void InodeSearchOffer(InodeSearch &search, uint64_t inode, const char *name);
 bool InodeSearchFound(const InodeSearch &search);
 
 // Opens the regular file with this inode number (or these low 32 bits of it) in an open directory,
-// for reading, without following a symbolic link. Not open: no such file, or a failure.
+// for reading, without following a symbolic link; it is on the directory's filesystem. Not open: no
+// such file, or a failure.
 ScopedFd DirectoryOpenFile(int directory, uint64_t inode);
 } // namespace vesk

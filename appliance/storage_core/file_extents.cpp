@@ -1,13 +1,7 @@
 #include "storage_core/file_extents.h"
 
-#include "base/malloc_text.h"
-
 #include <linux/fs.h>
 #include <sys/ioctl.h>
-
-#include <cstdlib>
-#include <memory>
-#include <new>
 
 namespace vesk {
 namespace {
@@ -23,8 +17,26 @@ bool Ask(int fd, uint64_t start, uint32_t extents, fiemap *answer) {
     answer->fm_length = FIEMAP_MAX_OFFSET - start;
     answer->fm_flags = FIEMAP_FLAG_SYNC;
     answer->fm_mapped_extents = 0;
+    answer->fm_reserved = 0;
     answer->fm_extent_count = extents; // 0: they are only counted
     return ioctl(fd, FS_IOC_FIEMAP, answer) == 0;
+}
+
+const fiemap_extent &LastOf(const fiemap &answer) {
+    return answer.fm_extents[answer.fm_mapped_extents - 1];
+}
+
+bool IsLast(const fiemap &answer) {
+    return (LastOf(answer).fe_flags & FIEMAP_EXTENT_LAST) != 0;
+}
+
+// Room for all extents of a file that has many: growing would take three times the memory while a
+// table of hundreds of thousands is copied.
+void Reserve(int fd, std::vector<FileMappingEntry> &entries) {
+    fiemap count = {};
+    if (Ask(fd, 0, 0, &count)) {
+        entries.reserve(entries.size() + count.fm_mapped_extents);
+    }
 }
 } // namespace
 
@@ -41,22 +53,19 @@ bool FileExtentConvert(const fiemap_extent &extent, FileMappingEntry &entry) {
 }
 
 bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
-    const std::unique_ptr<fiemap, FreeDeleter> batch(static_cast<fiemap *>(
-        std::calloc(1, sizeof(fiemap) + kBatchExtents * sizeof(fiemap_extent))));
-    if (batch == nullptr) {
-        throw std::bad_alloc();
-    }
-    // Growing would take three times the memory while a table of hundreds of thousands is copied.
-    if (Ask(fd, 0, 0, batch.get())) {
-        entries.reserve(entries.size() + batch->fm_mapped_extents);
-    }
+    // Not cleared: the kernel fills what it says it has filled.
+    alignas(fiemap) char buffer[sizeof(fiemap) + kBatchExtents * sizeof(fiemap_extent)];
+    auto *batch = reinterpret_cast<fiemap *>(buffer);
     uint64_t start = 0;
     while (true) {
-        if (!Ask(fd, start, kBatchExtents, batch.get())) {
+        if (!Ask(fd, start, kBatchExtents, batch)) {
             return false;
         }
         if (batch->fm_mapped_extents == 0) {
             return true;
+        }
+        if (start == 0 && !IsLast(*batch)) {
+            Reserve(fd, entries);
         }
         for (uint32_t i = 0; i < batch->fm_mapped_extents; ++i) {
             FileMappingEntry entry = {};
@@ -64,10 +73,10 @@ bool FileExtentsRead(int fd, std::vector<FileMappingEntry> &entries) {
                 entries.push_back(entry);
             }
         }
-        const fiemap_extent &last = batch->fm_extents[batch->fm_mapped_extents - 1];
-        if ((last.fe_flags & FIEMAP_EXTENT_LAST) != 0) {
+        if (IsLast(*batch)) {
             return true;
         }
+        const fiemap_extent &last = LastOf(*batch);
         // Extents that do not lead on would be asked for for ever.
         if (last.fe_logical + last.fe_length <= start) {
             return false;

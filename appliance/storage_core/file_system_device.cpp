@@ -25,20 +25,24 @@ public:
 
 private:
     const dev_t number_; // device number; files of this filesystem carry it
+    // The folder of the last question. Whoever asks for many files asks folder by folder, and an
+    // object for one request has one question.
+    std::string directory_;
+    ScopedFd folder_;
 };
 
 int FiemapDevice::GetMappingByInode(const std::string &directory, uint64_t inode,
                                     FileMappingTable &table) {
     table.entries.clear();
     try {
-        const ScopedFd folder = FolderOpenOnDevice(directory, number_);
-        const ScopedFd file = folder.IsOpen() ? DirectoryOpenFile(folder.Get(), inode) : ScopedFd();
-        struct stat status = {};
-        if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || status.st_dev != number_) {
-            return -1;
+        if (!folder_.IsOpen() || directory != directory_) {
+            folder_ = FolderOpenOnDevice(directory, number_);
+            directory_ = directory;
         }
+        const ScopedFd file =
+            folder_.IsOpen() ? DirectoryOpenFile(folder_.Get(), inode) : ScopedFd();
         std::vector<FileMappingEntry> entries;
-        if (!FileExtentsRead(file.Get(), entries)) {
+        if (!file.IsOpen() || !FileExtentsRead(file.Get(), entries)) {
             return -1;
         }
         table.entries.swap(entries);

@@ -3,7 +3,7 @@
 #include "base/log.h"
 #include "space/fault_injection.h"
 
-#include <cstring>
+#include <cstdio>
 #include <libgen.h>
 #include <memory>
 #include <unistd.h>
@@ -14,8 +14,8 @@ const int kLookupTries = 10;
 const uint32_t kFlagUninitialized = 1;
 
 std::string DirectoryOf(const std::string &filePath) {
-    char path[512 + 1] = {};
-    strncpy(path, filePath.c_str(), sizeof(path) - 1);
+    char path[512 + 1];
+    snprintf(path, sizeof(path), "%s", filePath.c_str());
     return dirname(path);
 }
 } // namespace

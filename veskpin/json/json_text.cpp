@@ -4,10 +4,18 @@
 
 #include <json/json.h>
 
+#include <algorithm>
 #include <memory>
 
 namespace vesk {
 namespace {
+// What most names are: quoted as it is.
+bool IsPlain(std::string_view text) {
+    return std::all_of(text.begin(), text.end(), [](char letter) {
+        return letter >= 0x20 && letter < 0x7F && letter != '"' && letter != '\\';
+    });
+}
+
 std::string Quoted(std::string_view text) {
     const std::string valid = Utf8IsValid(text) ? std::string(text) : Utf8Repaired(text);
     return Json::valueToQuotedString(valid.c_str());
@@ -60,7 +68,13 @@ void JsonWriter::EndArray() {
 
 void JsonWriter::Text(std::string_view name, std::string_view value) {
     Begin(name);
-    sink_.Put(Quoted(value));
+    if (!IsPlain(value)) {
+        sink_.Put(Quoted(value));
+        return;
+    }
+    sink_.Put("\"");
+    sink_.Put(value);
+    sink_.Put("\"");
 }
 
 void JsonWriter::Text(std::string_view name, const std::optional<std::string> &value) {
@@ -89,7 +103,7 @@ void JsonWriter::Null(std::string_view name) {
 
 void JsonWriter::Path(std::string_view name, const std::string &path) {
     Text(name, std::string_view(path));
-    if (!Utf8IsValid(path)) {
+    if (!IsPlain(path) && !Utf8IsValid(path)) {
         Text(std::string(name) + "Bytes", std::string_view(Base64Of(path)));
     }
 }
