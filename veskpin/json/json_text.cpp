@@ -18,7 +18,13 @@ bool IsPlain(std::string_view text) {
 
 std::string Quoted(std::string_view text) {
     const std::string valid = Utf8IsValid(text) ? std::string(text) : Utf8Repaired(text);
-    return Json::valueToQuotedString(valid.c_str());
+    std::string quoted = Json::valueToQuotedString(valid.c_str());
+    // The library's function takes a text up to its first NUL.
+    for (size_t nul = valid.find('\0'); nul != std::string::npos; nul = valid.find('\0', nul + 1)) {
+        quoted.pop_back();
+        quoted += "\\u0000" + Json::valueToQuotedString(valid.c_str() + nul + 1).substr(1);
+    }
+    return quoted;
 }
 
 bool ParseObject(const std::string &text, Json::Value *root) {
