@@ -12,14 +12,14 @@ public:
     explicit TextSink(int fd = -1) : fd_(fd) {}
 
     void Put(std::string_view text);
-    // What was put and is not written yet. False: the text could not be written whole, now or
-    // earlier; errno tells why at the first time.
+    // What was put and is not written yet. False with errno: the text could not be written whole,
+    // now or earlier.
     bool Flush();
     const std::string &Kept() const { return kept_; }
 
 private:
     int fd_;
-    bool failed_ = false;
+    int error_ = 0; // the errno of the write that failed
     std::string kept_;
 };
 } // namespace vesk
