@@ -10,7 +10,7 @@ std::string UnitsOfBytes(uint64_t bytes) {
     }
     double value = static_cast<double>(bytes) / 1024;
     size_t unit = 0;
-    // 1023.5 would be written with four digits.
+    // 1023.5 would be written as 1024.
     while (value >= 1023.5) {
         value /= 1024;
         ++unit;

@@ -6,7 +6,7 @@
 #include <string>
 
 namespace vesk {
-// "0 B", "1023 B", "1.0 KiB", "12 GiB": three digits at most, rounded.
+// "0 B", "1023 B", "1.0 KiB", "12 GiB", "1023 GiB": rounded, a fraction below ten only.
 std::string UnitsOfBytes(uint64_t bytes);
 
 // "12 s", "3 min 20 s", "2 h 5 min".
