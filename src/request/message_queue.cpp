@@ -126,6 +126,10 @@ MsgQueueCause MsgQueueLook(const char *keyFile, MsgQueueState *state) {
     } catch (const std::logic_error &) {
         return MsgQueueCause::NoKey;
     }
+    if (state->key == IPC_PRIVATE) { // asked for, it would be made
+        state->id = -1;
+        return MsgQueueCause::NoQueue;
+    }
     state->id = msgget(state->key, 0);
     msqid_ds status{};
     const bool isTrusted = state->id != -1 && QueueIsTrusted(state->id, &status);
