@@ -53,7 +53,7 @@ RecordedVolume VolumeOf(const std::string &mountPath, const Json::Value &value,
     for (auto file = files.begin(); file != files.end(); ++file) {
         RecordedFile record{};
         if (!ParseInode(file.name(), &record.inode) || !TextOf(*file, &record.relativePath) ||
-            record.relativePath.empty()) {
+            record.relativePath.empty() || record.relativePath.find('\0') != std::string::npos) {
             problems->push_back(place + "record \"" + file.name() + "\" names no file");
             continue;
         }
@@ -128,8 +128,8 @@ int ConfigReadRecords(const char *configPath, ConfigRecords *records) {
     }
     Problems *problems = &records->problems;
     AddVolumes(Member(root, "volumes", Json::objectValue, "", problems), records);
-    AddRequests(Member(root, "requestQueue", Json::arrayValue, "", problems),
-                Member(root, "requests", Json::objectValue, "", problems), records);
+    const Json::Value &queue = Member(root, "requestQueue", Json::arrayValue, "", problems);
+    AddRequests(queue, Member(root, "requests", Json::objectValue, "", problems), records);
     return 0;
 }
 } // namespace vesk
