@@ -18,6 +18,9 @@ namespace {
 // The names in an open folder, sorted. 0 or an errno, and then those before the failure.
 int NamesIn(int folder, std::vector<std::string> *names) {
     ScopedFd again(openat(folder, ".", kOpenForReading | O_DIRECTORY));
+    if (!again.IsOpen()) {
+        return errno;
+    }
     const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(again.Get()));
     if (stream == nullptr) {
         return errno;
@@ -45,6 +48,10 @@ WalkKind KindOf(const FileStat &status, dev_t device) {
 
 void PathWalk(const FileLooker &looker, const std::string &folder,
               const std::function<void(const WalkEntry &)> &visit) {
+    if (looker.Error() != 0) {
+        visit({folder, WalkKind::Unreadable, {}, looker.Error()});
+        return;
+    }
     std::vector<std::string> waiting{folder}; // the next one last
     while (!waiting.empty()) {
         const std::string here = std::move(waiting.back());
