@@ -17,9 +17,10 @@
 
 namespace vesk {
 namespace {
-const char kToolName[] = "veskcachepinfil"; // as much of it as the kernel keeps
+const char kToolName[] = "veskcachepinfil";  // as much of it as the kernel keeps
 const size_t kProcFileMax = size_t{4} << 20; // bytes
-const uint64_t kYoungSeconds = 2; // a process that has begun later may still be starting its threads
+const uint64_t kYoungSeconds =
+    2; // a process that has begun later may still be starting its threads
 
 struct Thread {
     pid_t id = 0;
@@ -95,34 +96,64 @@ std::vector<std::string> ArgumentsOf(const Thread &thread) {
     return arguments;
 }
 
-// Whether the argument is the option, also one cut short, as the tool takes it; "--" and five
-// letters are no other option's.
-bool IsOption(const std::string &argument, const std::string &option) {
+// Whether the argument is the option, also one cut short, as the tool takes it: not shorter than
+// `least`, up to which another option begins alike.
+bool IsOption(const std::string &argument, const std::string &option, const std::string &least) {
     const std::string name = argument.substr(0, argument.find('='));
-    return name.size() >= 7 && option.compare(0, name.size(), name) == 0;
+    return name.size() >= least.size() && option.compare(0, name.size(), name) == 0;
 }
 
-// The configuration that the arguments name, as it is written there.
-std::optional<std::string> ConfigArgument(const std::vector<std::string> &arguments) {
-    std::optional<std::string> config;
-    for (size_t i = 1; i < arguments.size(); ++i) {
-        if (!IsOption(arguments[i], "--config-path")) {
+// What a command line asks of the tool.
+struct Asked {
+    bool serves = false;
+    std::optional<std::string> config; // as it is written there
+};
+
+// A group of letters: the first that takes a value takes the rest, or else the next argument, of
+// which the result tells.
+bool ReadLetters(const std::string &letters, const std::string *next, Asked *asked) {
+    for (size_t at = 1; at < letters.size(); ++at) {
+        asked->serves = asked->serves || letters[at] == 'c';
+        if (strchr("abfgjw", letters[at]) == nullptr) {
             continue;
         }
-        const size_t equals = arguments[i].find('=');
-        if (equals != std::string::npos) {
-            config = arguments[i].substr(equals + 1);
-        } else if (i + 1 < arguments.size()) {
-            config = arguments[++i];
+        const bool takesNext = at + 1 == letters.size() && next != nullptr;
+        if (letters[at] == 'f' && (takesNext || at + 1 < letters.size())) {
+            asked->config = takesNext ? *next : letters.substr(at + 1);
+        }
+        return takesNext;
+    }
+    return false;
+}
+
+Asked AskedBy(const std::vector<std::string> &arguments) {
+    Asked asked;
+    for (size_t i = 1; i < arguments.size() && arguments[i] != "--"; ++i) {
+        const std::string &argument = arguments[i];
+        const std::string *next = i + 1 < arguments.size() ? &arguments[i + 1] : nullptr;
+        if (IsOption(argument, "--start-service", "--start-ser")) {
+            asked.serves = true;
+        } else if (IsOption(argument, "--config-path", "--co")) {
+            const size_t equals = argument.find('=');
+            if (equals != std::string::npos) {
+                asked.config = argument.substr(equals + 1);
+            } else if (next != nullptr) {
+                asked.config = *next;
+                ++i;
+            }
+        } else if (argument[0] == '-' && argument[1] != '-' &&
+                   ReadLetters(argument, next, &asked)) {
+            ++i;
         }
     }
-    return config;
+    return asked;
 }
 
 std::optional<std::string> LinkText(const std::string &path) {
     char text[4096];
     const ssize_t length = readlink(path.c_str(), text, sizeof(text));
-    return length < 0 ? std::nullopt : std::optional(std::string(text, static_cast<size_t>(length)));
+    return length < 0 ? std::nullopt
+                      : std::optional(std::string(text, static_cast<size_t>(length)));
 }
 
 std::optional<std::string> AbsoluteConfig(const Thread &thread, const std::string &config) {
@@ -197,10 +228,9 @@ bool IsYoung(const Thread &leader, const std::string &procFolder) {
 std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const Service &service,
                                      const std::set<std::string> &heldVolumes,
                                      const std::string &procFolder) {
-    const bool isThere =
-        std::any_of(threads.begin(), threads.end(), [](const Thread &thread) {
-            return thread.name == kWorkerThreadName && IsLiving(thread);
-        });
+    const bool isThere = std::any_of(threads.begin(), threads.end(), [](const Thread &thread) {
+        return thread.name == kWorkerThreadName && IsLiving(thread);
+    });
     if (!isThere) {
         return IsYoung(threads.front(), procFolder) ? std::nullopt
                                                     : std::optional(ThreadLook::Ended);
@@ -244,18 +274,14 @@ std::optional<Service> ServiceOf(pid_t pid, const std::set<std::string> &heldVol
     if (living == threads.end() || threads.front().id != pid) {
         return std::nullopt;
     }
-    const std::vector<std::string> arguments = ArgumentsOf(*living);
-    const bool serves =
-        std::any_of(arguments.begin(), arguments.end(), [](const std::string &argument) {
-            return IsOption(argument, "--start-service");
-        });
-    if (!serves) {
+    const Asked asked = AskedBy(ArgumentsOf(*living));
+    if (!asked.serves) {
         return std::nullopt;
     }
     Service service;
     service.pid = pid;
-    if (const auto config = ConfigArgument(arguments)) {
-        service.config = AbsoluteConfig(*living, *config);
+    if (asked.config) {
+        service.config = AbsoluteConfig(*living, *asked.config);
     }
     service.otherNamespaces = OtherNamespaces(*living, procFolder);
     service.receiver = ReceiverLook(threads.front());
