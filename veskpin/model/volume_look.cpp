@@ -16,6 +16,7 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <new>
 
 namespace vesk {
 namespace {
@@ -61,7 +62,14 @@ std::optional<uint64_t> SsdBlocks(const std::string &ssd) {
 void LookAtDriver(Volume *volume, LookErrors *errors) {
     SpaceCause cause = SpaceCause::Found;
     const bool supportsPin = SpaceHasCacheAndSupportPinByUUID(volume->uuid->c_str(), &cause) == 1;
-    volume->supportsPin = supportsPin;
+    const bool isNo = cause == SpaceCause::NoPinSupport || cause == SpaceCause::CacheNotUp ||
+                      cause == SpaceCause::NoCacheStatus;
+    if (supportsPin || isNo) {
+        volume->supportsPin = supportsPin;
+    } else {
+        LookUnknownAdd(errors, *volume->cacheDevice,
+                       LookLogTake("whether it can pin cannot be told"));
+    }
     uint64_t bytes = 0;
     if (DeviceGetSizeByte(volume->cacheDevice->c_str(), &bytes) == 0) {
         volume->deviceBytes = bytes;
@@ -83,6 +91,10 @@ void LookAtCache(Volume *volume, LookErrors *errors) {
         LookUnknownAdd(errors, volume->mountPath, LookLogTake("the list of caches cannot be read"));
     }
     if (!volume->ssd) {
+        if (cause == SpaceCause::Found || cause == SpaceCause::NoSsdPath) {
+            LookUnknownAdd(errors, volume->mountPath,
+                           "the list of caches names no SSD of its cache");
+        }
         return;
     }
     volume->cacheDevice = TextOf(MallocText(SpaceGetCachePath(volume->uuid->c_str())));
@@ -102,6 +114,9 @@ void LookAtCache(Volume *volume, LookErrors *errors) {
 // The bitmap file's bytes in a bitmap of the needed size. Without a file nothing is marked.
 void LookAtBitmap(Volume *volume, LookErrors *errors) {
     const MallocText path(BitmapGetPathByReferencePath(volume->mountPath.c_str()));
+    if (!path) {
+        throw std::bad_alloc();
+    }
     uint64_t fileBytes = 0;
     const bool isMissing = PathIsMissing(path.get(), LastLink::Itself) == 1;
     if (!isMissing && FileGetSizeByte(path.get(), &fileBytes, LastLink::Itself) == 0) {
@@ -159,6 +174,11 @@ Volume VolumeLook(const SpaceEntry &space, LookErrors *errors) {
     }
     LookLogTake("");
     return volume;
+}
+
+std::string VolumePath(const std::string &mountPath, const std::string &relativePath) {
+    const bool needsSlash = mountPath.empty() || mountPath.back() != '/';
+    return relativePath.empty() ? mountPath : mountPath + (needsSlash ? "/" : "") + relativePath;
 }
 
 std::string VolumeHoldNote(const std::string &uuid) {

@@ -36,6 +36,9 @@ struct Volume {
 // The mounted volume of this space.
 Volume VolumeLook(const SpaceEntry &space, LookErrors *errors);
 
+// The absolute path of what lies below a volume; the mount path itself for an empty one.
+std::string VolumePath(const std::string &mountPath, const std::string &relativePath);
+
 // A note that a changing veskpin leaves while it holds the volume (one file a volume).
 std::string VolumeHoldNote(const std::string &uuid);
 } // namespace vesk

@@ -41,8 +41,8 @@ std::set<std::string> PathsNamed(const ConfigRecords &records) {
 
 void AddVolume(World *world, Volume volume, ConfigRecords *records) {
     WorldVolume added;
-    added.known = KnownFilesOf(volume.mountPath, RecordsOf(records, volume.mountPath),
-                               records->requests);
+    added.known =
+        KnownFilesOf(volume.mountPath, RecordsOf(records, volume.mountPath), records->requests);
     for (const std::string &problem : added.known.problems) {
         LookErrorAdd(&world->errors, world->configPath, problem);
     }
@@ -64,6 +64,9 @@ World WorldLook(const std::string &configPath) {
         LookUnknownAdd(&world.errors, "", LookLogTake("the volumes cannot be listed"));
     }
     for (const SpaceEntry &space : spaces) {
+        if (space.referencePath.empty()) {
+            continue; // mounted nowhere
+        }
         Volume volume = VolumeLook(space, &world.errors);
         if (named.erase(volume.mountPath) == 0 && !volume.hasCache) {
             world.withoutCache.push_back(volume.mountPath);
