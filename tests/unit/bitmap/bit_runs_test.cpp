@@ -153,4 +153,34 @@ TEST(BitRunsTest, AStepTakesWholeStretchesOfBytes) {
     EXPECT_EQ(steps, 8);
     EXPECT_EQ(run.count, bytes.size() * 8);
 }
+
+TEST(BitCountTest, OnlySetBitsOfTheRunCountAndNonePastTheEnd) {
+    const Bytes bytes{0x81, 0xFF, 0x00, 0x10};
+    const auto count = [&](uint64_t first, uint64_t bits) {
+        return BitCountIn(bytes.data(), bytes.size(), {first, bits});
+    };
+    EXPECT_EQ(count(0, 32), 11U);
+    EXPECT_EQ(count(0, 1), 1U);
+    EXPECT_EQ(count(0, 0), 0U);
+    EXPECT_EQ(count(1, 6), 0U);
+    EXPECT_EQ(count(7, 2), 2U);
+    EXPECT_EQ(count(28, UINT64_MAX), 1U);
+    EXPECT_EQ(count(29, UINT64_MAX), 0U);
+    EXPECT_EQ(count(32, 1), 0U);
+    EXPECT_EQ(count(UINT64_MAX, UINT64_MAX), 0U);
+    EXPECT_EQ(BitCountIn(nullptr, 0, {0, 5}), 0U);
+}
+
+TEST(BitCountTest, AgreesWithCountingBitByBit) {
+    std::mt19937 random(11); // NOLINT(cert-msc32-c,cert-msc51-cpp): the same bytes each time
+    for (int round = 0; round < 500; ++round) {
+        const Bytes bytes = RandomBytes(random, random() % 40, 5);
+        const BitRun run{random() % 340, random() % 340};
+        uint64_t expected = 0;
+        for (uint64_t bit = run.first; bit < run.first + run.count; ++bit) {
+            expected += NaiveIsSet(bytes, bit) ? 1 : 0;
+        }
+        ASSERT_EQ(BitCountIn(bytes.data(), bytes.size(), run), expected);
+    }
+}
 } // namespace vesk

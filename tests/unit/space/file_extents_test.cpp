@@ -6,6 +6,7 @@
 #include "tests/support/temp_dir.h"
 
 #include <gtest/gtest.h>
+#include <memory>
 
 namespace vesk {
 namespace {
@@ -253,5 +254,24 @@ TEST_F(FileExtentsFaultTest, SimulatedFailureIsLookedForAtEachTry) {
     EXPECT_EQ(log.Text(), "tool: Simulate /volume1/photo/a.jpg get mapping failed\n"
                           "tool: Get mapping result fail.\n");
     std::filesystem::remove("/tmp/veskcachepinfiletool.debug");
+}
+
+TEST_F(FileExtentsTest, AskingOnceWaitsForNothingAndLogsNothing) {
+    CapturedLog log(3);
+    AnswerWithExtents({0});
+    const std::unique_ptr<FileSystemDevice> device(CreateFileSystemDeviceByFilePath("/volume1"));
+    ASSERT_NE(device, nullptr);
+    EXPECT_EQ(FileExtentsAsk(*device, kFile, 4294967295U, &table), 0);
+    EXPECT_EQ(table.entries.size(), 0U);
+    EXPECT_EQ(askedDirectory, "/volume1/photo");
+    EXPECT_EQ(askedInode, 4294967295U);
+    EXPECT_EQ(events, Messages{"lookup"});
+    AnswerWithExtents({2});
+    EXPECT_EQ(FileExtentsAsk(*device, kFile, 4711, &table), 0);
+    EXPECT_EQ(table.entries.size(), 2U);
+    AnswerWith(-1, {});
+    EXPECT_EQ(FileExtentsAsk(*device, kFile, 4711, &table), -1);
+    EXPECT_EQ(FakeLibc::sleeps + FakeLibc::syncs, 0);
+    EXPECT_EQ(log.Messages(), Messages{});
 }
 } // namespace vesk

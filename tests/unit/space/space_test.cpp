@@ -211,4 +211,35 @@ TEST_F(SpaceTest, TakenTextHasAnOwnerAndAMissingOneAMessageAtTheCallersPlace) {
     EXPECT_EQ(owner, nullptr);
     EXPECT_EQ(log.Messages(), std::vector<std::string>{"Caller() [N] : ***** No text"});
 }
+
+TEST_F(SpaceTest, AllAreListedInThePlatformsOrder) {
+    FakeAppliance::spaces[1].uuid.clear();
+    FakeAppliance::spaces[2].referencePath.clear();
+    CapturedLog log;
+    SpaceCause cause = SpaceCause::NoSpace;
+    const std::vector<SpaceEntry> spaces = SpaceList(&cause);
+    EXPECT_EQ(cause, SpaceCause::Found);
+    std::vector<std::string> texts;
+    for (const SpaceEntry &space : spaces) {
+        texts.push_back(space.devicePath + " " + space.referencePath + " " + space.uuid);
+    }
+    EXPECT_EQ(texts, (std::vector<std::string>{"/dev/space1 /volume1 uuid-1",
+                                               "/dev/space10 /volume10 ", "/dev/space2  uuid-2"}));
+    EXPECT_EQ(FakeAppliance::enumScope, 1);
+    EXPECT_EQ(log.Text(), "");
+    FakeAppliance::spaces.clear();
+    EXPECT_EQ(SpaceList().size(), 0U);
+}
+
+TEST_F(SpaceTest, OfAListingThatFailsWhatWasListedIsGivenAllTheSame) {
+    FakeAppliance::enumResult = -1;
+    CapturedLog log(2);
+    SpaceCause cause = SpaceCause::Found;
+    EXPECT_EQ(SpaceList(&cause).size(), 3U);
+    EXPECT_EQ(cause, SpaceCause::CannotEnumerate);
+    EXPECT_EQ(log.Messages(),
+              std::vector<std::string>{"SpaceList() [N] : ***** Can't enum spaces"});
+    FakeAppliance::spaces.clear();
+    EXPECT_EQ(SpaceList().size(), 0U);
+}
 } // namespace vesk

@@ -1,0 +1,139 @@
+#include "model/world.h"
+
+#include "tests/unit/model/volume_fixture.h"
+
+namespace vesk {
+namespace {
+class WorldTest : public VolumeTest {
+protected:
+    World Look(const std::string &document) {
+        WriteWhole(config_, document);
+        return WorldLook(config_);
+    }
+    // The mount paths, the wanted ones' alike.
+    static Texts Paths(const World &world) {
+        Texts paths;
+        for (const WorldVolume &volume : world.volumes) {
+            paths.push_back(volume.volume.mountPath);
+        }
+        return paths;
+    }
+    static Texts Wanted(World &world, const Texts &asked) {
+        Texts paths;
+        for (const WorldVolume *volume : WorldVolumesWanted(world, asked)) {
+            paths.push_back(volume->volume.mountPath);
+        }
+        return paths;
+    }
+    const std::string config_ = folder_.Path("pins.json");
+};
+} // namespace
+
+TEST_F(WorldTest, AMissingConfigurationIsAnEmptyOne) {
+    World world = WorldLook(config_);
+    EXPECT_EQ(world.configPath, config_);
+    EXPECT_TRUE(world.isConfigKnown);
+    EXPECT_EQ(world.storedRequests, 0U);
+    EXPECT_EQ(Paths(world), Texts{mountPath_});
+    EXPECT_TRUE(world.volumes[0].volume.hasCache);
+    EXPECT_EQ(world.volumes[0].known.recorded, 0U);
+    EXPECT_EQ(TextsOf(world.errors), Texts{});
+}
+
+TEST_F(WorldTest, VolumesHaveTheirRecordsAndRequests) {
+    World world = Look(R"({"volumes": {")" + mountPath_ + R"(": {"files": {"5": "a", "6": "b"}}},
+        "requestQueue": ["3"], "requests": {"3": {"type": "pinFiles", "mountPath": ")" +
+                       mountPath_ + R"(", "data": "c#7"}}})");
+    ASSERT_EQ(world.volumes.size(), 1U);
+    EXPECT_EQ(world.storedRequests, 1U);
+    EXPECT_EQ(world.volumes[0].known.recorded, 2U);
+    EXPECT_EQ(world.volumes[0].known.requests, 1U);
+    EXPECT_EQ(world.volumes[0].known.files.size(), 3U);
+    EXPECT_TRUE(world.volumes[0].volume.isMounted);
+    EXPECT_EQ(TextsOf(world.errors), Texts{});
+}
+
+TEST_F(WorldTest, WhatIsNamedAndNotMountedIsThereToo) {
+    World world = Look(R"({"volumes": {"/volume9": {"files": {"5": "a"}}, "/volume8": {}},
+        "requestQueue": ["3"],
+        "requests": {"3": {"type": "reloadPinBlocks", "mountPath": "/a", "data": null}}})");
+    EXPECT_EQ(Paths(world), (Texts{"/a", mountPath_, "/volume8", "/volume9"}));
+    EXPECT_FALSE(world.volumes[0].volume.isMounted);
+    EXPECT_EQ(world.volumes[0].known.requests, 1U);
+    EXPECT_FALSE(world.volumes[3].volume.isMounted);
+    EXPECT_EQ(world.volumes[3].known.recorded, 1U);
+    EXPECT_TRUE(world.volumes[1].volume.isMounted);
+}
+
+TEST_F(WorldTest, AVolumeWithoutACacheIsThereOnlyWhereItIsNamed) {
+    FakeAppliance::spaces.push_back({"/dev/space2", "/plain", "uuid-2"});
+    FakeAppliance::spaces.push_back({"/dev/space3", "/named", "uuid-3"});
+    World world = Look(R"({"volumes": {"/named": {}}})");
+    EXPECT_EQ(Paths(world), (Texts{"/named", mountPath_}));
+    EXPECT_FALSE(world.volumes[0].volume.hasCache);
+    EXPECT_TRUE(world.volumes[0].volume.isMounted);
+    EXPECT_EQ(world.withoutCache, Texts{"/plain"});
+}
+
+TEST_F(WorldTest, ASpaceThatIsNotMountedIsLeftOut) {
+    FakeAppliance::spaces.push_back({"/dev/space2", "", "uuid-1"});
+    World world = WorldLook(config_);
+    EXPECT_EQ(Paths(world), Texts{mountPath_});
+    EXPECT_EQ(world.withoutCache, Texts{});
+}
+
+TEST_F(WorldTest, AConfigurationThatCannotBeReadLeavesTheVolumes) {
+    for (const char *text : {"{", "[]", ""}) {
+        World world = Look(text);
+        EXPECT_FALSE(world.isConfigKnown) << text;
+        EXPECT_EQ(Paths(world), Texts{mountPath_});
+        ASSERT_EQ(world.errors.list.size(), 1U);
+        EXPECT_EQ(world.errors.list[0].path, config_);
+        EXPECT_TRUE(world.errors.isUnknown);
+    }
+    EXPECT_EQ(Look("{").errors.list[0].text, "Prase file " + config_ + " error");
+    EXPECT_EQ(Look("[]").errors.list[0].text, "Config file (" + config_ + ") is no JSON object");
+}
+
+TEST_F(WorldTest, WhatCannotBeUsedOfTheConfigurationIsToldAndNothingUnknown) {
+    World world = Look(R"({"volumes": {")" + mountPath_ + R"(": {"files": {"x": "a"}}},
+        "requestQueue": ["3"], "requests": {"3": {"type": "pinFiles", "mountPath": ")" +
+                       mountPath_ + R"(", "data": "c"}}})");
+    EXPECT_EQ(TextsOf(world.errors),
+              (Texts{config_ + ": volume " + mountPath_ + ": record \"x\" names no file",
+                     config_ + ": request 3: Parse file inode from string (c) failed"}));
+}
+
+TEST_F(WorldTest, SpacesThatCannotBeListedAreToldAndThoseThatWereListedUsed) {
+    FakeAppliance::enumResult = -1;
+    World world = WorldLook(config_);
+    EXPECT_EQ(TextsOf(world.errors), (Texts{": Can't enum spaces", "unknown"}));
+    EXPECT_EQ(Paths(world), Texts{mountPath_});
+}
+
+TEST_F(WorldTest, AllVolumesAreWantedWhereNoneIsNamed) {
+    World world = Look(R"({"volumes": {"/volume9": {}}})");
+    EXPECT_EQ(Wanted(world, {}), (Texts{mountPath_, "/volume9"}));
+    EXPECT_EQ(Wanted(world, {"/volume9"}), Texts{"/volume9"});
+    EXPECT_EQ(Wanted(world, {"/volume9/", mountPath_ + "//", "/volume9"}),
+              (Texts{"/volume9", mountPath_}));
+    EXPECT_EQ(TextsOf(world.errors), Texts{});
+}
+
+TEST_F(WorldTest, WhatIsNoVolumeOrHasNoCacheIsToldAndUnknown) {
+    FakeAppliance::spaces.push_back({"/dev/space2", "/plain", "uuid-2"});
+    FakeAppliance::spaces.push_back({"/dev/space3", "/named", "uuid-3"});
+    World world = Look(R"({"volumes": {"/named": {}}})");
+    EXPECT_EQ(Wanted(world, {"/plain/", "/gone", "/", "/named", mountPath_}),
+              (Texts{"/named", mountPath_}));
+    EXPECT_EQ(TextsOf(world.errors), (Texts{"/plain: has no cache", "/gone: is no volume",
+                                            "/: is no volume", "/named: has no cache", "unknown"}));
+}
+
+TEST_F(WorldTest, AVolumeIsFoundByItsMountPathAlone) {
+    const World world = WorldLook(config_);
+    EXPECT_EQ(WorldVolumeFind(world, mountPath_), &world.volumes[0]);
+    EXPECT_EQ(WorldVolumeFind(world, mountPath_ + "/"), nullptr);
+    EXPECT_EQ(WorldVolumeFind(world, ""), nullptr);
+}
+} // namespace vesk
