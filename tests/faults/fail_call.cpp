@@ -2,7 +2,7 @@
 //
 // VESK_FAIL_CALL names the kind, VESK_FAIL_NUMBER the call counted from 1, VESK_FAIL_ERRNO the
 // error; 0 halves the length of a read or write instead. Counting begins when main looks at its
-// options, and covers the program and its libraries, but not what the C library calls inside
+// options (the companion: at the variable that stands for one), and covers the program and its libraries, but not what the C library calls inside
 // itself. When the call is reached, a byte goes to descriptor 9. At the program's orderly end the
 // number of allocations that are not freed follows there as " N".
 #include "tests/faults/real_call.h"
@@ -13,6 +13,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <dirent.h>
 #include <fcntl.h>
 #include <getopt.h>
 #include <pthread.h>
@@ -96,6 +97,16 @@ int getopt_long(int argc, char *const *argv, const char *shortOptions, const opt
         Arm();
     }
     return real(argc, argv, shortOptions, longOptions, index);
+}
+
+char *getenv(const char *name) noexcept {
+    static const auto real = REAL(getenv);
+    static bool begun = false;
+    if (!begun && strcmp(name, "VESKPIN_CONFIG") == 0) {
+        begun = true;
+        Arm();
+    }
+    return real(name);
 }
 
 void *malloc(size_t size) {
@@ -187,6 +198,35 @@ int ioctl(int fd, unsigned long request, ...) noexcept {
     void *argument = va_arg(arguments, void *);
     va_end(arguments);
     return FailsNow("ioctl") ? -1 : real(fd, request, argument);
+}
+// Looks at folders and links.
+int statx(int folder, const char *path, int flags, unsigned mask, struct statx *status) noexcept {
+    static const auto real = REAL(statx);
+    return FailsNow("look") ? -1 : real(folder, path, flags, mask, status);
+}
+int lstat64(const char *path, struct stat64 *status) noexcept {
+    static const auto real = REAL(lstat64);
+    return FailsNow("look") ? -1 : real(path, status);
+}
+int access(const char *path, int mode) noexcept {
+    static const auto real = REAL(access);
+    return FailsNow("look") ? -1 : real(path, mode);
+}
+ssize_t readlink(const char *path, char *text, size_t size) noexcept {
+    static const auto real = REAL(readlink);
+    return FailsNow("look") ? -1 : real(path, text, size);
+}
+DIR *opendir(const char *path) {
+    static const auto real = REAL(opendir);
+    return FailsNow("look") ? nullptr : real(path);
+}
+DIR *fdopendir(int fd) {
+    static const auto real = REAL(fdopendir);
+    return FailsNow("look") ? nullptr : real(fd);
+}
+struct dirent64 *readdir64(DIR *folder) {
+    static const auto real = REAL(readdir64);
+    return FailsNow("look") ? nullptr : real(folder);
 }
 key_t ftok(const char *path, int project) noexcept {
     static const auto real = REAL(ftok);

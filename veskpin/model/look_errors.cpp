@@ -23,7 +23,10 @@ void LookErrorAdd(LookErrors *errors, const std::string &path, const std::string
     const auto isSame = [&](const LookError &error) {
         return error.path == path && error.text == text;
     };
-    if (std::none_of(errors->list.begin(), errors->list.end(), isSame)) {
+    // What repeats itself does so soon; a hundred thousand files are not compared with each other.
+    const size_t near = std::min<size_t>(errors->list.size(), 64);
+    if (std::none_of(errors->list.rbegin(),
+                     errors->list.rbegin() + static_cast<std::ptrdiff_t>(near), isSame)) {
         errors->list.push_back({path, text});
     }
 }

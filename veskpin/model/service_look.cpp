@@ -34,30 +34,43 @@ bool IsLiving(const Thread &thread) {
     return thread.state != 'Z' && thread.state != 'X' && thread.state != 'x';
 }
 
-std::optional<std::string> ReadProc(const std::string &path) {
+// Processes and threads end while they are looked at: that is no error. Anything else is kept.
+void KeepError(int error, int *kept) {
+    if (error != 0 && error != ENOENT && error != ESRCH) {
+        *kept = error;
+    }
+}
+
+std::optional<std::string> ReadProc(const std::string &path, int *error = nullptr) {
     std::string text;
-    return FileReadAll(path, kProcFileMax, &text) == 0 ? std::optional(text) : std::nullopt;
+    const int failure = FileReadAll(path, kProcFileMax, &text);
+    if (error != nullptr) {
+        KeepError(failure, error);
+    }
+    return failure == 0 ? std::optional(text) : std::nullopt;
 }
 
 // The entries of a folder that are numbers, in ascending order.
-std::vector<pid_t> NumbersIn(const std::string &folder) {
+std::vector<pid_t> NumbersIn(const std::string &folder, int *error) {
     std::vector<pid_t> numbers;
+    errno = 0;
     const std::unique_ptr<DIR, Deleter<closedir>> stream(opendir(folder.c_str()));
     while (const dirent *entry = stream ? readdir(stream.get()) : nullptr) {
         if (entry->d_name[0] >= '1' && entry->d_name[0] <= '9') {
             numbers.push_back(static_cast<pid_t>(strtol(entry->d_name, nullptr, 10)));
         }
     }
+    KeepError(errno, error);
     std::sort(numbers.begin(), numbers.end());
     return numbers;
 }
 
 // "123 (name) S 1 ... starttime ...": the name is the thread's own choice and may hold anything.
-std::optional<Thread> ThreadOf(const std::string &process, pid_t id) {
+std::optional<Thread> ThreadOf(const std::string &process, pid_t id, int *error) {
     Thread thread;
     thread.id = id;
     thread.folder = process + "/task/" + std::to_string(id);
-    const auto text = ReadProc(thread.folder + "/stat");
+    const auto text = ReadProc(thread.folder + "/stat", error);
     const size_t open = text ? text->find('(') : std::string::npos;
     const size_t close = text ? text->rfind(')') : std::string::npos;
     if (open == std::string::npos || close == std::string::npos || close + 2 >= text->size()) {
@@ -74,10 +87,10 @@ std::optional<Thread> ThreadOf(const std::string &process, pid_t id) {
     return thread;
 }
 
-std::vector<Thread> ThreadsOf(const std::string &process) {
+std::vector<Thread> ThreadsOf(const std::string &process, int *error) {
     std::vector<Thread> threads;
-    for (const pid_t id : NumbersIn(process + "/task")) {
-        if (const auto thread = ThreadOf(process, id)) {
+    for (const pid_t id : NumbersIn(process + "/task", error)) {
+        if (const auto thread = ThreadOf(process, id, error)) {
             threads.push_back(*thread);
         }
     }
@@ -85,9 +98,9 @@ std::vector<Thread> ThreadsOf(const std::string &process) {
 }
 
 // The arguments of a command line: each ends with a NUL.
-std::vector<std::string> ArgumentsOf(const Thread &thread) {
+std::vector<std::string> ArgumentsOf(const Thread &thread, int *error) {
     std::vector<std::string> arguments;
-    const std::string text = ReadProc(thread.folder + "/cmdline").value_or("");
+    const std::string text = ReadProc(thread.folder + "/cmdline", error).value_or("");
     for (size_t at = 0; at < text.size();) {
         const size_t end = std::min(text.find('\0', at), text.size());
         arguments.push_back(text.substr(at, end - at));
@@ -248,8 +261,8 @@ std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const S
 }
 
 // By the process's effective user. The owner of its folder is root's also where it hides itself.
-bool IsTrusted(const std::string &process) {
-    const std::string status = ReadProc(process + "/status").value_or("");
+bool IsTrusted(const std::string &process, int *error) {
+    const std::string status = ReadProc(process + "/status", error).value_or("");
     const std::string title = "\nUid:\t";
     const size_t found = status.find(title);
     if (found == std::string::npos) {
@@ -260,34 +273,47 @@ bool IsTrusted(const std::string &process) {
     return effective != std::string::npos && (user == 0 || user == geteuid());
 }
 
-// The service that this process is; nothing where it is none.
-std::optional<Service> ServiceOf(pid_t pid, const std::set<std::string> &heldVolumes,
-                                 const std::string &procFolder, LookErrors *errors) {
-    const std::string process = procFolder + "/" + std::to_string(pid);
-    const std::string name = ReadProc(process + "/comm").value_or("");
-    if (name != std::string(kToolName) + "\n" || !IsTrusted(process)) {
+// The process's threads and what one that lives was asked for, where it is a service of ours; nothing
+// where it is none. A process whose first thread has ended has a command line in the others only.
+struct ServiceProcess {
+    std::vector<Thread> threads; // the first one is the receiver
+    Thread living;
+    Asked asked;
+    int error = 0; // not every thread can be looked at
+};
+std::optional<ServiceProcess> ServiceProcessOf(pid_t pid, const std::string &process, int *error) {
+    const std::string name = ReadProc(process + "/comm", error).value_or("");
+    if (name != std::string(kToolName) + "\n" || !IsTrusted(process, error)) {
         return std::nullopt;
     }
-    // A process whose first thread has ended has a command line in the others only.
-    const std::vector<Thread> threads = ThreadsOf(process);
-    const auto living = std::find_if(threads.begin(), threads.end(), IsLiving);
-    if (living == threads.end() || threads.front().id != pid) {
+    ServiceProcess found;
+    found.threads = ThreadsOf(process, &found.error);
+    KeepError(found.error, error);
+    const auto living = std::find_if(found.threads.begin(), found.threads.end(), IsLiving);
+    if (living == found.threads.end() || found.threads.front().id != pid) {
         return std::nullopt;
     }
-    const Asked asked = AskedBy(ArgumentsOf(*living));
-    if (!asked.serves) {
-        return std::nullopt;
-    }
+    found.living = *living;
+    found.asked = AskedBy(ArgumentsOf(*living, error));
+    return found.asked.serves ? std::optional(found) : std::nullopt;
+}
+
+Service ServiceOf(pid_t pid, const ServiceProcess &process,
+                  const std::set<std::string> &heldVolumes, const std::string &procFolder,
+                  LookErrors *errors) {
     Service service;
     service.pid = pid;
-    if (asked.config) {
-        service.config = AbsoluteConfig(*living, *asked.config);
+    if (process.asked.config) {
+        service.config = AbsoluteConfig(process.living, *process.asked.config);
     }
-    service.otherNamespaces = OtherNamespaces(*living, procFolder);
-    service.receiver = ReceiverLook(threads.front());
-    service.worker = WorkerLook(threads, service, heldVolumes, procFolder);
-    if (!service.receiver || !service.otherNamespaces) {
-        LookUnknownAdd(errors, process, "no permission to see what the service's threads do");
+    service.otherNamespaces = OtherNamespaces(process.living, procFolder);
+    service.receiver = ReceiverLook(process.threads.front());
+    if (process.error == 0) {
+        service.worker = WorkerLook(process.threads, service, heldVolumes, procFolder);
+    }
+    if (!service.config || !service.receiver || !service.worker || !service.otherNamespaces) {
+        LookUnknownAdd(errors, procFolder + "/" + std::to_string(pid),
+                       "what the service and its threads do cannot be seen, or not yet");
     }
     return service;
 }
@@ -296,10 +322,16 @@ std::optional<Service> ServiceOf(pid_t pid, const std::set<std::string> &heldVol
 std::vector<Service> ServicesLook(const std::set<std::string> &heldVolumes, LookErrors *errors,
                                   const std::string &procFolder) {
     std::vector<Service> services;
-    for (const pid_t pid : NumbersIn(procFolder)) {
-        if (auto service = ServiceOf(pid, heldVolumes, procFolder, errors)) {
-            services.push_back(std::move(*service));
+    int error = 0;
+    for (const pid_t pid : NumbersIn(procFolder, &error)) {
+        const std::string folder = procFolder + "/" + std::to_string(pid);
+        if (const auto process = ServiceProcessOf(pid, folder, &error)) {
+            services.push_back(ServiceOf(pid, *process, heldVolumes, procFolder, errors));
         }
+    }
+    if (error != 0) {
+        LookUnknownAdd(errors, procFolder,
+                       std::string("not every process can be looked at: ") + strerror(error));
     }
     return services;
 }

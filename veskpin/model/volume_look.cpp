@@ -59,17 +59,25 @@ std::optional<uint64_t> SsdBlocks(const std::string &ssd) {
     return bytes >> kBitmapByteShift;
 }
 
-void LookAtDriver(Volume *volume, LookErrors *errors) {
+// A "no" is one only where nothing else could be meant by it: not a cache that is down, and not a
+// question that failed within the library.
+std::optional<bool> AskPinSupport(const Volume &volume, LookErrors *errors) {
     SpaceCause cause = SpaceCause::Found;
-    const bool supportsPin = SpaceHasCacheAndSupportPinByUUID(volume->uuid->c_str(), &cause) == 1;
-    const bool isNo = cause == SpaceCause::NoPinSupport || cause == SpaceCause::CacheNotUp ||
-                      cause == SpaceCause::NoCacheStatus;
-    if (supportsPin || isNo) {
-        volume->supportsPin = supportsPin;
-    } else {
-        LookUnknownAdd(errors, *volume->cacheDevice,
-                       LookLogTake("whether it can pin cannot be told"));
+    if (SpaceHasCacheAndSupportPinByUUID(volume.uuid->c_str(), &cause) == 1) {
+        return true;
     }
+    int answer = 0;
+    if (cause == SpaceCause::NoPinSupport &&
+        isAllBlocksUnpin(volume.cacheDevice->c_str(), &answer) < 0) {
+        LookLogTake("");
+        return false;
+    }
+    LookUnknownAdd(errors, *volume.cacheDevice, LookLogTake("the cache does not tell its state"));
+    return std::nullopt;
+}
+
+void LookAtDriver(Volume *volume, LookErrors *errors) {
+    volume->supportsPin = AskPinSupport(*volume, errors);
     uint64_t bytes = 0;
     if (DeviceGetSizeByte(volume->cacheDevice->c_str(), &bytes) == 0) {
         volume->deviceBytes = bytes;
@@ -77,7 +85,7 @@ void LookAtDriver(Volume *volume, LookErrors *errors) {
     } else {
         LookUnknownAdd(errors, *volume->cacheDevice, LookLogTake("no size"));
     }
-    if (supportsPin) {
+    if (volume->supportsPin.value_or(false)) {
         volume->driverHasBitmap = DriverAnswer(BitmapIsSet, volume, errors);
         volume->allUnpinned = DriverAnswer(isAllBlocksUnpin, volume, errors);
     }
@@ -121,6 +129,8 @@ void LookAtBitmap(Volume *volume, LookErrors *errors) {
     const bool isMissing = PathIsMissing(path.get(), LastLink::Itself) == 1;
     if (!isMissing && FileGetSizeByte(path.get(), &fileBytes, LastLink::Itself) == 0) {
         volume->bitmapBytes = fileBytes;
+    } else if (!isMissing) {
+        LookErrorAdd(errors, path.get(), LookLogTake("has no size"));
     }
     if (!volume->bitmapBytesNeeded) {
         return;
@@ -160,10 +170,9 @@ Volume VolumeLook(const SpaceEntry &space, LookErrors *errors) {
     if (space.uuid.empty()) {
         // A device's superblock is for root's eyes.
         volume.hasCache = access(space.devicePath.c_str(), R_OK) != 0 && errno == EACCES;
-        if (volume.hasCache) {
-            LookUnknownAdd(errors, volume.mountPath,
-                           "no permission to read the UUID from " + space.devicePath);
-        }
+        const std::string text = "its UUID cannot be read from " + space.devicePath;
+        volume.hasCache ? LookUnknownAdd(errors, volume.mountPath, text)
+                        : LookErrorAdd(errors, volume.mountPath, text);
         return volume;
     }
     volume.uuid = space.uuid;

@@ -68,7 +68,10 @@ World WorldLook(const std::string &configPath) {
             continue; // mounted nowhere
         }
         Volume volume = VolumeLook(space, &world.errors);
-        if (named.erase(volume.mountPath) == 0 && !volume.hasCache) {
+        const bool isNamed = named.erase(volume.mountPath) != 0;
+        // Whether it has one is not known without its UUID.
+        world.errors.isUnknown = world.errors.isUnknown || (isNamed && !volume.uuid);
+        if (!isNamed && !volume.hasCache) {
             world.withoutCache.push_back(volume.mountPath);
         } else {
             AddVolume(&world, std::move(volume), &records);
@@ -77,6 +80,7 @@ World WorldLook(const std::string &configPath) {
     for (const std::string &mountPath : named) {
         Volume volume;
         volume.mountPath = mountPath;
+        LookErrorAdd(&world.errors, mountPath, "is not mounted");
         AddVolume(&world, std::move(volume), &records);
     }
     std::sort(world.volumes.begin(), world.volumes.end(),

@@ -25,16 +25,17 @@ struct Sum {
 // The listing of one volume.
 class VolumeLister {
 public:
-    VolumeLister(const WorldVolume &world, bool search, LookErrors &errors, const Visit &visit)
-        : world_(world), errors_(errors), visit_(visit), looker_(world.volume.mountPath) {
+    VolumeLister(const WorldVolume &volume, bool search, World &world, const Visit &visit)
+        : world_(volume), errors_(world.errors), visit_(visit), isConfigKnown_(world.isConfigKnown),
+          looker_(volume.volume.mountPath) {
         if (search) {
-            renamed_ = RenamedFind(world, &errors);
+            renamed_ = RenamedFind(volume, &errors_);
         }
         absent_.error = looker_.Error() != 0 ? looker_.Error() : ENODEV;
-        if (!world.volume.isMounted) {
-            LookUnknownAdd(&errors_, world.volume.mountPath, "is not mounted");
+        if (!volume.volume.isMounted) {
+            LookUnknownAdd(&errors_, volume.volume.mountPath, "is not mounted");
         } else if (looker_.Error() != 0) {
-            LookUnknownAdd(&errors_, world.volume.mountPath, strerror(looker_.Error()));
+            LookUnknownAdd(&errors_, volume.volume.mountPath, strerror(looker_.Error()));
         }
     }
 
@@ -121,7 +122,8 @@ private:
         const FileLook &look = volume.isMounted ? looker_.Look(relativePath, status) : absent_;
         const KnownFile *known = KnownOf(range, look);
         const FileFigures figures = FileFiguresOf(look, volume);
-        const auto state = FileStateOf(known, look, figures, volume);
+        const auto state =
+            isConfigKnown_ ? FileStateOf(known, look, figures, volume) : std::nullopt;
         const std::string path = PathOf(relativePath);
         if (state == FileState::Missing || state == FileState::Replaced) {
             const auto now = renamed_.find(*known->inode);
@@ -156,17 +158,22 @@ private:
 
     // Root may look at everything; for others a "cannot be read" may be a lack of rights.
     void NoteWhatIsHidden(const std::string &path, const FileLook &look) {
-        if (look.error == EACCES || look.error == EPERM) {
-            LookUnknownAdd(&errors_, path, strerror(look.error));
-        } else if (look.error == 0 && !look.hasExtents && S_ISREG(look.status.mode) &&
-                   geteuid() != 0) {
-            LookUnknownAdd(&errors_, path, "its blocks cannot be looked at without more rights");
+        const bool isHidden = look.error == EACCES || look.error == EPERM;
+        const bool isMapped = look.error != 0 || look.hasExtents || !S_ISREG(look.status.mode);
+        if (isHidden || (!isMapped && geteuid() != 0)) {
+            LookUnknownAdd(&errors_, path, strerror(isHidden ? look.error : EACCES));
+        } else if (!isMapped) {
+            LookErrorAdd(&errors_, path, "its blocks cannot be looked at");
+        } else if (look.error != 0 && look.error != ENOENT && look.error != ENOTDIR &&
+                   look.error != ENODEV) {
+            LookErrorAdd(&errors_, path, strerror(look.error));
         }
     }
 
     const WorldVolume &world_;
     LookErrors &errors_;
     const Visit &visit_;
+    const bool isConfigKnown_; // without it no file can be said to be unpinned
     FileLooker looker_;
     RenamedFiles renamed_;
     FileLook absent_; // of every file where the volume is not there
@@ -204,10 +211,13 @@ void ListTarget(const Target &target, bool search, World &world, const Visit &vi
         ListElsewhere(target, world.errors, visit, result);
         return;
     }
-    VolumeLister lister(*target.volume, search, world.errors, visit);
+    VolumeLister lister(*target.volume, search, world, visit);
     const KnownFiles &known = target.volume->known;
     const auto below = KnownFilesBelow(known, target.relativePath);
     const bool isFolder = target.status && S_ISDIR(target.status->mode);
+    if (target.error != 0 && target.error != ENOENT && target.error != ENOTDIR) {
+        NoteFailedPath(target, strerror(target.error), world.errors, result);
+    }
     if (isFolder || (!target.status && below.first < below.second)) {
         Sum sum = lister.SumOf(target.path);
         lister.ListKnown(below, &sum);
@@ -232,7 +242,7 @@ ListResult ListLook(World &world, const std::vector<std::string> &paths, bool se
     if (paths.empty()) {
         for (const WorldVolume &volume : world.volumes) {
             if (!volume.known.files.empty()) {
-                VolumeLister(volume, search, world.errors, visit)
+                VolumeLister(volume, search, world, visit)
                     .ListKnown({0, volume.known.files.size()}, nullptr);
             }
         }

@@ -76,7 +76,7 @@ bool PlanSum::Add(const std::string &relativePath, const FileLook &look, bool is
         sectors += entry.numSectors;
     }
     for (const BitRun &run : look.blocks) {
-        figures_.blocks += BlockSetAdd(&planned_, run);
+        blocks_ += BlockSetAdd(&planned_, run);
     }
     if (isPinned) {
         return true;
@@ -101,8 +101,11 @@ void PlanSum::AddStored(const FileLook &look) {
 PlanFigures PlanSum::Total(unsigned reservePercent) const {
     const Volume &volume = world_.volume;
     PlanFigures figures = figures_;
-    figures.roundingBytes = static_cast<int64_t>(figures.blocks * kBlockBytes) -
-                            static_cast<int64_t>(cover_.Sectors() * kSectorBytes);
+    if (volume.deviceBytes) {
+        figures.blocks = blocks_;
+        figures.roundingBytes = static_cast<int64_t>(blocks_ * kBlockBytes) -
+                                static_cast<int64_t>(cover_.Sectors() * kSectorBytes);
+    }
     figures.ssdBlocks = volume.ssdBlocks;
     figures.seconds = world_.known.requests + figures.requests +
                       sentSectors_ * kSectorBytes / kReadBytesPerSecond;
@@ -111,19 +114,20 @@ PlanFigures PlanSum::Total(unsigned reservePercent) const {
     }
     // Marking ends at the bitmap's end, which is up to seven blocks before the device's.
     const BlockSet &marked = *volume.marked;
+    uint64_t blocksNew = 0;
     uint64_t storedNew = 0;
     for (size_t at = 0; at < marked.size(); ++at) {
         const auto newBits = planned_[at] & ~marked[at];
         const auto onlyStored = stored_[at] & ~marked[at] & ~planned_[at];
-        figures.blocksNew += static_cast<unsigned>(__builtin_popcount(newBits & 0xFF));
+        blocksNew += static_cast<unsigned>(__builtin_popcount(newBits & 0xFF));
         storedNew += static_cast<unsigned>(__builtin_popcount(onlyStored & 0xFF));
     }
+    figures.blocksNew = blocksNew;
     figures.marked = BlockSetCount(marked);
     if (volume.ssdBlocks) {
         const uint64_t reserve = (*volume.ssdBlocks * reservePercent + 99) / 100;
         figures.headroom = static_cast<int64_t>(*volume.ssdBlocks) -
-                           static_cast<int64_t>(*figures.marked + storedNew + figures.blocksNew +
-                                                reserve);
+                           static_cast<int64_t>(*figures.marked + storedNew + blocksNew + reserve);
         figures.fits = *figures.headroom >= 0;
     }
     return figures;

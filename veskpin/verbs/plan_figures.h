@@ -35,9 +35,9 @@ struct PlanFigures {
     uint64_t files = 0;
     uint64_t bytes = 0; // file sizes
     uint64_t extents = 0;
-    uint64_t blocks = 0;
-    uint64_t blocksNew = 0;
-    int64_t roundingBytes = 0;
+    std::optional<uint64_t> blocks; // absent where the cache device's size is not known
+    std::optional<uint64_t> blocksNew;
+    std::optional<int64_t> roundingBytes;
     std::optional<uint64_t> ssdBlocks;
     std::optional<uint64_t> marked;
     std::optional<int64_t> headroom; // blocks left on the SSD when all is pinned
@@ -67,6 +67,7 @@ private:
     std::unordered_set<uint32_t> inodes_;
     RequestFill fill_;
     PlanFigures figures_;
+    uint64_t blocks_ = 0;
     uint64_t sentSectors_ = 0; // of the files to be sent
 };
 } // namespace vesk

@@ -42,8 +42,7 @@ void PlanShowJson(const Plan &plan, const LookErrors &errors, TextSink &out) {
         json.Number("bytes", figures.bytes);
         json.Number("extents", figures.extents);
         json.Number("blocks", figures.blocks);
-        json.Number("blocksNew",
-                    figures.marked ? std::optional(figures.blocksNew) : std::nullopt);
+        json.Number("blocksNew", figures.blocksNew);
         json.Signed("roundingBytes", figures.roundingBytes);
         json.Number("ssdBlocks", figures.ssdBlocks);
         json.Number("blocksMarked", figures.marked);
@@ -71,8 +70,10 @@ void PlanShowTable(const Plan &plan, bool color, TextSink &out) {
         out.Put(Colored(TextEscaped(volume.mountPath), 1, color) + ": " +
                 UnitsOfThings(figures.files, "file") + ", " + UnitsOfBytes(figures.bytes) + " in " +
                 UnitsOfThings(figures.extents, "extent") + "\n");
-        out.Put("  cost    " + BlocksText(figures.blocks) +
-                (figures.marked ? ", " + std::to_string(figures.blocksNew) + " of them new" : "") +
+        out.Put("  cost    " +
+                (figures.blocks ? BlocksText(*figures.blocks) : std::string("unknown")) +
+                (figures.blocksNew ? ", " + std::to_string(*figures.blocksNew) + " of them new"
+                                   : "") +
                 "\n");
         out.Put("  room    " + RoomText(figures, color) + "\n");
         out.Put("  time    " + UnitsOfThings(figures.requests, "request") + ", about " +
