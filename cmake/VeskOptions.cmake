@@ -6,6 +6,7 @@ option(VESK_WERROR "Treat warnings as errors" OFF)
 set(VESK_SANITIZE "" CACHE STRING "Sanitizers to compile with, for instance address,undefined or thread")
 option(VESK_BENCH "Build the measurements of bench/" OFF)
 option(VESK_COVERAGE "Instrument for gcov" OFF)
+option(VESK_HARDENING "Let a mistake end the program instead of letting others use it" ON)
 
 if(NOT CMAKE_BUILD_TYPE AND NOT CMAKE_CONFIGURATION_TYPES)
   set(CMAKE_BUILD_TYPE RelWithDebInfo CACHE STRING "Build type" FORCE)
@@ -43,9 +44,14 @@ endif()
 target_link_options(vesk_options INTERFACE -Wl,--gc-sections -Wl,--enable-new-dtags -Wl,--as-needed)
 
 # What makes a mistake end the program instead of letting others use it: guarded stacks, tables of addresses that
-# nobody can write to. The sanitizers do the same better.
-if(NOT VESK_SANITIZE)
+# nobody can write to, and C and C++ library functions that look at the sizes they are given. The sanitizers do the
+# same better. Without optimising the C library has no sizes to look at, and says so in every file; what builds
+# packages may have asked for the same already, at a level of its own.
+if(VESK_HARDENING AND NOT VESK_SANITIZE)
   target_compile_options(vesk_options INTERFACE -fstack-protector-strong)
+  target_compile_options(vesk_options INTERFACE
+    $<$<NOT:$<CONFIG:Debug>>:-U_FORTIFY_SOURCE> $<$<NOT:$<CONFIG:Debug>>:-D_FORTIFY_SOURCE=2>)
+  target_compile_definitions(vesk_options INTERFACE _GLIBCXX_ASSERTIONS)
   target_link_options(vesk_options INTERFACE -Wl,-z,relro -Wl,-z,now)
 endif()
 

@@ -20,7 +20,8 @@ TEST_F(OptionsDeathTest, ShortOptionThatNothingHandlesAbortsAfterItsMessage) {
         SCOPED_TRACE(option);
         CapturedLog log;
         EXPECT_EXIT(Parse({option}), kAborted, "");
-        EXPECT_EQ(log.Text(), std::string("tool: Get unhandled option = ") + option[1] + "\n");
+        EXPECT_EQ(log.Text(),
+                  std::string("tool: Get unhandled option = ").append(option + 1).append("\n"));
     }
 }
 

@@ -28,6 +28,13 @@ std::string CheckFiles(const std::string &paths) {
     return log.Text();
 }
 
+// A list that begins with so many separators.
+std::string BehindSeparators(size_t count, const char *rest) {
+    std::string list(count, ';');
+    list += rest;
+    return list;
+}
+
 using CheckFilesExistTest = LeakCheckedTest;
 } // namespace
 
@@ -97,16 +104,16 @@ TEST_F(CheckFilesExistTest, BlanksBelongToThePath) {
 }
 
 TEST_F(CheckFilesExistTest, LooksAtTheFirst512CharactersOnly) {
-    EXPECT_EQ(CheckFiles(std::string(503, ';') + "/dev/null" + ";/no/such"), "");
-    EXPECT_EQ(CheckFiles(std::string(511, ';') + "/no/such"), ""); // cut to "/"
-    EXPECT_EQ(CheckFiles(std::string(504, ';') + "/no/such"),
+    EXPECT_EQ(CheckFiles(BehindSeparators(503, "/dev/null;/no/such")), "");
+    EXPECT_EQ(CheckFiles(BehindSeparators(511, "/no/such")), ""); // cut to "/"
+    EXPECT_EQ(CheckFiles(BehindSeparators(504, "/no/such")),
               "tool: File (path /no/such) doesn't exist\n");
-    EXPECT_EQ(CheckFiles(std::string(504, ';') + "/dev/null"),
+    EXPECT_EQ(CheckFiles(BehindSeparators(504, "/dev/null")),
               "tool: File (path /dev/nul) doesn't exist\n");
 }
 
 TEST_F(CheckFilesExistTest, NamesTheWholeListWhenNothingIsInItsFirst512Characters) {
-    const std::string list = std::string(512, ';') + "/dev";
+    const std::string list = BehindSeparators(512, "/dev");
     EXPECT_EQ(CheckFiles(list), "tool: No availiable files in the file paths (" + list + ")\n");
 }
 

@@ -65,10 +65,10 @@ TEST(CacheConfigRead, NoCaches) {
 
 TEST(CacheConfigRead, RefusesWhatIsNoJson) {
     ASSERT_TRUE(Reads(kOne));
-    for (const std::string &text :
-         {std::string(), std::string("\0", 1), std::string("\xff\xfe{"), std::string("{"),
-          std::string(R"({"caches":[)"), std::string(kOne) + "x", std::string("caches"),
-          std::string(kOne).substr(0, std::string(kOne).size() - 1)}) {
+    const std::string whole = kOne;
+    for (const std::string &text : {std::string(), std::string("\0", 1), std::string("\xff\xfe{"),
+                                    std::string("{"), std::string(R"({"caches":[)"), whole + "x",
+                                    std::string("caches"), whole.substr(0, whole.size() - 1)}) {
         EXPECT_FALSE(Reads(text)) << text;
     }
 }

@@ -172,7 +172,7 @@ TEST_F(MessageQueueSendTest, TextsThatFillTheirFieldsHaveNoNul) {
     EXPECT_EQ(SendRequest(queueId_, 1, longText.c_str(), longText.c_str(), kCaller), 0);
     const RawMessage message = TakeMessage(queueId_);
     EXPECT_EQ(message.type, 1);
-    EXPECT_EQ(message.text, std::string("\1\0\0\0", 4) + std::string(512 + 1024, 'x'));
+    EXPECT_EQ(message.text, std::string("\1\0\0\0", 4).append(512 + 1024, 'x'));
 }
 
 TEST_F(MessageQueueSendTest, AMountPathOf512CharactersIsSentWhole) {
