@@ -6,10 +6,8 @@ load lib
 setup_file() { make_volume 1 64M 16M ext4; }
 
 setup() {
-    fresh_volume
-    attacker_folder /volume1/users
-    random /volume1/users/a 64K
-    random /volume1/users/b 64K
+    rm -f /tmp/veskcachepinfiletool.debug
+    users_volume a b
 }
 
 @test "the control file, which anybody makes, fails the look-up of its one path, and no more" {
@@ -35,6 +33,19 @@ setup() {
     unpin 1 /volume1/users/a
     pin 1 /volume1/users/a
     config_has '.volumes["/volume1"].files | length == 2'
+}
+
+# Where a folder is not sticky, the kernel follows links in it as it does everywhere without fs.protected_symlinks.
+@test "where the kernel follows links of /tmp, one in the control file's place has root's files told in the log" {
+    echo secret >/run/secret
+    chmod 600 /run/secret
+    chmod 777 /tmp
+    attacker ln -s /run/secret /tmp/veskcachepinfiletool.debug
+    start_service --verbose
+    pin 1 /volume1/users/a
+    stop_service
+    chmod 1777 /tmp
+    grep secret "$SERVICE_LOG"
 }
 
 @test "a user neither reads nor replaces the document in a folder of root's" {

@@ -16,6 +16,17 @@ attacker() {
 # attacker_folder PATH: a folder of his own, as users of a volume have one.
 attacker_folder() { install -d -o "$ATTACKER" -g "$ATTACKER" -m 755 "$1"; }
 
+# users_volume FILE...: a fresh volume whose top folder is root's, and on it the folder "users", the attacker's, with
+# these files.
+users_volume() {
+    local file
+    fresh_volume
+    attacker_folder /volume1/users
+    for file in "$@"; do
+        random "/volume1/users/$file" 64K
+    done
+}
+
 # attacker_tool ARGUMENT...: the tool, run by him from where he can.
 attacker_tool() {
     attacker_programs

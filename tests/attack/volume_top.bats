@@ -6,9 +6,7 @@ load lib
 setup_file() { make_volume 1 64M 16M ext4; }
 
 setup() {
-    fresh_volume
-    attacker_folder /volume1/users
-    random /volume1/users/file 64K
+    users_volume file
     start_service
 }
 
@@ -67,4 +65,15 @@ BITMAP=/volume1/veskcachepinfile.bitmap
     tool --send-bitmap --mount-path /volume1
     reload 1
     same 256 "$(volume_state 1 pinnedBlocks)"
+}
+
+@test "the kernel lets nobody link another user's file into the bitmap's place, where it would be written to" {
+    [ "$(</proc/sys/fs/protected_hardlinks)" = 1 ] || skip "fs.protected_hardlinks is off"
+    echo precious >/volume1/precious
+    chmod 777 /volume1
+    refute attacker ln /volume1/precious "$BITMAP"
+    # What he could do without.
+    ln /volume1/precious "$BITMAP"
+    pin 1 /volume1/users/file
+    same 128 "$(stat -c %s /volume1/precious)"
 }
