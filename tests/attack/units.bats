@@ -148,6 +148,24 @@ device_is_dead() { ! head -c 1 "$1" >/dev/null 2>&1; }
     refute requests-check "$CONF"
 }
 
+@test "volumes are known by names that JSON writes with escapes, too" {
+    local volume=$'/tmp/vol\u00fcme "1"\\ \U1f600' written='/tmp/vol\u00fcme \"1\"\\ \ud83d\ude00' records
+    mkdir "$volume"
+    mount --move /volume1 "$volume"
+    put_config "{\"requests\":{\"0\":{\"mountPath\":\"$written\"}}}"
+    printf '%s\0' "$volume" | cmp - <(document-texts "$CONF" mountPath)
+    requests-check "$CONF"
+    mount --move "$volume" /volume1
+    refute requests-check "$CONF"
+    mount --move /volume1 "$volume"
+    records="{\"volumes\":{\"$written\":{\"files\":{\"12\":\"a\"}}}}"
+    put_config "$records"
+    echo '{"caches":[]}' >"$VESK_FLASHCACHE_CONFIG"
+    volume-mounted "$volume" "$CONF"
+    mount --move "$volume" /volume1
+    same "$records" "$(cat "$CONF.before$(tr / - <<<"$volume")")"
+}
+
 # watch_service: the watch's output in the background; systemctl tells of this service, and is written down.
 watch_service() {
     # shellcheck disable=SC2016
