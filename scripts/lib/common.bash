@@ -3,11 +3,11 @@
 TREE=$(dirname "$(dirname "$(dirname "$(readlink -f "${BASH_SOURCE[0]}")")")")
 
 # shellcheck disable=SC2034
-BUILD_PACKAGES="g++ cmake ninja-build pkg-config libjsoncpp-dev libmount-dev libblkid-dev libfuse3-dev"
+BUILD_PACKAGES="g++ cmake ninja-build pkg-config libjsoncpp-dev libmount-dev libblkid-dev libfuse3-dev libcli11-dev"
 # shellcheck disable=SC2034
 RUN_PACKAGES="util-linux mount fdisk e2fsprogs xfsprogs procps kmod"
 # shellcheck disable=SC2034
-TEST_PACKAGES="libgtest-dev bats jq python3-minimal btrfs-progs"
+TEST_PACKAGES="libgtest-dev bats jq python3-minimal python3-jsonschema btrfs-progs"
 
 die() {
     echo "$(basename "$0"): $*" >&2

@@ -2,7 +2,7 @@
 # and "what is installed" live in build-ARCH-apt. To be sourced after common.bash.
 
 FOREIGN_BUILD_PACKAGES="libc6-dev libstdc++6 libgcc-s1 libjsoncpp-dev libmount-dev libblkid-dev
-    libfuse3-dev libgtest-dev"
+    libfuse3-dev libcli11-dev libgtest-dev"
 
 # foreign_use ARCH: Debian's name of the architecture that everything below is about.
 foreign_use() {
