@@ -36,7 +36,7 @@ offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
     manual=$(mandoc -T ascii "$PACKAGING/man/veskpin.1" | col -b)
     page=$(cat "$TREE/docs/veskpin.md")
     for word in $COMMANDS; do
-        grep -qE "^ +$word( |\$)" <<<"$manual" || { echo "$word"; return 1; }
+        grep -qE "^[[:space:]]+$word([[:space:]]|\$)" <<<"$manual" || { echo "$word"; return 1; }
         grep -qE "^## .*$word" <<<"$page" || { echo "$word"; return 1; }
     done
     for word in $OPTIONS --help; do
@@ -51,8 +51,8 @@ offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
     for word in $(jq -r '."$defs".file.properties.state.enum[] | strings' "$TREE/docs/schemas/veskpin-list.schema.json") \
         $(jq -r '.properties.skipped.items.properties.reason.enum[]' "$TREE/docs/schemas/veskpin-plan.schema.json"); do
         grep -q "\"$word\"" "$TREE"/veskpin/verbs/{file_state,plan_reason}.cpp || { echo "$word"; return 1; }
-        grep -qE -e "^ +$word( |\$)" <<<"$manual" || { echo "$word"; return 1; }
-        grep -qF "| \`$word\`" "$TREE/docs/veskpin.md" || { echo "$word"; return 1; }
+        grep -qE "^[[:space:]]+$word([[:space:]]|\$)" <<<"$manual" || { echo "$word"; return 1; }
+        grep -qE "^\| (\`[a-z]+\`, )?\`$word\`" "$TREE/docs/veskpin.md" || { echo "$word"; return 1; }
     done
 }
 
