@@ -1,4 +1,15 @@
-# What the tests of the packages' documents share. To be sourced.
+# What the tests of the packages share. To be sourced.
+
+# alone COMMAND...: what it leaves running keeps nothing open for which bats waits.
+alone() {
+    (
+        for fd in /proc/"$BASHPID"/fd/*; do
+            fd=${fd##*/}
+            [ "$fd" -le 2 ] || [ "$fd" -eq 255 ] || eval "exec $fd>&-"
+        done
+        "$@" >/tmp/alone.log 2>&1
+    )
+}
 
 # Volumes whose names are commands, in every way in which a shell carries one out.
 # shellcheck disable=SC2016

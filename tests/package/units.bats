@@ -5,6 +5,8 @@ TREE=$BATS_TEST_DIRNAME/../..
 export BIN=/usr/bin
 # shellcheck source=../../scripts/lib/volume.bash
 . "$TREE/scripts/lib/volume.bash"
+# shellcheck source=lib.bash
+. "$BATS_TEST_DIRNAME/lib.bash"
 export VESK_FLASHCACHE_CONFIG=/etc/veskflashcache.json
 UNIT=veskcachepinfiletool.service
 WATCH=veskcachepinfiletool-watch.service
@@ -47,17 +49,6 @@ teardown() {
 teardown_file() {
     umount /volume1
     umount "$(dirname "$(volume_device 1)")"
-}
-
-# alone COMMAND...: what it leaves running keeps nothing open for which bats waits.
-alone() {
-    (
-        for fd in /proc/"$BASHPID"/fd/*; do
-            fd=${fd##*/}
-            [ "$fd" -le 2 ] || [ "$fd" -eq 255 ] || eval "exec $fd>&-"
-        done
-        "$@" >/tmp/alone.log 2>&1
-    )
 }
 
 await() { # SECONDS COMMAND...
