@@ -9,7 +9,7 @@ template <typename Visit> void ForEachPath(const WorldVolume &world, const Visit
     const std::string *last = nullptr;
     for (const KnownFile &file : world.known.files) {
         if (file.inode && (last == nullptr || *last != file.relativePath)) {
-            visit(world.volume.mountPath + "/" + file.relativePath);
+            visit(VolumePath(world.volume.mountPath, file.relativePath));
             last = &file.relativePath;
         }
     }

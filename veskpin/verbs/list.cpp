@@ -95,8 +95,7 @@ public:
 
 private:
     std::string PathOf(const std::string &relativePath) const {
-        const std::string &mountPath = world_.volume.mountPath;
-        return (mountPath == "/" ? "" : mountPath) + "/" + relativePath;
+        return VolumePath(world_.volume.mountPath, relativePath);
     }
 
     // What the configuration has of the file: the entry of this path with the inode that is there,

@@ -12,6 +12,7 @@
 #include <cerrno>
 #include <cstring>
 #include <memory>
+#include <utility>
 
 namespace vesk {
 namespace {
@@ -65,7 +66,7 @@ private:
     }
 
     void Skip(const std::string &relativePath, SkipReason reason) {
-        plan_.skipped.push_back({world_.volume.mountPath + "/" + relativePath, reason});
+        plan_.skipped.push_back({VolumePath(world_.volume.mountPath, relativePath), reason});
     }
 
     const WorldVolume &world_;
@@ -83,24 +84,38 @@ bool CanBePlanned(const Target &target) {
            target.volume->volume.isMounted;
 }
 
-// Without those that are, or lie below, another one.
+// With "/" at the end: in the order of these texts a folder's neighbours ("a-b") do not stand between
+// it and what lies below it.
+std::string FolderText(const std::string &path) {
+    return path == "/" ? path : path + "/";
+}
+
+// Without those that are, or lie below, another one of the same volume.
 std::vector<Target> ResolveOnce(const World &world, const std::vector<std::string> &paths) {
     std::vector<Target> targets;
     for (const std::string &path : paths) {
         targets.push_back(TargetResolve(world, path));
     }
-    std::stable_sort(targets.begin(), targets.end(),
-                     [](const Target &a, const Target &b) { return a.path < b.path; });
+    std::stable_sort(targets.begin(), targets.end(), [](const Target &a, const Target &b) {
+        return FolderText(a.path) < FolderText(b.path);
+    });
     std::vector<Target> once;
-    std::string folder; // the last one taken, with "/"
+    std::vector<std::pair<std::string, const WorldVolume *>> folders; // each within the one before
     for (Target &target : targets) {
-        const bool isBelow = !folder.empty() && target.path.compare(0, folder.size(), folder) == 0;
+        const std::string text = FolderText(target.path);
+        while (!folders.empty() && text.compare(0, folders.back().first.size(),
+                                                folders.back().first) != 0) {
+            folders.pop_back();
+        }
+        const bool isBelow =
+            std::any_of(folders.begin(), folders.end(),
+                        [&](const auto &folder) { return folder.second == target.volume; });
         const bool isSame = !once.empty() && once.back().path == target.path;
         if (isBelow || isSame) {
             continue;
         }
         if (target.status && S_ISDIR(target.status->mode)) {
-            folder = target.path + (target.path == "/" ? "" : "/");
+            folders.emplace_back(text, target.volume);
         }
         once.push_back(std::move(target));
     }
