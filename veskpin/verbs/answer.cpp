@@ -2,12 +2,20 @@
 
 #include "text/escape.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 
 namespace vesk {
 namespace {
 const uint64_t kSchema = 1;
+
+// Characters of a text that is valid UTF-8: all bytes but those that continue one.
+size_t LettersOf(const std::string &text) {
+    return static_cast<size_t>(std::count_if(text.begin(), text.end(), [](char byte) {
+        return (static_cast<unsigned char>(byte) & 0xC0) != 0x80;
+    }));
+}
 } // namespace
 
 void AnswerBegin(JsonWriter &json, const char *command) {
@@ -44,7 +52,8 @@ std::string TableRow(const std::vector<std::string> &cells, const std::vector<in
             continue;
         }
         const auto width = static_cast<size_t>(abs(widths[i]));
-        const size_t blanks = width > cells[i].size() ? width - cells[i].size() : 0;
+        const size_t letters = LettersOf(cells[i]);
+        const size_t blanks = width > letters ? width - letters : 0;
         row += widths[i] < 0 ? cells[i] + std::string(blanks, ' ')
                              : std::string(blanks, ' ') + cells[i];
         row += "  ";

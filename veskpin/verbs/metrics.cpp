@@ -164,7 +164,7 @@ ExitStatus MetricsCommand(const Settings &settings, TextSink &out) {
         out.Put(text);
     } else if (FileReplaceContent(settings.output.c_str(), text) != FileReplaceResult::Done) {
         fprintf(stderr, "veskpin: %s cannot be written\n", TextEscaped(settings.output).c_str());
-        return ExitStatus::NotSo;
+        return ExitStatusOf(world.errors.isUnknown, false);
     }
     return ExitStatusOf(world.errors.isUnknown, true);
 }

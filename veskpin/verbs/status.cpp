@@ -95,7 +95,7 @@ std::string ServiceText(const Service &service, bool color) {
 
 std::string QueueText(const Queue &queue) {
     if (!HasQueue(queue)) {
-        return "Queue: none\n";
+        return queue.cause == MsgQueueCause::NotAllowed ? "Queue: unknown\n" : "Queue: none\n";
     }
     return "Queue " + std::to_string(queue.state.id) + " of user " +
            std::to_string(queue.state.owner) + ": " +
@@ -115,8 +115,13 @@ std::string BitmapText(const Volume &volume) {
     if (!*volume.supportsPin) {
         return "cannot pin";
     }
-    const bool isGiven = volume.driverHasBitmap.value_or(false);
-    return volume.held.value_or(false) ? "held" : isGiven ? "pinning" : "no bitmap in the driver";
+    if (volume.held.value_or(false)) {
+        return "held";
+    }
+    if (!volume.driverHasBitmap) {
+        return "unknown";
+    }
+    return *volume.driverHasBitmap ? "pinning" : "no bitmap in the driver";
 }
 } // namespace
 
