@@ -91,8 +91,11 @@ std::string FaultOf(Given &given) {
             return TextEscaped(given.filesFrom) + ": " + strerror(error);
         }
     }
-    if (given.line.command == PlanCommand && settings.paths.empty()) {
-        return given.filesFrom.empty() ? "plan needs a PATH" : "the list of paths is empty";
+    if (settings.paths.empty() && !given.filesFrom.empty()) {
+        return "the list of paths is empty";
+    }
+    if (settings.paths.empty() && given.line.command == PlanCommand) {
+        return "plan needs a PATH";
     }
     for (const std::string &path : settings.paths) {
         if (path.empty()) {
@@ -100,6 +103,18 @@ std::string FaultOf(Given &given) {
         }
     }
     return "";
+}
+
+// The library takes "[a,b]" for a list and "++" for the end of a command; both are names, and the
+// same ones behind "./".
+std::vector<std::string> NamesLeftAlone(int argc, char *argv[]) {
+    std::vector<std::string> arguments(argv, argv + argc);
+    for (std::string &argument : arguments) {
+        if (argument == "++" || (!argument.empty() && argument.front() == '[')) {
+            argument.insert(0, "./");
+        }
+    }
+    return arguments;
 }
 
 bool WantsColor(const Given &given) {
@@ -120,7 +135,12 @@ std::optional<CommandLine> CommandLineRead(int argc, char *argv[], TextSink &out
     AddCommands(app, given);
     *status = ExitStatus::Usage;
     try {
-        app.parse(argc, argv);
+        const std::vector<std::string> arguments = NamesLeftAlone(argc, argv);
+        std::vector<const char *> pointers;
+        for (const std::string &argument : arguments) {
+            pointers.push_back(argument.c_str());
+        }
+        app.parse(argc, pointers.data());
     } catch (const CLI::Success &asked) {
         // --help and --version.
         out.Put(dynamic_cast<const CLI::CallForHelp *>(&asked) != nullptr
