@@ -128,4 +128,25 @@ TEST(JsonReadNumbersTest, WhatIsNoObjectIsNothing) {
         EXPECT_EQ(JsonReadNumbers(text), std::nullopt) << text.substr(0, 20);
     }
 }
+
+TEST(JsonReadRecordsTest, TakesTheTextsAndWholeNumbersOfEachObject) {
+    const auto records = JsonReadRecords(
+        R"({"files": [{"path": "a", "inode": 7, "birth": -5, "x": null, "y": [1], "z": 1.5,
+                       "w": true, "v": 18446744073709551615}, {}], "other": 3})",
+        "files");
+    ASSERT_TRUE(records);
+    EXPECT_EQ(
+        *records,
+        (std::vector<JsonRecord>{
+            {{"path", "a"}, {"inode", "7"}, {"birth", "-5"}, {"v", "18446744073709551615"}}, {}}));
+    EXPECT_EQ(JsonReadRecords(R"({"files": []})", "files"), std::vector<JsonRecord>{});
+}
+
+TEST(JsonReadRecordsTest, WhatIsNoArrayOfObjectsIsNothing) {
+    for (const char *text :
+         {"", "{", "[]", "{}", R"({"files": {}})", R"({"files": null})", R"({"files": [{}, 1]})",
+          R"({"files": ["a"]})", R"({"others": [{}]})"}) {
+        EXPECT_EQ(JsonReadRecords(text, "files"), std::nullopt) << text;
+    }
+}
 } // namespace vesk

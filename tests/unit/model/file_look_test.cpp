@@ -93,13 +93,35 @@ TEST_F(FileLookTest, AFailedLookHasNothingOfTheOneBefore) {
 
 TEST_F(FileLookTest, AFileWhoseStatusIsKnownIsNotAskedForItAgain) {
     FileLooker looker(volume_);
-    const FileStat status{0x100000007, 99, S_IFREG | 0644, looker.Device()};
+    const FileStat status{0x100000007, 99, S_IFREG | 0644, looker.Device(), 0};
     const FileLook &look = looker.Look("share/gone.txt", &status);
     EXPECT_EQ(look.error, 0);
     EXPECT_EQ(look.status.inode, 0x100000007U);
     EXPECT_EQ(look.status.bytes, 99U);
     EXPECT_TRUE(look.hasExtents);
     EXPECT_EQ(asked_, volume_ + "/share 7");
+}
+
+TEST_F(FileLookTest, AStatusAloneAsksForNoExtents) {
+    FileLooker looker(volume_);
+    FileStat status{};
+    EXPECT_EQ(looker.Stat("share/a.txt", &status), 0);
+    EXPECT_EQ(status.inode, InodeOf("share/a.txt"));
+    EXPECT_EQ(status.bytes, 3U);
+    EXPECT_EQ(looker.Stat("share/gone", &status), ENOENT);
+    EXPECT_EQ(looker.Stat("gone/a.txt", &status), ENOENT);
+    EXPECT_EQ(looker.Stat("top.txt", &status), 0);
+    EXPECT_EQ(status.inode, InodeOf("top.txt"));
+    EXPECT_EQ(FakeAppliance::lookups, 0);
+}
+
+TEST_F(FileLookTest, TheBirthTimeIsTheFilesOwnToTheNanosecond) {
+    struct statx answer {};
+    ASSERT_EQ(statx(AT_FDCWD, (volume_ + "/top.txt").c_str(), 0, STATX_BTIME, &answer), 0);
+    FileLooker looker(volume_);
+    const bool isKnown = (answer.stx_mask & STATX_BTIME) != 0;
+    EXPECT_EQ(looker.Look("top.txt").status.birth,
+              isKnown ? answer.stx_btime.tv_sec * 1000000000 + answer.stx_btime.tv_nsec : 0);
 }
 
 TEST_F(FileLookTest, OnlyRegularFilesHaveExtents) {
@@ -142,7 +164,9 @@ TEST_F(FileLookTest, AnotherFileSystemBelowIsNotEntered) {
 TEST_F(FileLookTest, AMountPointThatCannotBeOpenedIsTheErrorOfEveryFile) {
     FileLooker looker(folder_.Path("gone"));
     EXPECT_EQ(looker.Error(), ENOENT);
-    const FileStat status{7, 1, S_IFREG, 1};
+    const FileStat status{7, 1, S_IFREG, 1, 0};
+    FileStat found{};
+    EXPECT_EQ(looker.Stat("a", &found), ENOENT);
     EXPECT_EQ(looker.Look("a").error, ENOENT);
     EXPECT_EQ(looker.Look("a", &status).error, ENOENT);
     EXPECT_FALSE(looker.Look("a", &status).hasExtents);

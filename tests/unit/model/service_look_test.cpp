@@ -13,7 +13,7 @@ protected:
     Arguments Serving() const { return {"tool", "--start-service", "--config-path", config_}; }
     std::vector<Service> Look() {
         errors_ = {};
-        return ServicesLook(&errors_, proc_.Path());
+        return ServicesLook({}, &errors_, proc_.Path());
     }
     // Their numbers.
     std::vector<pid_t> Seen() {
@@ -70,7 +70,7 @@ TEST_F(ServiceLookTest, OtherProcessesAreNoServices) {
     proc_.Write("0600/comm", "veskcachepinfil\n");
     EXPECT_EQ(Seen(), Pids{});
     EXPECT_EQ(TextsOf(errors_), Texts{});
-    EXPECT_EQ(ServicesLook(&errors_, folder_.Path("gone")).size(), 0U);
+    EXPECT_EQ(ServicesLook({}, &errors_, folder_.Path("gone")).size(), 0U);
 }
 
 TEST_F(ServiceLookTest, OnlyRootsAndTheCallersOwnServicesAreTrusted) {

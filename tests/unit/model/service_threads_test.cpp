@@ -23,7 +23,7 @@ protected:
     // "waiting waiting": receiver and worker.
     std::string Look() {
         LookErrors errors;
-        const std::vector<Service> services = ServicesLook(&errors, proc_.Path());
+        const std::vector<Service> services = ServicesLook({}, &errors, proc_.Path());
         if (services.size() != 1) {
             return "no service";
         }
@@ -70,7 +70,7 @@ TEST_F(ServiceThreadsTest, AnEndedReceiverLeavesTheOthersAndTheirCommandLine) {
         EXPECT_EQ(Look(), "ended waiting") << state;
     }
     LookErrors errors;
-    EXPECT_EQ(ServicesLook(&errors, proc_.Path()).at(0).config, config_);
+    EXPECT_EQ(ServicesLook({}, &errors, proc_.Path()).at(0).config, config_);
 }
 
 TEST_F(ServiceThreadsTest, AProcessOfWhichNothingLivesIsNoService) {
@@ -94,6 +94,19 @@ TEST_F(ServiceThreadsTest, TheWorkersStateIsThatOfTheStoredRequests) {
     WriteWhole(config_, "{");
     EXPECT_EQ(Look(), "waiting unknown");
     EXPECT_EQ(LookLogTake("none"), "none"); // told by those who ask for the document
+}
+
+TEST_F(ServiceThreadsTest, RequestsOfHeldVolumesAreNoWork) {
+    WriteWhole(config_, R"({"requestQueue": ["1", "2"],
+        "requests": {"1": {"type": "reloadPinBlocks", "mountPath": "/volume1"},
+                     "2": {"type": "reloadPinBlocks", "mountPath": "/volume2"}}})");
+    LookErrors errors;
+    const auto worker = [&](const std::set<std::string> &held) {
+        return ServicesLook(held, &errors, proc_.Path()).at(0).worker;
+    };
+    EXPECT_EQ(worker({"/volume1", "/volume2"}), ThreadLook::Waiting);
+    EXPECT_EQ(worker({"/volume1"}), ThreadLook::Busy);
+    EXPECT_EQ(worker({"/volume"}), ThreadLook::Busy);
 }
 
 TEST_F(ServiceThreadsTest, WithoutAConfigurationTheWorkersStateIsUnknown) {
@@ -161,7 +174,7 @@ TEST(ThreadLookTextTest, EachStateHasItsWord) {
 // harm.
 TEST_F(ServiceThreadsTest, TheMachinesOwnProcessesCanBeLookedAt) {
     LookErrors errors;
-    for (const Service &service : ServicesLook(&errors)) {
+    for (const Service &service : ServicesLook({}, &errors)) {
         EXPECT_NE(service.pid, getpid());
     }
 }

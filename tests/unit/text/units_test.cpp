@@ -16,6 +16,8 @@ TEST(UnitsTest, BytesAreRoundedToTheUnitThatNeedsFewestDigits) {
         {1048063, "1023 KiB"}, // 1023.499
         {1048064, "1.0 MiB"},  // 1023.5
         {1048576, "1.0 MiB"},
+        {1310720, "1.2 MiB"}, // half way: to the even digit
+        {1310721, "1.3 MiB"},
         {65536, "64 KiB"},
         {uint64_t{12} << 30, "12 GiB"},
         {uint64_t{1} << 40, "1.0 TiB"},
