@@ -48,6 +48,20 @@ make_far_file() {
     stop_service
 }
 
+@test "what veskpin plans for it is what pinning does" {
+    make_far_file
+    look 0 plan "$FAR"
+    local planned
+    planned=$(answer '.volumes[0] | [.blocks,.blocksNew,.extents,.requestsNeeded]')
+    same "[$(blocks_of "$FAR" | wc -l),$(blocks_of "$FAR" | wc -l),$(extents "$FAR" | wc -l),1]" "$planned"
+    start_service
+    pin 1 "$FAR"
+    same "$(answer '.volumes[0].blocksNew')" "$(bitmap_blocks 1 | wc -l)"
+    look 0 list "$FAR"
+    same "pinned $(stat -c %s "$FAR")" "$(state_of "$FAR") $(answer '.files[0].bytes')"
+    stop_service
+}
+
 @test "unpinning it releases its ranges" {
     make_far_file
     start_service

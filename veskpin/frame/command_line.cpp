@@ -161,6 +161,7 @@ std::optional<CommandLine> CommandLineRead(int argc, char *argv[], TextSink &out
         given.line.settings.configPath = kDefaultConfig;
     }
     given.line.settings.color = WantsColor(given);
+    given.line.settings.progress = ProgressFormOf(given.progress);
     return given.line;
 }
 } // namespace vesk

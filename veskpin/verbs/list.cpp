@@ -233,6 +233,14 @@ void ListTarget(const Target &target, bool search, World &world, const Visit &vi
     }
     lister.ListAsked(target.relativePath, nullptr, nullptr);
 }
+
+uint64_t KnownCount(const World &world) {
+    uint64_t count = 0;
+    for (const WorldVolume &volume : world.volumes) {
+        count += volume.known.files.size();
+    }
+    return count;
+}
 } // namespace
 
 ListResult ListLook(World &world, const std::vector<std::string> &paths, bool search,
@@ -255,9 +263,14 @@ ListResult ListLook(World &world, const std::vector<std::string> &paths, bool se
 ExitStatus ListCommand(const Settings &settings, TextSink &out) {
     World world = WorldLook(settings.configPath);
     ListView view(out, settings.json, settings.color);
-    const ListResult result =
-        ListLook(world, settings.paths, settings.search,
-                 [&](const ListedFile &file) { view.Put(file); });
+    ListResult result;
+    {
+        Progress progress(settings.progress, settings.paths.empty() ? KnownCount(world) : 0);
+        result = ListLook(world, settings.paths, settings.search, [&](const ListedFile &file) {
+            view.Put(file);
+            progress.Step();
+        });
+    }
     view.End(result.folders, world.errors);
     const bool allFailed = !settings.paths.empty() && result.failedPaths == settings.paths.size();
     return ExitStatusOf(world.errors.isUnknown || allFailed,

@@ -19,8 +19,9 @@ namespace {
 // The plan for one volume.
 class VolumePlanner {
 public:
-    VolumePlanner(const WorldVolume &world, Plan &plan)
-        : world_(world), plan_(plan), looker_(world.volume.mountPath), sum_(world) {}
+    VolumePlanner(const WorldVolume &world, Plan &plan, Progress &progress)
+        : world_(world), plan_(plan), progress_(progress), looker_(world.volume.mountPath),
+          sum_(world) {}
 
     const WorldVolume &World() const { return world_; }
 
@@ -32,6 +33,7 @@ public:
         } else if (!sum_.Add(relativePath, look, IsPinned(look))) {
             Skip(relativePath, SkipReason::SameInode);
         }
+        progress_.Step();
     }
 
     void AddFolder(const std::string &folder) {
@@ -71,6 +73,7 @@ private:
 
     const WorldVolume &world_;
     Plan &plan_;
+    Progress &progress_;
     FileLooker looker_;
     PlanSum sum_;
 };
@@ -123,7 +126,8 @@ std::vector<Target> ResolveOnce(const World &world, const std::vector<std::strin
 }
 } // namespace
 
-Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent) {
+Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent,
+              Progress &progress) {
     Plan plan;
     std::vector<std::unique_ptr<VolumePlanner>> planners;
     const auto plannerOf = [&](const WorldVolume &volume) -> VolumePlanner & {
@@ -132,7 +136,7 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
                 return *planner;
             }
         }
-        planners.push_back(std::make_unique<VolumePlanner>(volume, plan));
+        planners.push_back(std::make_unique<VolumePlanner>(volume, plan, progress));
         return *planners.back();
     };
     const std::vector<Target> targets = ResolveOnce(world, paths);
@@ -163,7 +167,11 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
 
 ExitStatus PlanCommand(const Settings &settings, TextSink &out) {
     World world = WorldLook(settings.configPath);
-    const Plan plan = PlanLook(world, settings.paths, settings.reservePercent);
+    Plan plan;
+    {
+        Progress progress(settings.progress, 0);
+        plan = PlanLook(world, settings.paths, settings.reservePercent, progress);
+    }
     if (settings.json) {
         PlanShowJson(plan, world.errors, out);
     } else {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include "model/world.h"
+#include "text/progress.h"
 #include "text/text_sink.h"
 #include "verbs/plan_figures.h"
 #include "verbs/plan_reason.h"
@@ -28,7 +29,8 @@ struct Plan {
 };
 
 // What pinning these files and folders would do.
-Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent);
+Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent,
+              Progress &progress);
 
 ExitStatus PlanStatus(const Plan &plan, const LookErrors &errors);
 void PlanShowJson(const Plan &plan, const LookErrors &errors, TextSink &out);

@@ -1,6 +1,8 @@
 // What the command line asks for. Thread rule: written once, then only read.
 #pragma once
 
+#include "text/progress.h"
+
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -10,6 +12,7 @@ struct Settings {
     std::string configPath;
     bool json = false;               // one JSON document instead of tables
     bool color = false;              // of tables
+    ProgressForm progress = ProgressForm::None;
     std::vector<std::string> paths;  // PATHs, those of --files-from behind the others
     std::vector<std::string> volumes;
     bool nulSeparated = false;       // -0
