@@ -51,7 +51,8 @@ protected:
             paths.push_back(path.empty() || path[0] != '/' ? volume_ + "/" + path : path);
         }
         world_.errors = {};
-        plan_ = PlanLook(world_, paths, 10);
+        Progress progress(ProgressForm::None, 0);
+        plan_ = PlanLook(world_, paths, 10, progress);
         return plan_;
     }
     // The figures of the first volume.
