@@ -1,5 +1,5 @@
-// map_files LIST: opens, stats and asks for the extents of each file of the list, a path a line: what
-// a listing with figures has to ask of the system at least. Prints how many extents there are.
+// map_files LIST: opens, stats and asks for the extents of each file of the list, a path a line:
+// what a listing with figures has to ask of the system at least. Prints how many extents there are.
 #include "base/scoped_fd.h"
 
 #include <fcntl.h>

@@ -2,9 +2,10 @@
 //
 // VESK_FAIL_CALL names the kind, VESK_FAIL_NUMBER the call counted from 1, VESK_FAIL_ERRNO the
 // error; 0 halves the length of a read or write instead. Counting begins when main looks at its
-// options (the companion: at the variable that stands for one), and covers the program and its libraries, but not what the C library calls inside
-// itself. When the call is reached, a byte goes to descriptor 9. At the program's orderly end the
-// number of allocations that are not freed follows there as " N".
+// options (the companion: at the variable that stands for one), and covers the program and its
+// libraries, but not what the C library calls inside itself. When the call is reached, a byte goes
+// to descriptor 9. At the program's orderly end the number of allocations that are not freed
+// follows there as " N".
 #include "tests/faults/real_call.h"
 
 #include <atomic>

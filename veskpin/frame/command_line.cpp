@@ -64,8 +64,8 @@ void AddCommands(CLI::App &app, Given &given) {
                                 ListCommand);
     AddPaths(list, given);
     list->add_flag("--search", settings.search, "Look for renamed files");
-    CLI::App *plan = AddCommand(app, given, "plan", "What pinning would cost; changes nothing",
-                                PlanCommand);
+    CLI::App *plan =
+        AddCommand(app, given, "plan", "What pinning would cost; changes nothing", PlanCommand);
     AddPaths(plan, given);
     plan->add_option("--reserve", settings.reservePercent, "Percent of the SSD to leave free")
         ->type_name("PERCENT")
@@ -149,7 +149,8 @@ std::optional<CommandLine> CommandLineRead(int argc, char *argv[], TextSink &out
         *status = ExitStatus::Done;
         return std::nullopt;
     } catch (const CLI::Error &error) {
-        fprintf(stderr, "veskpin: %s\nTry \"veskpin --help\".\n", TextEscaped(error.what()).c_str());
+        fprintf(stderr, "veskpin: %s\nTry \"veskpin --help\".\n",
+                TextEscaped(error.what()).c_str());
         return std::nullopt;
     }
     const std::string fault = FaultOf(given);

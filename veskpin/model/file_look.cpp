@@ -57,8 +57,7 @@ int FileLooker::OpenFolder(const std::string &folder) {
 void FileLooker::AskExtents(const std::string &relativePath) {
     look_.hasExtents = extents_ != nullptr && S_ISREG(look_.status.mode) &&
                        FileExtentsAsk(*extents_, mountPath_ + "/" + relativePath,
-                                      static_cast<uint32_t>(look_.status.inode),
-                                      &look_.table) == 0;
+                                      static_cast<uint32_t>(look_.status.inode), &look_.table) == 0;
     if (look_.hasExtents) {
         look_.blocks = FileBlocksOf(look_.table);
     }

@@ -32,7 +32,8 @@ struct FileStat {
 int FileStatAt(int folder, const char *name, FileStat *status);
 
 struct FileLook {
-    int error = 0; // an errno, ENOENT for a path that leads nowhere: the path could not be looked at
+    int error =
+        0; // an errno, ENOENT for a path that leads nowhere: the path could not be looked at
     FileStat status{};
     bool hasExtents = false; // they could be read; of a regular file only
     FileMappingTable table;

@@ -41,7 +41,7 @@ void LookLogBegin() {
 }
 
 std::string LookLogTake(const std::string &otherwise) {
-    const std::string taken = loggedErrors.empty() ? otherwise : loggedErrors;
+    std::string taken = loggedErrors.empty() ? otherwise : loggedErrors;
     loggedErrors.clear();
     return taken;
 }

@@ -65,7 +65,8 @@ void PathWalk(const FileLooker &looker, const std::string &folder,
         }
         std::vector<std::string> folders;
         for (const std::string &name : names) {
-            const std::string path = here.empty() ? name : here + "/" + name;
+            std::string path = here;
+            path.append(here.empty() ? "" : "/").append(name);
             FileStat status{};
             const int failure = FileStatAt(fd.Get(), name.c_str(), &status);
             if (failure == ENOENT) {

@@ -51,10 +51,9 @@ KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
     }
     const size_t recorded = known.files.size();
     for (auto &[path, request] : wanted) {
-        const auto [first, last] =
-            std::equal_range(known.files.begin(),
-                             known.files.begin() + static_cast<std::ptrdiff_t>(recorded),
-                             KnownFile{path, std::nullopt, 0}, IsBefore);
+        const auto [first, last] = std::equal_range(
+            known.files.begin(), known.files.begin() + static_cast<std::ptrdiff_t>(recorded),
+            KnownFile{path, std::nullopt, 0}, IsBefore);
         for (auto file = first; file != last; ++file) {
             file->stored = request.first;
         }
@@ -75,9 +74,8 @@ KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
 }
 
 std::pair<size_t, size_t> KnownFilesAt(const KnownFiles &known, const std::string &relativePath) {
-    const auto [first, last] =
-        std::equal_range(known.files.begin(), known.files.end(),
-                         KnownFile{relativePath, std::nullopt, 0}, IsBefore);
+    const auto [first, last] = std::equal_range(known.files.begin(), known.files.end(),
+                                                KnownFile{relativePath, std::nullopt, 0}, IsBefore);
     return {first - known.files.begin(), last - known.files.begin()};
 }
 

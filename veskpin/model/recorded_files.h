@@ -23,9 +23,9 @@ struct KnownFile {
 // file that was replaced and pinned again leaves its old record.
 struct KnownFiles {
     std::vector<KnownFile> files;
-    uint64_t recorded = 0;                             // records
-    uint64_t requests = 0;                             // stored requests of the volume
-    std::vector<std::pair<uint32_t, size_t>> byInode;  // recorded inode, index in `files`; sorted
+    uint64_t recorded = 0;                            // records
+    uint64_t requests = 0;                            // stored requests of the volume
+    std::vector<std::pair<uint32_t, size_t>> byInode; // recorded inode, index in `files`; sorted
     std::vector<std::string> problems;
 };
 

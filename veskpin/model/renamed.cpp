@@ -1,8 +1,8 @@
 #include "model/renamed.h"
 
-#include "json/json_text.h"
 #include "model/cache_state.h"
 #include "model/path_walk.h"
+#include "json/json_text.h"
 
 #include <cerrno>
 #include <cstdlib>

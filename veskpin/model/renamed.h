@@ -2,8 +2,8 @@
 // birth time in one walk of the volume.
 //
 // The records alone cannot tell a renamed file from one that got a deleted one's inode number. The
-// last copy of the records, kept in /var/lib/veskpin/last/UUID.json when they were known to be good,
-// has the birth times: {"files": [{"path", "inode", "birth" (nanoseconds since 1970)}]}.
+// last copy of the records, kept in /var/lib/veskpin/last/UUID.json when they were known to be
+// good, has the birth times: {"files": [{"path", "inode", "birth" (nanoseconds since 1970)}]}.
 //
 // Thread rule: no state.
 #pragma once

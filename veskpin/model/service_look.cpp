@@ -253,10 +253,9 @@ std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const S
         LookLogTake("");
         return std::nullopt;
     }
-    const bool hasWork = std::any_of(records.requests.begin(), records.requests.end(),
-                                     [&](const StoredRequest &request) {
-                                         return heldVolumes.count(request.mountPath) == 0;
-                                     });
+    const bool hasWork = std::any_of(
+        records.requests.begin(), records.requests.end(),
+        [&](const StoredRequest &request) { return heldVolumes.count(request.mountPath) == 0; });
     return hasWork ? ThreadLook::Busy : ThreadLook::Waiting;
 }
 
@@ -273,8 +272,9 @@ bool IsTrusted(const std::string &process, int *error) {
     return effective != std::string::npos && (user == 0 || user == geteuid());
 }
 
-// The process's threads and what one that lives was asked for, where it is a service of ours; nothing
-// where it is none. A process whose first thread has ended has a command line in the others only.
+// The process's threads and what one that lives was asked for, where it is a service of ours;
+// nothing where it is none. A process whose first thread has ended has a command line in the others
+// only.
 struct ServiceProcess {
     std::vector<Thread> threads; // the first one is the receiver
     Thread living;

@@ -24,8 +24,7 @@ ProgressForm ProgressFormOf(const std::string &name) {
 }
 
 Progress::Progress(ProgressForm form, uint64_t total, int fd)
-    : form_(form), total_(total), fd_(fd), start_(NowMs()), written_(start_) {
-}
+    : form_(form), total_(total), fd_(fd), start_(NowMs()), written_(start_) {}
 
 Progress::~Progress() {
     if (hasLine_) {
@@ -48,7 +47,8 @@ void Progress::Step() {
 void Progress::Write(int64_t now) {
     const std::string files = std::to_string(files_);
     if (form_ == ProgressForm::Json) {
-        Put("{\"files\":" + files + ",\"total\":" + (total_ == 0 ? "null" : std::to_string(total_)) +
+        Put("{\"files\":" + files +
+            ",\"total\":" + (total_ == 0 ? "null" : std::to_string(total_)) +
             ",\"milliseconds\":" + std::to_string(now - start_) + "}\n");
     } else if (now - start_ >= kQuietMs) {
         const std::string of = total_ == 0 ? "" : " of " + std::to_string(total_);

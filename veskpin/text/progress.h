@@ -1,5 +1,5 @@
-// How far a long look has come, on standard error: a line that replaces itself on a terminal, from the
-// first second on, or a JSON object a line for programs.
+// How far a long look has come, on standard error: a line that replaces itself on a terminal, from
+// the first second on, or a JSON object a line for programs.
 //
 // Thread rule: one owner.
 #pragma once

@@ -5,11 +5,11 @@ namespace {
 struct Form {
     unsigned char mask;  // of the first byte's bits that tell the form
     unsigned char value; // what they are then
+    int32_t least;       // the first character that needs this form
     size_t bytes;
-    int32_t least; // the first character that needs this form
 };
 const Form kForms[] = {
-    {0x80, 0x00, 1, 0}, {0xE0, 0xC0, 2, 0x80}, {0xF0, 0xE0, 3, 0x800}, {0xF8, 0xF0, 4, 0x10000}};
+    {0x80, 0x00, 0, 1}, {0xE0, 0xC0, 0x80, 2}, {0xF0, 0xE0, 0x800, 3}, {0xF8, 0xF0, 0x10000, 4}};
 
 unsigned char ByteAt(std::string_view text, size_t at) {
     return static_cast<unsigned char>(text[at]);

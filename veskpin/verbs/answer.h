@@ -3,9 +3,9 @@
 // Thread rule: one thread.
 #pragma once
 
-#include "json/json_text.h"
 #include "model/look_errors.h"
 #include "text/text_sink.h"
+#include "json/json_text.h"
 
 #include <string>
 #include <vector>

@@ -2,6 +2,8 @@
 #include "verbs/answer.h"
 #include "verbs/verbs.h"
 
+#include <algorithm>
+
 namespace vesk {
 namespace {
 // The recorded paths of the volume, each once.
@@ -31,10 +33,21 @@ void ExportJson(const std::vector<const WorldVolume *> &volumes, const LookError
     json.EndArray();
     AnswerEnd(json, out, errors);
 }
+
+// What is recorded can be told whatever else could not be looked at.
+void KeepConfigErrors(World *world) {
+    auto &list = world->errors.list;
+    list.erase(
+        std::remove_if(list.begin(), list.end(),
+                       [&](const LookError &error) { return error.path != world->configPath; }),
+        list.end());
+    world->errors.isUnknown = !world->isConfigKnown;
+}
 } // namespace
 
 ExitStatus ExportCommand(const Settings &settings, TextSink &out) {
     World world = WorldLook(settings.configPath);
+    KeepConfigErrors(&world);
     const auto volumes = WorldVolumesWanted(world, settings.volumes);
     bool isWhole = true;
     if (settings.json) {
@@ -45,7 +58,7 @@ ExitStatus ExportCommand(const Settings &settings, TextSink &out) {
         ForEachPath(*volume, [&](const std::string &path) {
             if (settings.nulSeparated) {
                 out.Put(path);
-                out.Put(std::string_view("", 1));
+                out.Put({"\0", 1});
             } else if (path.find('\n') == std::string::npos) {
                 out.Put(path + "\n");
             } else {

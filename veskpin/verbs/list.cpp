@@ -31,7 +31,7 @@ public:
         if (search) {
             renamed_ = RenamedFind(volume, &errors_);
         }
-        absent_.error = looker_.Error() != 0 ? looker_.Error() : ENODEV;
+        absent_.error = ENODEV;
         if (!volume.volume.isMounted) {
             LookUnknownAdd(&errors_, volume.volume.mountPath, "is not mounted");
         } else if (looker_.Error() != 0) {

@@ -4,10 +4,10 @@
 // Thread rule: one owner.
 #pragma once
 
-#include "json/json_text.h"
 #include "model/world.h"
 #include "text/text_sink.h"
 #include "verbs/file_state.h"
+#include "json/json_text.h"
 
 #include <functional>
 #include <optional>

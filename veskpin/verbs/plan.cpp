@@ -87,8 +87,8 @@ bool CanBePlanned(const Target &target) {
            target.volume->volume.isMounted;
 }
 
-// With "/" at the end: in the order of these texts a folder's neighbours ("a-b") do not stand between
-// it and what lies below it.
+// With "/" at the end: in the order of these texts a folder's neighbours ("a-b") do not stand
+// between it and what lies below it.
 std::string FolderText(const std::string &path) {
     return path == "/" ? path : path + "/";
 }
@@ -96,6 +96,7 @@ std::string FolderText(const std::string &path) {
 // Without those that are, or lie below, another one of the same volume.
 std::vector<Target> ResolveOnce(const World &world, const std::vector<std::string> &paths) {
     std::vector<Target> targets;
+    targets.reserve(paths.size());
     for (const std::string &path : paths) {
         targets.push_back(TargetResolve(world, path));
     }
@@ -106,13 +107,13 @@ std::vector<Target> ResolveOnce(const World &world, const std::vector<std::strin
     std::vector<std::pair<std::string, const WorldVolume *>> folders; // each within the one before
     for (Target &target : targets) {
         const std::string text = FolderText(target.path);
-        while (!folders.empty() && text.compare(0, folders.back().first.size(),
-                                                folders.back().first) != 0) {
+        while (!folders.empty() &&
+               text.compare(0, folders.back().first.size(), folders.back().first) != 0) {
             folders.pop_back();
         }
-        const bool isBelow =
-            std::any_of(folders.begin(), folders.end(),
-                        [&](const auto &folder) { return folder.second == target.volume; });
+        const bool isBelow = std::any_of(folders.begin(), folders.end(), [&](const auto &folder) {
+            return folder.second == target.volume;
+        });
         const bool isSame = !once.empty() && once.back().path == target.path;
         if (isBelow || isSame) {
             continue;

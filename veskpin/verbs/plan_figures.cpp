@@ -59,8 +59,7 @@ void SectorCover::Add(uint64_t startSector, uint64_t numSectors) {
 PlanSum::PlanSum(const WorldVolume &world)
     : world_(world),
       planned_(BlockSetOf((world.volume.deviceBytes.value_or(0) >> kBitmapByteShift) + 1)),
-      stored_(planned_) {
-}
+      stored_(planned_) {}
 
 bool PlanSum::Add(const std::string &relativePath, const FileLook &look, bool isPinned) {
     const auto inode = static_cast<uint32_t>(look.status.inode);

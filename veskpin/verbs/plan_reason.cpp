@@ -20,9 +20,9 @@ bool IsBitmapFile(const std::string &mountPath, const std::string &filePath) {
 
 const char *SkipReasonText(SkipReason reason) {
     static const char *const kTexts[] = {
-        "not-found",   "name",             "too-long",  "not-utf8",  "not-regular",
-        "bitmap-file", "other-filesystem", "no-volume", "no-blocks", "no-permission",
-        "unreadable",  "same-inode",       "no-room"};
+        "not-found",        "name",      "too-long",  "not-utf8",      "not-regular", "bitmap-file",
+        "other-filesystem", "no-volume", "no-blocks", "no-permission", "unreadable",  "same-inode",
+        "no-room"};
     return kTexts[static_cast<size_t>(reason)];
 }
 

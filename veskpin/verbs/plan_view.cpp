@@ -70,11 +70,10 @@ void PlanShowTable(const Plan &plan, bool color, TextSink &out) {
         out.Put(Colored(TextEscaped(volume.mountPath), 1, color) + ": " +
                 UnitsOfThings(figures.files, "file") + ", " + UnitsOfBytes(figures.bytes) + " in " +
                 UnitsOfThings(figures.extents, "extent") + "\n");
-        out.Put("  cost    " +
-                (figures.blocks ? BlocksText(*figures.blocks) : std::string("unknown")) +
-                (figures.blocksNew ? ", " + std::to_string(*figures.blocksNew) + " of them new"
-                                   : "") +
-                "\n");
+        out.Put(
+            "  cost    " + (figures.blocks ? BlocksText(*figures.blocks) : std::string("unknown")) +
+            (figures.blocksNew ? ", " + std::to_string(*figures.blocksNew) + " of them new" : "") +
+            "\n");
         out.Put("  room    " + RoomText(figures, color) + "\n");
         out.Put("  time    " + UnitsOfThings(figures.requests, "request") + ", about " +
                 UnitsOfSeconds(figures.seconds) + "\n");

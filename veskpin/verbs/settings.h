@@ -10,15 +10,15 @@
 namespace vesk {
 struct Settings {
     std::string configPath;
-    bool json = false;               // one JSON document instead of tables
-    bool color = false;              // of tables
+    bool json = false;  // one JSON document instead of tables
+    bool color = false; // of tables
     ProgressForm progress = ProgressForm::None;
-    std::vector<std::string> paths;  // PATHs, those of --files-from behind the others
+    std::vector<std::string> paths; // PATHs, those of --files-from behind the others
     std::vector<std::string> volumes;
-    bool nulSeparated = false;       // -0
-    bool search = false;             // --search
-    unsigned reservePercent = 10;    // --reserve: of the SSD
-    std::string output;              // --output; empty: standard output
+    bool nulSeparated = false;    // -0
+    bool search = false;          // --search
+    unsigned reservePercent = 10; // --reserve: of the SSD
+    std::string output;           // --output; empty: standard output
 };
 
 enum class ExitStatus : int {

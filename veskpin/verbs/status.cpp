@@ -169,14 +169,13 @@ void StatusShowTable(const StatusView &view, bool color, TextSink &out) {
         const auto bytes = [](const std::optional<uint64_t> &blocks) {
             return blocks ? UnitsOfBytes(*blocks << kBitmapByteShift) : "-";
         };
-        out.Put(TableRow({TextEscaped(volume.mountPath),
-                          UnitsOfCount(IfKnown(world->known.recorded, view.isConfigKnown)),
-                          UnitsOfCount(IfKnown(world->known.requests, view.isConfigKnown)),
-                          bytes(MarkedOf(volume)), bytes(volume.blocksHeld),
-                          bytes(volume.ssdBlocks),
-                          volume.deviceBytes ? UnitsOfBytes(*volume.deviceBytes) : "-",
-                          BitmapText(volume)},
-                         widths));
+        out.Put(TableRow(
+            {TextEscaped(volume.mountPath),
+             UnitsOfCount(IfKnown(world->known.recorded, view.isConfigKnown)),
+             UnitsOfCount(IfKnown(world->known.requests, view.isConfigKnown)),
+             bytes(MarkedOf(volume)), bytes(volume.blocksHeld), bytes(volume.ssdBlocks),
+             volume.deviceBytes ? UnitsOfBytes(*volume.deviceBytes) : "-", BitmapText(volume)},
+            widths));
     }
 }
 
