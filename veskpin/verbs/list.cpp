@@ -214,7 +214,8 @@ void ListTarget(const Target &target, bool search, World &world, const Visit &vi
     const KnownFiles &known = target.volume->known;
     const auto below = KnownFilesBelow(known, target.relativePath);
     const bool isFolder = target.status && S_ISDIR(target.status->mode);
-    if (target.error != 0 && target.error != ENOENT && target.error != ENOTDIR) {
+    const bool isHidden = target.error != 0 && target.error != ENOENT && target.error != ENOTDIR;
+    if (isHidden) {
         NoteFailedPath(target, strerror(target.error), world.errors, result);
     }
     if (isFolder || (!target.status && below.first < below.second)) {
@@ -228,7 +229,9 @@ void ListTarget(const Target &target, bool search, World &world, const Visit &vi
     }
     const auto at = KnownFilesAt(known, target.relativePath);
     if (!target.status && at.first == at.second) {
-        NoteFailedPath(target, strerror(target.error), world.errors, result);
+        if (!isHidden) {
+            NoteFailedPath(target, strerror(target.error), world.errors, result);
+        }
         return;
     }
     lister.ListAsked(target.relativePath, nullptr, nullptr);
