@@ -13,6 +13,15 @@ TEST_F(LookErrorsTest, TheSameIsToldOnceAndInTheOrderOfTheLooks) {
     EXPECT_EQ(TextsOf(errors), (Texts{"/v/b: is damaged", "/v/a: is damaged", "/v/b: is gone"}));
 }
 
+TEST_F(LookErrorsTest, WhatIsToldAnewLongAfterIsNotLookedFor) {
+    LookErrors errors;
+    for (int i = 0; i < 100000; ++i) {
+        LookErrorAdd(&errors, "/v/" + std::to_string(i), "is gone");
+        LookErrorAdd(&errors, "/v/" + std::to_string(i > 60 ? i - 60 : i), "is gone");
+    }
+    EXPECT_EQ(errors.list.size(), 100000U);
+}
+
 TEST_F(LookErrorsTest, WhatIsUnknownStaysUnknownAlsoWhenItWasTold) {
     LookErrors errors;
     LookErrorAdd(&errors, "/v", "is gone");

@@ -150,7 +150,8 @@ TEST_F(ServiceLookTest, NamespacesThatCannotBeToldAreNotTakenForOurs) {
     proc_.AddService(100, Serving());
     std::filesystem::remove(proc_.Path("100/task/100/ns/mnt"));
     EXPECT_EQ(Look().at(0).otherNamespaces, std::nullopt);
-    const Texts told{proc_.Path("100") + ": no permission to see what the service's threads do",
+    const Texts told{proc_.Path("100") +
+                         ": what the service and its threads do cannot be seen, or not yet",
                      "unknown"};
     EXPECT_EQ(TextsOf(errors_), told);
     proc_.Link("100/task/100/ns/mnt", "mnt:[1]");
@@ -171,7 +172,8 @@ TEST_F(ServiceLookTest, WithoutTheRightToLookThereIsNoAnswer) {
     ASSERT_EQ(services.size(), 1U);
     EXPECT_EQ(services[0].receiver, std::nullopt);
     EXPECT_EQ(TextsOf(errors_),
-              (Texts{proc_.Path("100") + ": no permission to see what the service's threads do",
+              (Texts{proc_.Path("100") +
+                         ": what the service and its threads do cannot be seen, or not yet",
                      "unknown"}));
 }
 } // namespace vesk

@@ -224,17 +224,20 @@ TEST_F(VolumeLookTest, WithoutAUuidThereIsNoCacheUnlessItMayNotBeRead) {
     EXPECT_TRUE(volume.isMounted);
     volume = VolumeLook({mountPath_, folder_.Path("gone"), ""}, &errors_);
     EXPECT_FALSE(volume.hasCache);
-    EXPECT_EQ(TextsOf(errors_), Texts{});
+    EXPECT_EQ(TextsOf(errors_),
+              (Texts{mountPath_ + ": its UUID cannot be read from " + space,
+                     mountPath_ + ": its UUID cannot be read from " + folder_.Path("gone")}));
     if (geteuid() != 0) {
         GTEST_SKIP() << "acting for another user needs root";
     }
     chmod(folder_.Path().c_str(), 0755);
     chmod(space.c_str(), 0600);
     const WhollyOrdinaryUser user;
+    errors_ = {};
     volume = VolumeLook({mountPath_, space, ""}, &errors_);
     EXPECT_TRUE(volume.hasCache);
     EXPECT_EQ(TextsOf(errors_),
-              (Texts{mountPath_ + ": no permission to read the UUID from " + space, "unknown"}));
+              (Texts{mountPath_ + ": its UUID cannot be read from " + space, "unknown"}));
 }
 
 TEST(VolumePathTest, LiesBelowTheMountPath) {
@@ -273,6 +276,41 @@ TEST_F(VolumeLookTest, WhatWasLoggedBeforeIsNobodysCause) {
     Look();
     EXPECT_EQ(TextsOf(errors_), (Texts{mountPath_ + ": Can't get cache path", "unknown"}));
     EXPECT_EQ(LookLogTake("none"), "none");
+}
+
+TEST_F(VolumeLookTest, ACacheThatDoesNotTellItsStateIsNoCacheThatCannotPin) {
+    FakeCache &cache = FakeAppliance::caches[0];
+    const auto expectUnknown = [this] {
+        const Volume volume = Look();
+        EXPECT_EQ(volume.supportsPin, std::nullopt);
+        EXPECT_EQ(volume.deviceBytes, deviceBytes_);
+        EXPECT_EQ(TextsOf(errors_),
+                  (Texts{device_ + ": the cache does not tell its state", "unknown"}));
+    };
+    cache.state = 0;
+    expectUnknown();
+    cache.state = 1;
+    cache.statResult = -1;
+    expectUnknown();
+    cache.statResult = 1;
+    cache.supportPin = 0; // and the driver answers all the same
+    expectUnknown();
+}
+
+TEST_F(VolumeLookTest, ABitmapFileWhoseSizeCannotBeHadIsToldOf) {
+    WriteWhole(BitmapPath(), "\x81");
+    FakeLibc::Count("stat");
+    Look();
+    const int calls = FakeLibc::Calls("stat");
+    bool isTold = false;
+    for (int i = 1; i <= calls; ++i) {
+        FakeLibc::Fail("stat", EIO, i);
+        const Volume volume = Look();
+        isTold = isTold || (!errors_.list.empty() && !volume.bitmapBytes);
+        EXPECT_TRUE(volume.bitmapBytes || !errors_.list.empty()) << i;
+        EXPECT_TRUE(volume.marked == BlockSet({0x81, 0, 0}) || errors_.isUnknown) << i;
+    }
+    EXPECT_TRUE(isTold);
 }
 
 // Memory that runs out at any of the texts: an exception or an answer that is told as unknown, and

@@ -75,6 +75,13 @@ TEST_F(WorldTest, AVolumeWithoutACacheIsThereOnlyWhereItIsNamed) {
     EXPECT_EQ(world.withoutCache, Texts{"/plain"});
 }
 
+TEST_F(WorldTest, AVolumeWithRecordsWhoseUuidCannotBeReadIsUnknown) {
+    FakeAppliance::spaces.push_back({"/dev/space2", "/named", ""});
+    FakeAppliance::spaces.push_back({"/dev/space3", "/other", ""});
+    EXPECT_FALSE(WorldLook(config_).errors.isUnknown);
+    EXPECT_TRUE(Look(R"({"volumes": {"/named": {}}})").errors.isUnknown);
+}
+
 TEST_F(WorldTest, ASpaceThatIsNotMountedIsLeftOut) {
     FakeAppliance::spaces.push_back({"/dev/space2", "", "uuid-1"});
     World world = WorldLook(config_);
@@ -117,7 +124,7 @@ TEST_F(WorldTest, AllVolumesAreWantedWhereNoneIsNamed) {
     EXPECT_EQ(Wanted(world, {"/volume9"}), Texts{"/volume9"});
     EXPECT_EQ(Wanted(world, {"/volume9/", mountPath_ + "//", "/volume9"}),
               (Texts{"/volume9", mountPath_}));
-    EXPECT_EQ(TextsOf(world.errors), Texts{});
+    EXPECT_EQ(TextsOf(world.errors), Texts{"/volume9: is not mounted"});
 }
 
 TEST_F(WorldTest, WhatIsNoVolumeOrHasNoCacheIsToldAndUnknown) {

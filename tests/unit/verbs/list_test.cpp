@@ -28,6 +28,7 @@ protected:
             }
             return refused_ == inode ? -1 : 0;
         };
+        world_.isConfigKnown = true;
         world_.volumes.push_back(MakeVolume(volume_));
         BlockSetAdd(&*Volume1().marked, {1, 1});
     }
@@ -238,7 +239,7 @@ TEST_F(ListLookTest, ForRootExtentsThatCannotBeReadAreTheFilesState) {
     refused_ = Make("a", 1);
     Record({{static_cast<uint32_t>(refused_), "a"}});
     EXPECT_EQ(List({}, true), Texts{"a unreadable"});
-    EXPECT_EQ(Errors(), Texts{});
+    EXPECT_EQ(Errors(), Texts{volume_ + "/a: its blocks cannot be looked at"});
 }
 
 TEST_F(ListLookTest, WhoMayNotLookIsToldSo) {
@@ -249,7 +250,7 @@ TEST_F(ListLookTest, WhoMayNotLookIsToldSo) {
     chmod((volume_ + "/share").c_str(), 0700);
     const OrdinaryUser user;
     EXPECT_EQ(List({}, true), (Texts{"a unreadable", "share/b unreadable"}));
-    EXPECT_EQ(Errors(), (Texts{volume_ + "/a: its blocks cannot be looked at without more rights",
+    EXPECT_EQ(Errors(), (Texts{volume_ + "/a: Permission denied",
                                volume_ + "/share/b: Permission denied", "unknown"}));
     EXPECT_EQ(List({"share"}), Texts{"share/b unreadable"});
     EXPECT_EQ(Errors(), (Texts{volume_ + "/share/b: Permission denied",
@@ -257,6 +258,22 @@ TEST_F(ListLookTest, WhoMayNotLookIsToldSo) {
     EXPECT_EQ(List({"share/none"}), Texts{});
     EXPECT_EQ(Errors(), (Texts{volume_ + "/share/none: Permission denied", "unknown"}));
     EXPECT_EQ(result_.failedPaths, 1U);
+}
+
+TEST_F(ListLookTest, WithoutTheConfigurationNoFileHasAState) {
+    Make("share/a", 1);
+    world_.isConfigKnown = false;
+    EXPECT_EQ(List({"share"}), Texts{"share/a null 1/1"});
+    EXPECT_EQ(List({"share/a"}), Texts{"share/a null 1/1"});
+}
+
+TEST_F(ListLookTest, APathThatCannotBeLookedAtFailsOnce) {
+    ASSERT_EQ(symlink("loop", (volume_ + "/loop").c_str()), 0);
+    Record({{77, "loop/b"}});
+    EXPECT_EQ(List({"loop/a", "loop/b"}), Texts{"loop/b unreadable"});
+    EXPECT_EQ(result_.failedPaths, 2U);
+    EXPECT_EQ(Errors(), (Texts{volume_ + "/loop/a: Too many levels of symbolic links",
+                               volume_ + "/loop/b: Too many levels of symbolic links"}));
 }
 
 TEST_F(ListLookTest, OtherFileSystemsBelowAreNotListed) {

@@ -204,12 +204,16 @@ TEST_F(PlanSumTest, BlocksThatTheBitmapDoesNotHoldCostNothingNew) {
     EXPECT_EQ(figures.blocksNew, 1U);
 }
 
-TEST_F(PlanSumTest, WithoutADeviceThereAreNoBlocks) {
+TEST_F(PlanSumTest, OfADeviceOfUnknownSizeNoBlocksAreCounted) {
     volume_.volume.deviceBytes = std::nullopt;
     volume_.volume.marked = std::nullopt;
     PlanSum sum(volume_);
     sum.Add("a", MakeLook(7, {{1280, 8}}), false);
-    EXPECT_EQ(sum.Total(0).files, 1U);
+    const PlanFigures figures = sum.Total(0);
+    EXPECT_EQ(figures.files, 1U);
+    EXPECT_EQ(figures.blocks, std::nullopt);
+    EXPECT_EQ(figures.blocksNew, std::nullopt);
+    EXPECT_EQ(figures.roundingBytes, std::nullopt);
     EXPECT_EQ(&sum.World(), &volume_);
 }
 } // namespace vesk

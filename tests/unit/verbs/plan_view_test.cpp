@@ -65,6 +65,9 @@ TEST(PlanShowTest, ADocumentHasAllMembers) {
 
 TEST(PlanShowTest, WhatCannotBeHadIsNull) {
     PlanFigures figures = Figures();
+    figures.blocks = std::nullopt;
+    figures.blocksNew = std::nullopt;
+    figures.roundingBytes = std::nullopt;
     figures.ssdBlocks = std::nullopt;
     figures.marked = std::nullopt;
     figures.headroom = std::nullopt;
@@ -73,7 +76,7 @@ TEST(PlanShowTest, WhatCannotBeHadIsNull) {
     plan.volumes.push_back({"/volume1", figures});
     TextSink sink;
     PlanShowJson(plan, {}, sink);
-    EXPECT_NE(sink.Kept().find(R"("blocks":3,"blocksNew":null,"roundingBytes":-4096,)"
+    EXPECT_NE(sink.Kept().find(R"("blocks":null,"blocksNew":null,"roundingBytes":null,)"
                                R"("ssdBlocks":null,"blocksMarked":null,"headroomBlocks":null,)"
                                R"("fits":null,"requestsNeeded":1)"),
               std::string::npos)
@@ -111,7 +114,10 @@ TEST(PlanShowTest, TheRoomIsToldAsFarAsItIsKnown) {
     EXPECT_EQ(Room(figures), "  room    20 blocks (1.2 MiB) marked; the SSD's size is not known");
     figures.marked = std::nullopt;
     EXPECT_EQ(Room(figures), "  room    what is marked cannot be read");
+    figures.blocksNew = std::nullopt;
     EXPECT_NE(Table(figures).find("  cost    3 blocks (192 KiB)\n"), std::string::npos);
+    figures.blocks = std::nullopt;
+    EXPECT_NE(Table(figures).find("  cost    unknown\n"), std::string::npos);
 }
 
 TEST(PlanShowTest, ColourMarksTheVolumeAndTheVerdict) {
