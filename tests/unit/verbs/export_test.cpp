@@ -47,13 +47,20 @@ TEST_F(ExportTest, OnlyTheVolumesThatAreAskedFor) {
     settings_.volumes = {"/volume7", "/volume8"};
     EXPECT_EQ(Run(ExportCommand), 3);
     EXPECT_EQ(answer_, "/volume8/a\n");
-    const std::string away =
-        "veskpin: /volume8: is not mounted\nveskpin: /volume9: is not mounted\n";
-    EXPECT_EQ(said_, away + "veskpin: /volume7: is no volume\n");
+    EXPECT_EQ(said_, "veskpin: /volume7: is no volume\n");
     settings_.json = true;
     EXPECT_EQ(Run(ExportCommand), 3);
     EXPECT_TRUE(Answers(R"({"path":"/volume7","text":"is no volume"}]})"));
     EXPECT_EQ(said_, "");
+}
+
+TEST_F(ExportTest, WhatIsRecordedIsToldWhateverElseCannotBeLookedAt) {
+    Record(R"("5": "b", "x": "a")");
+    refused_ = {kPinIoctlQueryBitmapSet, BLKGETSIZE64};
+    EXPECT_EQ(Run(ExportCommand), 0);
+    EXPECT_EQ(answer_, mountPath_ + "/b\n");
+    EXPECT_EQ(said_,
+              "veskpin: " + config_ + ": volume " + mountPath_ + ": record \"x\" names no file\n");
 }
 
 TEST_F(ExportTest, AConfigurationThatCannotBeReadIsUnknown) {
