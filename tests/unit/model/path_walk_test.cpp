@@ -100,6 +100,19 @@ TEST_F(PathWalkTest, AFilesStatusComesWithIt) {
     EXPECT_EQ(met, 1);
 }
 
+TEST_F(PathWalkTest, WhatVanishesMeanwhileIsLeftOut) {
+    Make("a");
+    Make("b");
+    Make("c");
+    const FileLooker looker(volume_);
+    Texts met;
+    PathWalk(looker, "", [&](const WalkEntry &entry) {
+        met.push_back(entry.relativePath);
+        std::filesystem::remove(volume_ + "/b");
+    });
+    EXPECT_EQ(met, (Texts{"a", "c"}));
+}
+
 TEST_F(PathWalkTest, OtherFileSystemsAreNotEntered) {
     SKIP_WITHOUT_PRIVATE_WORLD();
     Make("a/file");

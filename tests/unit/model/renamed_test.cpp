@@ -69,6 +69,7 @@ TEST_F(RenamedTest, AFileThatLeftItsPathIsFoundByInodeAndBirth) {
     Record("a", moved, moved.birth);
     Record("b", stays, stays.birth);
     Rename("a", "share/now");
+    ASSERT_EQ(mkfifo((volume_ + "/fifo").c_str(), 0600), 0);
     EXPECT_EQ(Find(), (RenamedFiles{{Low(moved), "share/now"}}));
     Make("a"); // another file at the old path
     EXPECT_EQ(Find(), (RenamedFiles{{Low(moved), "share/now"}}));

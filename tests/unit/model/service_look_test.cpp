@@ -160,6 +160,33 @@ TEST_F(ServiceLookTest, NamespacesThatCannotBeToldAreNotTakenForOurs) {
     EXPECT_EQ(TextsOf(errors_), told);
 }
 
+// A folder in a file's place cannot be read, whoever asks.
+TEST_F(ServiceLookTest, AProcessThatCannotBeReadMayBeAService) {
+    proc_.AddService(100, Serving());
+    std::filesystem::create_directories(proc_.Path("200/comm"));
+    const Texts told{proc_.Path() + ": not every process can be looked at: Invalid argument",
+                     "unknown"};
+    EXPECT_EQ(Seen(), Pids{100});
+    EXPECT_EQ(TextsOf(errors_), told);
+    std::filesystem::remove_all(proc_.Path("200"));
+    std::filesystem::remove(proc_.Path("100/status"));
+    std::filesystem::create_directories(proc_.Path("100/status"));
+    EXPECT_EQ(Seen(), Pids{});
+    EXPECT_EQ(TextsOf(errors_), told);
+}
+
+TEST_F(ServiceLookTest, AThreadThatCannotBeReadMayBeTheWorker) {
+    proc_.AddService(100, Serving());
+    std::filesystem::remove(proc_.Path("100/task/101/stat"));
+    std::filesystem::create_directories(proc_.Path("100/task/101/stat"));
+    EXPECT_EQ(Look().at(0).worker, std::nullopt);
+    EXPECT_EQ(
+        TextsOf(errors_),
+        (Texts{
+            proc_.Path("100") + ": what the service and its threads do cannot be seen, or not yet",
+            proc_.Path() + ": not every process can be looked at: Invalid argument", "unknown"}));
+}
+
 TEST_F(ServiceLookTest, WithoutTheRightToLookThereIsNoAnswer) {
     SKIP_WITHOUT_ROOT();
     proc_.AddService(100, Serving());

@@ -1,3 +1,4 @@
+#include "tests/support/private_world.h"
 #include "tests/unit/verbs/commands_fixture.h"
 
 #include <cstdlib>
@@ -51,6 +52,18 @@ TEST_F(StatusCommandTest, VolumesStandThereInTheOrderInWhichTheyWereAskedForAndO
     EXPECT_NE(first, std::string::npos) << answer_;
     EXPECT_EQ(answer_.find(R"({"volume":"/volume9")", first + 1), std::string::npos) << answer_;
     EXPECT_GT(answer_.find(R"({"volume":")" + mountPath_), first);
+}
+
+TEST_F(StatusCommandTest, AHeldVolumeIsShownAsSuch) {
+    SKIP_WITHOUT_PRIVATE_WORLD();
+    std::filesystem::create_directories("/run/veskpin");
+    WriteWhole(VolumeHoldNote("uuid-1"), "");
+    Run(StatusCommand);
+    EXPECT_TRUE(Answers("  held\n")) << answer_;
+    settings_.json = true;
+    Run(StatusCommand);
+    EXPECT_TRUE(Answers(R"("held":true}])")) << answer_;
+    std::filesystem::remove_all("/run/veskpin");
 }
 
 TEST_F(ListCommandTest, IsDoneWhereAllIsPinned) {
