@@ -137,6 +137,7 @@ std::optional<CommandLine> CommandLineRead(int argc, char *argv[], TextSink &out
     try {
         const std::vector<std::string> arguments = NamesLeftAlone(argc, argv);
         std::vector<const char *> pointers;
+        pointers.reserve(arguments.size());
         for (const std::string &argument : arguments) {
             pointers.push_back(argument.c_str());
         }
