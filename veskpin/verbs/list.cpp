@@ -214,8 +214,7 @@ void ListTarget(const Target &target, bool search, World &world, const Visit &vi
     const KnownFiles &known = target.volume->known;
     const auto below = KnownFilesBelow(known, target.relativePath);
     const bool isFolder = target.status && S_ISDIR(target.status->mode);
-    const bool isHidden =
-        target.error != 0 && target.error != ENOENT && target.error != ENOTDIR;
+    const bool isHidden = target.error != 0 && target.error != ENOENT && target.error != ENOTDIR;
     if (isHidden) {
         NoteFailedPath(target, strerror(target.error), world.errors, result);
     }

@@ -11,11 +11,11 @@ ANSWER=/tmp/answer.json
 look() {
     local status=0
     veskpin --json "${@:2}" >"$ANSWER" 2>/tmp/errors || status=$?
-    [ "$status" -eq "$1" ] && [ ! -s /tmp/errors ] || {
+    if [ "$status" -ne "$1" ] || [ -s /tmp/errors ]; then
         echo "status $status, expected $1, of: ${*:2}"
         cat /tmp/errors "$ANSWER"
         return 1
-    }
+    fi
     check_schema "$2"
 }
 
@@ -33,6 +33,7 @@ END
 answer() { jq -c "${@:2}" "$1" "$ANSWER"; }
 
 # state_of PATH: its state in the last look's list.
+# shellcheck disable=SC2016
 state_of() { answer '.files[] | select(.path == $path) | .state' --arg path "$1" -r; }
 
 # shows STATUS COMMAND [ARGUMENT...]: for people; exactly standard input, and ERRORS on standard error.

@@ -53,7 +53,7 @@ TEST(ProgressTest, ATerminalGetsALineAfterASecondWhichIsClearedAtTheEnd) {
 }
 
 TEST(ProgressTest, NothingIsWrittenWhereNobodyWantsIt) {
-    EXPECT_EQ(Written(ProgressForm::None, 500, 1100000), "");
+    EXPECT_EQ(Written(ProgressForm::None, 500, 250000), "");
 }
 
 TEST(ProgressTest, FormsGoByTheirNames) {
