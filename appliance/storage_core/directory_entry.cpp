@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <ctime>
 #include <limits>
 #include <memory>
 #include <mutex>
@@ -26,19 +27,23 @@ bool MayBeRegularFile(const dirent &entry) {
 // other, and reading a large folder takes long.
 class FolderScan {
 public:
-    // Whether these are the folder's files still. A change in the same tick of the file system's
-    // clock as the scan shows in neither time: who does not find a file here, or another one under
-    // its name, scans again.
     bool IsOf(const struct stat &folder) const {
-        return !entries_.empty() && folder.st_dev == status_.st_dev &&
-               folder.st_ino == status_.st_ino && IsEqual(folder.st_mtim, status_.st_mtim) &&
+        return isRead_ && folder.st_dev == status_.st_dev && folder.st_ino == status_.st_ino;
+    }
+    // Whether these are the folder's files still.
+    bool IsAsItWas(const struct stat &folder) const {
+        return IsOf(folder) && IsEqual(folder.st_mtim, status_.st_mtim) &&
                IsEqual(folder.st_ctim, status_.st_ctim);
     }
+    // Whether a change since the scan would show in the folder's times: one in the same tick of the
+    // file system's clock does not.
+    bool IsSettled() const { return readAt_ - status_.st_ctim.tv_sec > kTickSeconds; }
     // `folder` is its status from before.
     void Read(int fd, const struct stat &folder) {
         entries_.clear();
         names_.clear();
-        status_ = {}; // of no folder, until all is read
+        isRead_ = false; // of no folder, until all is read
+        readAt_ = time(nullptr);
         ScopedFd again(openat(fd, ".", kOpenForReading | O_DIRECTORY));
         const std::unique_ptr<DIR, Deleter<closedir>> stream(fdopendir(again.Get()));
         if (stream == nullptr) {
@@ -55,6 +60,7 @@ public:
         if (errno == 0) {
             std::stable_sort(entries_.begin(), entries_.end(), IsBefore);
             status_ = folder;
+            isRead_ = true;
         }
     }
     bool Search(InodeSearch &search) const {
@@ -78,24 +84,40 @@ private:
     static bool IsEqual(const timespec &a, const timespec &b) {
         return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
     }
+    static constexpr time_t kTickSeconds = 2;
+    bool isRead_ = false;
+    time_t readAt_ = 0;
     struct stat status_ = {};
     std::vector<Entry> entries_;
     std::string names_; // each with its NUL
 };
 
-// Looks for the file in the folder, or only in what is remembered of it; `status` becomes the
-// folder's.
-bool SearchFolder(int folder, bool remembered, struct stat &status, InodeSearch &search) {
+struct FolderAnswer {
+    dev_t device = 0; // of the folder
+    bool isFound = false;
+    bool isLast = true; // reading the folder anew would show nothing else
+};
+
+// Looks for the file in the folder, or only in what is remembered of it. Who finds a file there
+// looks at it himself, so that what is remembered may be old: a folder in which something changes
+// all the time need not be read for each of its files. But that no other file has the same low 32
+// bits is known of the folder as it was only.
+FolderAnswer SearchFolder(int folder, bool remembered, InodeSearch &search) {
     static std::mutex lock; // guards lastScan
     static auto *lastScan = new FolderScan;
+    struct stat status = {};
     if (fstat(folder, &status) != 0) {
-        return false;
+        return {};
     }
     const std::lock_guard<std::mutex> guard(lock);
     if (!remembered) {
         lastScan->Read(folder, status);
+        return {status.st_dev, lastScan->IsOf(status) && lastScan->Search(search), true};
     }
-    return lastScan->IsOf(status) && lastScan->Search(search);
+    const bool isAsItWas = lastScan->IsAsItWas(status);
+    const bool isFound = lastScan->IsOf(status) && lastScan->Search(search);
+    return {status.st_dev, isFound && (isAsItWas || search.isExact),
+            isAsItWas && lastScan->IsSettled()};
 }
 
 ScopedFd OpenFound(int folder, dev_t device, const InodeSearch &search) {
@@ -137,12 +159,15 @@ ScopedFd DirectoryOpenFile(int folder, uint64_t inode) {
     for (const bool remembered : {true, false}) {
         InodeSearch search;
         search.wanted = inode;
-        struct stat status = {};
-        if (SearchFolder(folder, remembered, status, search)) {
-            ScopedFd file = OpenFound(folder, status.st_dev, search);
+        const FolderAnswer answer = SearchFolder(folder, remembered, search);
+        if (answer.isFound) {
+            ScopedFd file = OpenFound(folder, answer.device, search);
             if (file.IsOpen()) {
                 return file;
             }
+        }
+        if (answer.isLast) {
+            break;
         }
     }
     return ScopedFd();

@@ -8,18 +8,21 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
+#include <set>
 
 namespace vesk {
 namespace {
 using Problems = std::vector<std::string>;
 
-// A member that must be of this type, or null where it is absent or of another one.
+// A member that must be of this type, or null where it is absent or of another one, which clears
+// `*isKnown`.
 const Json::Value &Member(const Json::Value &object, const char *name, Json::ValueType type,
-                          const std::string &place, Problems *problems) {
+                          const std::string &place, bool *isKnown, Problems *problems) {
     const Json::Value &member = object[name];
     if (member.isNull() || member.type() == type) {
         return member;
     }
+    *isKnown = false;
     problems->push_back(place + "\"" + name + "\" has another type than it should have");
     return Json::Value::nullSingleton();
 }
@@ -48,17 +51,20 @@ RecordedVolume VolumeOf(const std::string &mountPath, const Json::Value &value,
     RecordedVolume volume;
     volume.mountPath = mountPath;
     const std::string place = "volume " + mountPath + ": ";
-    const Json::Value &files = Member(value, "files", Json::objectValue, place, problems);
+    const Json::Value &files =
+        Member(value, "files", Json::objectValue, place, &volume.areFilesKnown, problems);
     volume.files.reserve(files.size());
     for (auto file = files.begin(); file != files.end(); ++file) {
         RecordedFile record{};
         if (!ParseInode(file.name(), &record.inode) || !TextOf(*file, &record.relativePath) ||
             record.relativePath.empty() || record.relativePath.find('\0') != std::string::npos) {
             problems->push_back(place + "record \"" + file.name() + "\" names no file");
+            volume.isWhole = false;
             continue;
         }
         volume.files.push_back(std::move(record));
     }
+    volume.isWhole = volume.isWhole && volume.areFilesKnown;
     std::sort(volume.files.begin(), volume.files.end(),
               [](const RecordedFile &a, const RecordedFile &b) {
                   return a.relativePath != b.relativePath ? a.relativePath < b.relativePath
@@ -86,14 +92,19 @@ void AddVolumes(const Json::Value &volumes, ConfigRecords *records) {
             records->volumes.push_back(VolumeOf(volume.name(), *volume, &records->problems));
         } else if (!volume->isNull()) {
             records->problems.push_back("volume " + volume.name() + " is no object");
+            records->volumes.push_back({volume.name(), {}, false, false});
         }
     }
 }
 
 void AddRequests(const Json::Value &queue, const Json::Value &requests, ConfigRecords *records) {
+    std::set<std::string> queued;
     for (const Json::Value &element : queue) {
         StoredRequest request;
-        if (!TextOf(element, &request.number)) {
+        if (TextOf(element, &request.number)) {
+            queued.insert(request.number);
+        }
+        if (request.number.empty()) {
             records->problems.emplace_back("\"requestQueue\" holds what is no number of a request");
         } else if (!RequestOf(requests[request.number], &request)) {
             records->problems.push_back("request " + request.number + " cannot be used");
@@ -102,10 +113,7 @@ void AddRequests(const Json::Value &queue, const Json::Value &requests, ConfigRe
         }
     }
     for (const std::string &number : requests.getMemberNames()) {
-        const bool isQueued = std::any_of(queue.begin(), queue.end(), [&](const Json::Value &it) {
-            return it.isConvertibleTo(Json::stringValue) && it.asString() == number;
-        });
-        if (!isQueued) {
+        if (queued.count(number) == 0) {
             records->problems.push_back("request " + number + " is not in \"requestQueue\"");
         }
     }
@@ -127,9 +135,13 @@ int ConfigReadRecords(const char *configPath, ConfigRecords *records) {
         return -1;
     }
     Problems *problems = &records->problems;
-    AddVolumes(Member(root, "volumes", Json::objectValue, "", problems), records);
-    const Json::Value &queue = Member(root, "requestQueue", Json::arrayValue, "", problems);
-    AddRequests(queue, Member(root, "requests", Json::objectValue, "", problems), records);
+    AddVolumes(Member(root, "volumes", Json::objectValue, "", &records->areVolumesKnown, problems),
+               records);
+    bool *areRequestsKnown = &records->areRequestsKnown;
+    const Json::Value &queue =
+        Member(root, "requestQueue", Json::arrayValue, "", areRequestsKnown, problems);
+    AddRequests(queue, Member(root, "requests", Json::objectValue, "", areRequestsKnown, problems),
+                records);
     return 0;
 }
 } // namespace vesk

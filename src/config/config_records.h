@@ -18,6 +18,8 @@ struct RecordedFile {
 struct RecordedVolume {
     std::string mountPath;
     std::vector<RecordedFile> files; // in ascending order of their paths
+    bool areFilesKnown = true;       // false: it has no list of files, but something else
+    bool isWhole = true;             // false: some of its records cannot be used
 };
 
 struct StoredRequest {
@@ -31,6 +33,8 @@ struct ConfigRecords {
     bool isMissing = false;              // no file: an empty document
     std::vector<RecordedVolume> volumes; // in ascending order of their mount paths
     std::vector<StoredRequest> requests; // in the order of service
+    bool areVolumesKnown = true;         // false: in their place is something else
+    bool areRequestsKnown = true;        // the same
     std::vector<std::string> problems;   // what cannot be used, a text each
 };
 

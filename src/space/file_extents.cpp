@@ -38,9 +38,10 @@ FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path) {
     return device;
 }
 
-int FileExtentsAsk(FileSystemDevice &device, const std::string &filePath, uint32_t inode,
+int FileExtentsAsk(FileSystemDevice &device, const std::string &filePath, uint64_t inode,
                    FileMappingTable *table) {
-    return device.GetMappingByInode(DirectoryOf(filePath), inode, *table) < 0 ? -1 : 0;
+    const std::string directory = filePath.substr(0, filePath.rfind('/'));
+    return device.GetMappingByInode(directory, inode, *table) < 0 ? -1 : 0;
 }
 
 int GetMappingTableFromFile(FileMappingTable *table, const char *mountPath,

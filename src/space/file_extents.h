@@ -14,7 +14,7 @@ FileSystemDevice *CreateFileSystemDeviceByFilePath(const std::string &path);
 
 // Asks once for the extents of the file with this inode number in filePath's folder. 0, and then an
 // empty table: nothing of the file has a place on the device; or -1 without a message.
-int FileExtentsAsk(FileSystemDevice &device, const std::string &filePath, uint32_t inode,
+int FileExtentsAsk(FileSystemDevice &device, const std::string &filePath, uint64_t inode,
                    FileMappingTable *table);
 
 // The same for a request that is carried out, which waits about ten seconds for a file whose data

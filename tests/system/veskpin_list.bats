@@ -237,7 +237,7 @@ END
     same 2 "$status"
     status=0
     veskpin metrics --output /nowhere/file 2>/tmp/errors || status=$?
-    same "1 veskpin: /nowhere/file cannot be written" "$status $(cat /tmp/errors)"
+    same "1 veskpin: /nowhere/file: No such file or directory" "$status $(cat /tmp/errors)"
     stop_service
 }
 

@@ -180,9 +180,11 @@ worker_is_told_ended() {
     same '[null,null,null]' "$(answer '[.storedRequests,.volumes[0].files,.volumes[0].requests]')"
     same '{"volumes":' "$(cat "$CONF")"
     put_config '{"volumes":{"/volume1":{"files":{"12":"a","x":"b","13":[]}},"/volume2":7},"requestQueue":{}}'
+    look 3 status
+    same '[1,null,null]' "$(answer '[.volumes[0].files,.volumes[1].files,.storedRequests]')"
+    put_config '{"volumes":{"/volume1":{"files":{"12":"a","x":"b","13":[]}}}}'
     look 0 status
-    same 1 "$(volume files)"
-    same 4 "$(answer '.errors | length')"
+    same '[1,2]' "$(answer '[.volumes[0].files,(.errors | length)]')"
 }
 
 @test "a bitmap of the wrong length is shown as far as it counts" {

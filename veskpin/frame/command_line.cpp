@@ -101,6 +101,14 @@ std::string FaultOf(Given &given) {
         if (path.empty()) {
             return "an empty PATH";
         }
+        if (path.find('\0') != std::string::npos) {
+            return "a PATH with a NUL: the list is NUL-separated, use -0";
+        }
+    }
+    for (const std::string &volume : settings.volumes) {
+        if (volume.empty() || volume[0] != '/') {
+            return "a VOLUME is an absolute mount path, not \"" + TextEscaped(volume) + "\"";
+        }
     }
     return "";
 }

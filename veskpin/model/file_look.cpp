@@ -22,7 +22,11 @@ int FileStatAt(int folder, const char *name, FileStat *status) {
     const int flags = AT_SYMLINK_NOFOLLOW | AT_NO_AUTOMOUNT | AT_STATX_DONT_SYNC |
                       (*name == '\0' ? AT_EMPTY_PATH : 0);
     if (statx(folder, name, flags, kWanted, &answer) != 0) {
-        return errno;
+        const int error = errno;
+        // A user's own mount refuses even root. Whether it is one needs no question to it.
+        const bool isMount = error == EACCES && statx(folder, name, flags, 0, &answer) == 0 &&
+                             (answer.stx_attributes & STATX_ATTR_MOUNT_ROOT) != 0;
+        return isMount ? EXDEV : error;
     }
     const bool hasBirth = (answer.stx_mask & STATX_BTIME) != 0;
     *status = {answer.stx_ino, answer.stx_size, answer.stx_mode,
@@ -57,7 +61,7 @@ int FileLooker::OpenFolder(const std::string &folder) {
 void FileLooker::AskExtents(const std::string &relativePath) {
     look_.hasExtents = extents_ != nullptr && S_ISREG(look_.status.mode) &&
                        FileExtentsAsk(*extents_, mountPath_ + "/" + relativePath,
-                                      static_cast<uint32_t>(look_.status.inode), &look_.table) == 0;
+                                      look_.status.inode, &look_.table) == 0;
     if (look_.hasExtents) {
         look_.blocks = FileBlocksOf(look_.table);
     }

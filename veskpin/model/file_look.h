@@ -28,7 +28,7 @@ struct FileStat {
 };
 
 // Of an entry of an open folder, not of a link's target; asks no file system that answers when it
-// likes. 0 or an errno.
+// likes. 0 or an errno; EXDEV for the mount point of a file system that refuses to be asked.
 int FileStatAt(int folder, const char *name, FileStat *status);
 
 struct FileLook {

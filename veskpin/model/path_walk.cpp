@@ -44,6 +44,19 @@ WalkKind KindOf(const FileStat &status, dev_t device) {
     }
     return S_ISREG(status.mode) ? WalkKind::File : WalkKind::Other;
 }
+
+// A folder that is being walked, with the names of those below it that are still to come, the next
+// one last.
+struct Level {
+    std::string path;
+    std::vector<std::string> folders;
+};
+
+std::string PathOf(const std::string &folder, const std::string &name) {
+    std::string path = folder;
+    path.append(folder.empty() ? "" : "/").append(name);
+    return path;
+}
 } // namespace
 
 void PathWalk(const FileLooker &looker, const std::string &folder,
@@ -52,36 +65,46 @@ void PathWalk(const FileLooker &looker, const std::string &folder,
         visit({folder, WalkKind::Unreadable, {}, looker.Error()});
         return;
     }
-    std::vector<std::string> waiting{folder}; // the next one last
-    while (!waiting.empty()) {
-        const std::string here = std::move(waiting.back());
-        waiting.pop_back();
+    // Names by levels, not paths: users make folders of any number in folders of any depth.
+    std::vector<Level> levels{{"", {folder}}};
+    while (!levels.empty()) {
+        Level &level = levels.back();
+        if (level.folders.empty()) {
+            levels.pop_back();
+            continue;
+        }
+        const std::string here = PathOf(level.path, level.folders.back());
+        level.folders.pop_back();
         errno = 0;
         const ScopedFd fd = FolderOpenBeneath(looker.Root(), here);
         std::vector<std::string> names;
         const int error = fd.IsOpen() ? NamesIn(fd.Get(), &names) : errno != 0 ? errno : ENOENT;
+        if (error == ENOENT && levels.size() > 1) {
+            continue; // gone since its name was read
+        }
         if (error != 0) {
             visit({here, WalkKind::Unreadable, {}, error});
         }
-        std::vector<std::string> folders;
+        Level next{here, {}};
         for (const std::string &name : names) {
-            std::string path = here;
-            path.append(here.empty() ? "" : "/").append(name);
+            const std::string path = PathOf(here, name);
             FileStat status{};
             const int failure = FileStatAt(fd.Get(), name.c_str(), &status);
             if (failure == ENOENT) {
-                continue; // gone since its name was read
+                continue;
             }
-            if (failure != 0) {
+            if (failure == EXDEV) {
+                visit({path, WalkKind::OtherFileSystem, {}, 0});
+            } else if (failure != 0) {
                 visit({path, WalkKind::Unreadable, {}, failure});
             } else if (S_ISDIR(status.mode) && status.device == looker.Device()) {
-                folders.push_back(path);
+                next.folders.push_back(name);
             } else {
                 visit({path, KindOf(status, looker.Device()), status, 0});
             }
         }
-        waiting.insert(waiting.end(), std::make_move_iterator(folders.rbegin()),
-                       std::make_move_iterator(folders.rend()));
+        std::reverse(next.folders.begin(), next.folders.end());
+        levels.push_back(std::move(next));
     }
 }
 } // namespace vesk

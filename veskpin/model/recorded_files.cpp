@@ -56,17 +56,22 @@ KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
             KnownFile{path, std::nullopt, 0}, IsBefore);
         for (auto file = first; file != last; ++file) {
             file->stored = request.first;
+            file->storedInode = request.second;
         }
         if (first == last) {
-            known.files.push_back({path, std::nullopt, request.first});
+            known.files.push_back({path, std::nullopt, request.first, request.second});
         }
     }
     std::inplace_merge(known.files.begin(),
                        known.files.begin() + static_cast<std::ptrdiff_t>(recorded),
                        known.files.end(), IsBefore);
     for (size_t i = 0; i < known.files.size(); ++i) {
-        if (known.files[i].inode) {
-            known.byInode.emplace_back(*known.files[i].inode, i);
+        const KnownFile &file = known.files[i];
+        if (file.inode) {
+            known.byInode.emplace_back(*file.inode, i);
+        }
+        if (file.storedInode && file.storedInode != file.inode) {
+            known.byInode.emplace_back(*file.storedInode, i);
         }
     }
     std::sort(known.byInode.begin(), known.byInode.end());

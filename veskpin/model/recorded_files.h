@@ -15,17 +15,21 @@
 namespace vesk {
 struct KnownFile {
     std::string relativePath;
-    std::optional<uint32_t> inode; // the recorded one, absent where there is only a request
-    int stored = kRequestUnknown;  // the last stored request for it: pin, unpin or none
+    std::optional<uint32_t> inode;       // the recorded one, absent where there is only a request
+    int stored = kRequestUnknown;        // the last stored request for it: pin, unpin or none
+    std::optional<uint32_t> storedInode = std::nullopt; // that the request names
 };
 
 // In ascending order of paths; a path stands there once for each inode recorded under it, since a
 // file that was replaced and pinned again leaves its old record.
 struct KnownFiles {
     std::vector<KnownFile> files;
-    uint64_t recorded = 0;                            // records
-    uint64_t requests = 0;                            // stored requests of the volume
-    std::vector<std::pair<uint32_t, size_t>> byInode; // recorded inode, index in `files`; sorted
+    uint64_t recorded = 0; // records
+    uint64_t requests = 0; // stored requests of the volume
+    std::vector<std::pair<uint32_t, size_t>>
+        byInode;                 // inode, recorded or in a request, and index in `files`; sorted
+    bool isRecordedKnown = true; // false: how many records there are cannot be told
+    bool isWhole = true;         // false: a file that is not here may be known all the same
     std::vector<std::string> problems;
 };
 

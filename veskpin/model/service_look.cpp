@@ -238,7 +238,7 @@ bool IsYoung(const Thread &leader, const std::string &procFolder) {
 
 // The worker waits while nothing is stored that it could carry out. What it sleeps for, between two
 // requests or for want of one, does not show in its thread.
-std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const Service &service,
+std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const std::string &config,
                                      const std::set<std::string> &heldVolumes,
                                      const std::string &procFolder) {
     const bool isThere = std::any_of(threads.begin(), threads.end(), [](const Thread &thread) {
@@ -249,7 +249,7 @@ std::optional<ThreadLook> WorkerLook(const std::vector<Thread> &threads, const S
                                                     : std::optional(ThreadLook::Ended);
     }
     ConfigRecords records;
-    if (!service.config || ConfigReadRecords(service.config->c_str(), &records) < 0) {
+    if (config.empty() || ConfigReadRecords(config.c_str(), &records) < 0) {
         LookLogTake("");
         return std::nullopt;
     }
@@ -270,6 +270,14 @@ bool IsTrusted(const std::string &process, int *error) {
     const size_t effective = status.find('\t', found + title.size());
     const unsigned long user = strtoul(status.c_str() + effective + 1, nullptr, 10);
     return effective != std::string::npos && (user == 0 || user == geteuid());
+}
+
+// Whether the program that runs is the tool, as far as it may be asked: anybody can call a program
+// of root's by another name.
+bool IsToolsProgram(const Thread &thread) {
+    const auto program = LinkText(thread.folder + "/exe");
+    const std::string name = program ? program->substr(program->rfind('/') + 1) : kToolName;
+    return name.compare(0, strlen(kToolName), kToolName) == 0;
 }
 
 // The process's threads and what one that lives was asked for, where it is a service of ours;
@@ -294,6 +302,9 @@ std::optional<ServiceProcess> ServiceProcessOf(pid_t pid, const std::string &pro
         return std::nullopt;
     }
     found.living = *living;
+    if (!IsToolsProgram(*living)) {
+        return std::nullopt;
+    }
     found.asked = AskedBy(ArgumentsOf(*living, error));
     return found.asked.serves ? std::optional(found) : std::nullopt;
 }
@@ -307,9 +318,17 @@ Service ServiceOf(pid_t pid, const ServiceProcess &process,
         service.config = AbsoluteConfig(process.living, *process.asked.config);
     }
     service.otherNamespaces = OtherNamespaces(process.living, procFolder);
+    const auto &others = service.otherNamespaces;
+    const bool seesOtherFiles =
+        others && std::find(others->begin(), others->end(), "mnt") != others->end();
     service.receiver = ReceiverLook(process.threads.front());
     if (process.error == 0) {
-        service.worker = WorkerLook(process.threads, service, heldVolumes, procFolder);
+        service.worker =
+            WorkerLook(process.threads,
+                       service.config ? (seesOtherFiles ? process.living.folder + "/root" : "") +
+                                            *service.config
+                                      : "",
+                       heldVolumes, procFolder);
     }
     if (!service.config || !service.receiver || !service.worker || !service.otherNamespaces) {
         LookUnknownAdd(errors, procFolder + "/" + std::to_string(pid),

@@ -42,6 +42,19 @@ std::string Absolute(const std::string &path) {
     return (folder ? std::string(folder.get()) : "") + "/" + path;
 }
 
+// False with errno, where the folder cannot be resolved.
+bool TryResolve(const std::string &folder, const std::string &rest, std::string *path) {
+    const MallocText resolved(realpath(folder.c_str(), nullptr));
+    if (!resolved) {
+        return false;
+    }
+    *path = resolved.get();
+    if (!rest.empty()) {
+        *path += (*path == "/" ? "" : "/") + rest;
+    }
+    return true;
+}
+
 // The folders resolved, the last component as it is. 0 or an errno; then by the text alone.
 int Resolve(const std::string &given, std::string *path) {
     std::string text = Absolute(given);
@@ -49,18 +62,23 @@ int Resolve(const std::string &given, std::string *path) {
     const size_t slash = text.rfind('/');
     const std::string name = slash == std::string::npos ? "" : text.substr(slash + 1);
     const bool isName = !name.empty() && name != "." && name != "..";
-    const std::string folder = isName ? text.substr(0, slash + 1) : text + "/";
-    const MallocText resolved(realpath(folder.c_str(), nullptr));
-    if (!resolved) {
-        const int error = errno;
-        *path = Normalized(text);
-        return error;
+    std::string folder = isName ? text.substr(0, slash + 1) : text + "/";
+    std::string rest = isName ? name : "";
+    int error = 0;
+    // Of a path that leads nowhere what is there is resolved: records may name it still.
+    while (!TryResolve(folder, rest, path)) {
+        error = errno;
+        folder.erase(folder.find_last_not_of('/') + 1);
+        const size_t last = folder.rfind('/');
+        if ((error != ENOENT && error != ENOTDIR) || last == std::string::npos) {
+            *path = Normalized(text);
+            return error;
+        }
+        rest = folder.substr(last + 1) + (rest.empty() ? "" : "/") + rest;
+        folder.erase(last + 1);
     }
-    *path = resolved.get();
-    if (isName) {
-        *path += (*path == "/" ? "" : "/") + name;
-    }
-    return 0;
+    *path = error == 0 ? *path : Normalized(*path);
+    return error;
 }
 
 // Whether `path` is the folder or lies below it; what lies below in `*rest`.

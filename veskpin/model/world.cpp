@@ -17,6 +17,8 @@ ConfigRecords ReadRecords(World *world) {
     for (const std::string &problem : records.problems) {
         LookErrorAdd(&world->errors, world->configPath, problem);
     }
+    world->errors.isUnknown =
+        world->errors.isUnknown || !records.areVolumesKnown || !records.areRequestsKnown;
     return records;
 }
 
@@ -39,13 +41,20 @@ std::set<std::string> PathsNamed(const ConfigRecords &records) {
     return paths;
 }
 
-void AddVolume(World *world, Volume volume, ConfigRecords *records) {
+void AddVolume(World *world, Volume volume, LookErrors errors, ConfigRecords *records) {
     WorldVolume added;
-    added.known =
-        KnownFilesOf(volume.mountPath, RecordsOf(records, volume.mountPath), records->requests);
-    for (const std::string &problem : added.known.problems) {
-        LookErrorAdd(&world->errors, world->configPath, problem);
+    RecordedVolume *recorded = RecordsOf(records, volume.mountPath);
+    added.known = KnownFilesOf(volume.mountPath, recorded, records->requests);
+    KnownFiles &known = added.known;
+    known.isRecordedKnown = world->isConfigKnown && records->areVolumesKnown &&
+                            (recorded == nullptr || recorded->areFilesKnown);
+    known.isWhole = known.isRecordedKnown && records->areRequestsKnown && known.problems.empty() &&
+                    (recorded == nullptr || recorded->isWhole);
+    for (const std::string &problem : known.problems) {
+        LookErrorAdd(&errors, world->configPath, problem);
     }
+    errors.isUnknown = errors.isUnknown || !known.isRecordedKnown;
+    added.errors = std::move(errors);
     added.volume = std::move(volume);
     world->volumes.push_back(std::move(added));
 }
@@ -56,32 +65,38 @@ World WorldLook(const std::string &configPath) {
     world.configPath = configPath;
     LookLogTake("");
     ConfigRecords records = ReadRecords(&world);
-    world.storedRequests = records.requests.size();
+    if (world.isConfigKnown && records.areRequestsKnown) {
+        world.storedRequests = records.requests.size();
+    }
     std::set<std::string> named = PathsNamed(records);
     SpaceCause cause = SpaceCause::Found;
     const std::vector<SpaceEntry> spaces = SpaceList(&cause);
-    if (cause != SpaceCause::Found) {
+    world.areVolumesKnown = cause == SpaceCause::Found;
+    if (!world.areVolumesKnown) {
         LookUnknownAdd(&world.errors, "", LookLogTake("the volumes cannot be listed"));
     }
     for (const SpaceEntry &space : spaces) {
         if (space.referencePath.empty()) {
             continue; // mounted nowhere
         }
-        Volume volume = VolumeLook(space, &world.errors);
+        LookErrors errors;
+        Volume volume = VolumeLook(space, &errors);
         const bool isNamed = named.erase(volume.mountPath) != 0;
         // Whether it has one is not known without its UUID.
-        world.errors.isUnknown = world.errors.isUnknown || (isNamed && !volume.uuid);
+        errors.isUnknown = errors.isUnknown || (isNamed && !volume.uuid);
         if (!isNamed && !volume.hasCache) {
             world.withoutCache.push_back(volume.mountPath);
         } else {
-            AddVolume(&world, std::move(volume), &records);
+            AddVolume(&world, std::move(volume), std::move(errors), &records);
         }
     }
     for (const std::string &mountPath : named) {
         Volume volume;
         volume.mountPath = mountPath;
-        LookErrorAdd(&world.errors, mountPath, "is not mounted");
-        AddVolume(&world, std::move(volume), &records);
+        LookErrors errors;
+        LookErrorAdd(&errors, mountPath,
+                     world.areVolumesKnown ? "is not mounted" : "cannot be found");
+        AddVolume(&world, std::move(volume), std::move(errors), &records);
     }
     std::sort(world.volumes.begin(), world.volumes.end(),
               [](const WorldVolume &a, const WorldVolume &b) {
@@ -98,11 +113,19 @@ const WorldVolume *WorldVolumeFind(const World &world, const std::string &mountP
     return found == world.volumes.end() ? nullptr : &*found;
 }
 
+void WorldVolumeUse(World &world, const WorldVolume &volume) {
+    for (const LookError &error : volume.errors.list) {
+        LookErrorAdd(&world.errors, error.path, error.text);
+    }
+    world.errors.isUnknown = world.errors.isUnknown || volume.errors.isUnknown;
+}
+
 std::vector<const WorldVolume *> WorldVolumesWanted(World &world,
                                                     const std::vector<std::string> &wanted) {
     std::vector<const WorldVolume *> volumes;
     if (wanted.empty()) {
         for (const WorldVolume &volume : world.volumes) {
+            WorldVolumeUse(world, volume);
             volumes.push_back(&volume);
         }
         return volumes;
@@ -113,7 +136,10 @@ std::vector<const WorldVolume *> WorldVolumesWanted(World &world,
             mountPath.pop_back();
         }
         if (const WorldVolume *volume = WorldVolumeFind(world, mountPath)) {
-            if (volume->volume.isMounted && !volume->volume.hasCache) {
+            WorldVolumeUse(world, *volume);
+            if (!volume->volume.isMounted) {
+                world.errors.isUnknown = true;
+            } else if (!volume->volume.hasCache) {
                 LookUnknownAdd(&world.errors, mountPath, "has no cache");
             }
             if (std::find(volumes.begin(), volumes.end(), volume) == volumes.end()) {

@@ -1,6 +1,9 @@
 #include "model/world.h"
+#include "text/escape.h"
 #include "verbs/answer.h"
 #include "verbs/verbs.h"
+
+#include <unistd.h>
 
 #include <algorithm>
 
@@ -34,7 +37,7 @@ void ExportJson(const std::vector<const WorldVolume *> &volumes, const LookError
     AnswerEnd(json, out, errors);
 }
 
-// What is recorded can be told whatever else could not be looked at.
+// What is recorded can be told whatever has become of mounts and caches.
 void KeepConfigErrors(World *world) {
     auto &list = world->errors.list;
     list.erase(
@@ -42,6 +45,12 @@ void KeepConfigErrors(World *world) {
                        [&](const LookError &error) { return error.path != world->configPath; }),
         list.end());
     world->errors.isUnknown = !world->isConfigKnown;
+    for (WorldVolume &volume : world->volumes) {
+        volume.errors = {};
+        volume.errors.isUnknown = !volume.known.isRecordedKnown;
+        volume.volume.isMounted = true;
+        volume.volume.hasCache = true;
+    }
 }
 } // namespace
 
@@ -50,6 +59,7 @@ ExitStatus ExportCommand(const Settings &settings, TextSink &out) {
     KeepConfigErrors(&world);
     const auto volumes = WorldVolumesWanted(world, settings.volumes);
     bool isWhole = true;
+    const bool isTerminal = isatty(STDOUT_FILENO) == 1;
     if (settings.json) {
         ExportJson(volumes, world.errors, out);
         return ExitStatusOf(world.errors.isUnknown, isWhole);
@@ -60,7 +70,7 @@ ExitStatus ExportCommand(const Settings &settings, TextSink &out) {
                 out.Put(path);
                 out.Put({"\0", 1});
             } else if (path.find('\n') == std::string::npos) {
-                out.Put(path + "\n");
+                out.Put((isTerminal ? TextEscaped(path) : path) + "\n");
             } else {
                 LookErrorAdd(&world.errors, path, "its name holds a line feed: use -0");
                 isWhole = false;

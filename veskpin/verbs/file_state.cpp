@@ -65,6 +65,10 @@ std::optional<FileState> FileStateOf(const KnownFile *known, const FileLook &loo
     if (*figures.blocks > 0 && *figures.marked < *figures.blocks) {
         return *figures.marked == 0 ? FileState::Unmarked : FileState::Partial;
     }
+    // A driver that cannot pin holds no bitmap.
+    if (volume.supportsPin == false) {
+        return FileState::Marked;
+    }
     if (!volume.driverHasBitmap) {
         return std::nullopt;
     }

@@ -11,6 +11,8 @@
 
 #include <cerrno>
 #include <cstring>
+#include <map>
+#include <memory>
 
 namespace vesk {
 namespace {
@@ -32,8 +34,11 @@ public:
             renamed_ = RenamedFind(volume, &errors_);
         }
         absent_.error = ENODEV;
+        WorldVolumeUse(world, volume);
         if (!volume.volume.isMounted) {
             LookUnknownAdd(&errors_, volume.volume.mountPath, "is not mounted");
+        } else if (!volume.volume.hasCache) {
+            LookUnknownAdd(&errors_, volume.volume.mountPath, "has no cache");
         } else if (looker_.Error() != 0) {
             LookUnknownAdd(&errors_, volume.volume.mountPath, strerror(looker_.Error()));
         }
@@ -61,7 +66,10 @@ public:
     void ListUnknown(const std::string &folder, Sum *sum) {
         PathWalk(looker_, folder, [&](const WalkEntry &entry) {
             const std::string &path = entry.relativePath;
-            if (entry.kind == WalkKind::Unreadable) {
+            if (entry.kind == WalkKind::Unreadable && entry.error == ENAMETOOLONG) {
+                // No file that deep can be pinned.
+                LookErrorAdd(&errors_, PathOf(path), strerror(entry.error));
+            } else if (entry.kind == WalkKind::Unreadable) {
                 LookUnknownAdd(&errors_, PathOf(path), strerror(entry.error));
             } else if (entry.kind == WalkKind::File) {
                 const auto range = KnownFilesAt(world_.known, path);
@@ -121,8 +129,7 @@ private:
         const FileLook &look = volume.isMounted ? looker_.Look(relativePath, status) : absent_;
         const KnownFile *known = KnownOf(range, look);
         const FileFigures figures = FileFiguresOf(look, volume);
-        const auto state =
-            isConfigKnown_ ? FileStateOf(known, look, figures, volume) : std::nullopt;
+        const auto state = StateOf(known, look, figures);
         const std::string path = PathOf(relativePath);
         if (state == FileState::Missing || state == FileState::Replaced) {
             const auto now = renamed_.find(*known->inode);
@@ -146,6 +153,17 @@ private:
                 BlockSetAdd(&sum->blocks, run);
             }
         }
+    }
+
+    // A file that the records do not have is unpinned only where they are whole.
+    std::optional<FileState> StateOf(const KnownFile *known, const FileLook &look,
+                                     const FileFigures &figures) {
+        const bool isSure = known != nullptr || (world_.known.isWhole && world_.volume.isMounted);
+        if (isConfigKnown_ && isSure) {
+            return FileStateOf(known, look, figures, world_.volume);
+        }
+        errors_.isUnknown = true;
+        return std::nullopt;
     }
 
     // With the figures of the file where it is now.
@@ -190,27 +208,35 @@ void NoteFailedPath(const Target &target, const std::string &text, LookErrors &e
 }
 
 // A path that lies on no volume with a cache.
-void ListElsewhere(const Target &target, LookErrors &errors, const Visit &visit,
-                   ListResult *result) {
+void ListElsewhere(const Target &target, World &world, const Visit &visit, ListResult *result) {
     const std::string none;
     const char *text = target.isWithoutCache ? "lies on a volume without a cache"
                        : target.error != 0   ? strerror(target.error)
                                              : "lies on no volume";
-    NoteFailedPath(target, text, errors, result);
+    NoteFailedPath(target, text, world.errors, result);
     if (target.status && S_ISREG(target.status->mode)) {
         FileFigures figures;
         figures.bytes = target.status->bytes;
-        visit({none, target.path, target.status->inode, FileState::Unpinned, nullptr, figures});
+        const bool isSure = world.areVolumesKnown && world.isConfigKnown;
+        visit({none, target.path, target.status->inode,
+               isSure ? std::optional(FileState::Unpinned) : std::nullopt, nullptr, figures});
     }
 }
 
+// The listers of the volumes that were met: what they look up for a volume is looked up once.
+using Listers = std::map<const WorldVolume *, std::unique_ptr<VolumeLister>>;
+
 void ListTarget(const Target &target, bool search, World &world, const Visit &visit,
-                ListResult *result) {
-    if (target.volume == nullptr || target.isWithoutCache) {
-        ListElsewhere(target, world.errors, visit, result);
+                Listers *listers, ListResult *result) {
+    if (target.volume == nullptr) {
+        ListElsewhere(target, world, visit, result);
         return;
     }
-    VolumeLister lister(*target.volume, search, world, visit);
+    std::unique_ptr<VolumeLister> &owner = (*listers)[target.volume];
+    if (owner == nullptr) {
+        owner = std::make_unique<VolumeLister>(*target.volume, search, world, visit);
+    }
+    VolumeLister &lister = *owner;
     const KnownFiles &known = target.volume->known;
     const auto below = KnownFilesBelow(known, target.relativePath);
     const bool isFolder = target.status && S_ISDIR(target.status->mode);
@@ -257,8 +283,9 @@ ListResult ListLook(World &world, const std::vector<std::string> &paths, bool se
             }
         }
     }
+    Listers listers;
     for (const std::string &path : paths) {
-        ListTarget(TargetResolve(world, path), search, world, visit, &result);
+        ListTarget(TargetResolve(world, path), search, world, visit, &listers, &result);
     }
     return result;
 }

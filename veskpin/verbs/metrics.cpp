@@ -1,13 +1,14 @@
 #include "verbs/metrics.h"
 
-#include "files/file_replace.h"
 #include "text/escape.h"
+#include "text/file_output.h"
 #include "text/utf8.h"
 #include "verbs/answer.h"
 #include "verbs/list.h"
 #include "verbs/verbs.h"
 
 #include <cstdio>
+#include <cstring>
 #include <ctime>
 
 namespace vesk {
@@ -119,7 +120,9 @@ void PutVolumes(MetricsWriter &metrics, const MetricsView &view) {
     }
     metrics.Begin("files", "Recorded files.");
     for (const WorldVolume *world : view.status.volumes) {
-        metrics.Put(Label("volume", world->volume.mountPath), world->known.recorded);
+        metrics.Put(Label("volume", world->volume.mountPath),
+                    world->known.isRecordedKnown ? std::optional(world->known.recorded)
+                                                 : std::nullopt);
     }
     metrics.Begin("requests", "Stored requests of the volume.");
     for (const WorldVolume *world : view.status.volumes) {
@@ -162,8 +165,8 @@ ExitStatus MetricsCommand(const Settings &settings, TextSink &out) {
     AnswerErrors(world.errors);
     if (settings.output.empty()) {
         out.Put(text);
-    } else if (FileReplaceContent(settings.output.c_str(), text) != FileReplaceResult::Done) {
-        fprintf(stderr, "veskpin: %s cannot be written\n", TextEscaped(settings.output).c_str());
+    } else if (const int error = FileOutputReplace(settings.output, text)) {
+        fprintf(stderr, "veskpin: %s: %s\n", TextEscaped(settings.output).c_str(), strerror(error));
         return ExitStatusOf(world.errors.isUnknown, false);
     }
     return ExitStatusOf(world.errors.isUnknown, true);

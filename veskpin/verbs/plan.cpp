@@ -19,11 +19,13 @@ namespace {
 // The plan for one volume.
 class VolumePlanner {
 public:
-    VolumePlanner(const WorldVolume &world, Plan &plan, Progress &progress)
-        : world_(world), plan_(plan), progress_(progress), looker_(world.volume.mountPath),
-          sum_(world) {}
+    VolumePlanner(World &world, const WorldVolume &volume, Plan &plan, Progress &progress)
+        : world_(volume), errors_(world.errors), plan_(plan), progress_(progress),
+          looker_(volume.volume.mountPath), sum_(volume) {
+        WorldVolumeUse(world, volume);
+    }
 
-    const WorldVolume &World() const { return world_; }
+    const WorldVolume &Of() const { return world_; }
 
     void AddFile(const std::string &relativePath, const FileStat *status) {
         const FileLook &look = looker_.Look(relativePath, status);
@@ -55,6 +57,7 @@ public:
         for (const KnownFile &known : world_.known.files) {
             if (known.stored == kRequestPinFiles) {
                 sum_.AddStored(looker_.Look(known.relativePath));
+                progress_.Step();
             }
         }
         return {world_.volume.mountPath, sum_.Total(reservePercent)};
@@ -68,10 +71,15 @@ private:
     }
 
     void Skip(const std::string &relativePath, SkipReason reason) {
-        plan_.skipped.push_back({VolumePath(world_.volume.mountPath, relativePath), reason});
+        const std::string path = VolumePath(world_.volume.mountPath, relativePath);
+        plan_.skipped.push_back({path, reason});
+        if (reason == SkipReason::NoPermission) {
+            LookUnknownAdd(&errors_, path, strerror(EACCES));
+        }
     }
 
     const WorldVolume &world_;
+    LookErrors &errors_;
     Plan &plan_;
     Progress &progress_;
     FileLooker looker_;
@@ -111,9 +119,11 @@ std::vector<Target> ResolveOnce(const World &world, const std::vector<std::strin
                text.compare(0, folders.back().first.size(), folders.back().first) != 0) {
             folders.pop_back();
         }
-        const bool isBelow = std::any_of(folders.begin(), folders.end(), [&](const auto &folder) {
-            return folder.second == target.volume;
-        });
+        // What cannot be looked at is told, also below a folder that is taken whole.
+        const bool isBelow = target.error == 0 &&
+                             std::any_of(folders.begin(), folders.end(), [&](const auto &folder) {
+                                 return folder.second == target.volume;
+                             });
         const bool isSame = !once.empty() && once.back().path == target.path;
         if (isBelow || isSame) {
             continue;
@@ -133,18 +143,20 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
     std::vector<std::unique_ptr<VolumePlanner>> planners;
     const auto plannerOf = [&](const WorldVolume &volume) -> VolumePlanner & {
         for (const auto &planner : planners) {
-            if (&planner->World() == &volume) {
+            if (&planner->Of() == &volume) {
                 return *planner;
             }
         }
-        planners.push_back(std::make_unique<VolumePlanner>(volume, plan, progress));
+        planners.push_back(std::make_unique<VolumePlanner>(world, volume, plan, progress));
         return *planners.back();
     };
     const std::vector<Target> targets = ResolveOnce(world, paths);
     size_t failed = 0;
     for (const Target &target : targets) {
         if (!CanBePlanned(target)) {
-            plan.skipped.push_back({target.path, ReasonOfTarget(target)});
+            const bool isSure = target.error != 0 || world.areVolumesKnown;
+            plan.skipped.push_back(
+                {target.path, isSure ? ReasonOfTarget(target) : SkipReason::Unreadable});
             ++failed;
             if (target.error == EACCES || target.error == EPERM) {
                 LookUnknownAdd(&world.errors, target.path, strerror(target.error));
@@ -157,7 +169,7 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
     }
     plan.isAllFailed = failed == targets.size();
     for (const auto &planner : planners) {
-        const Volume &volume = planner->World().volume;
+        const Volume &volume = planner->Of().volume;
         if (volume.supportsPin.has_value() && !*volume.supportsPin) {
             LookUnknownAdd(&world.errors, volume.mountPath, "its cache is not up or cannot pin");
         }

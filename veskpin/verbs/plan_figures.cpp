@@ -3,6 +3,7 @@
 #include "bitmap/pin_bitmap.h"
 
 #include <algorithm>
+#include <cerrno>
 
 namespace vesk {
 namespace {
@@ -92,6 +93,9 @@ bool PlanSum::Add(const std::string &relativePath, const FileLook &look, bool is
 }
 
 void PlanSum::AddStored(const FileLook &look) {
+    // A file that is gone gets no blocks; of one that cannot be looked at nobody knows.
+    const bool isGone = look.error == ENOENT || look.error == ENOTDIR;
+    isStoredKnown_ = isStoredKnown_ && (isGone || look.hasExtents);
     for (const BitRun &run : look.blocks) {
         BlockSetAdd(&stored_, run);
     }
@@ -123,7 +127,7 @@ PlanFigures PlanSum::Total(unsigned reservePercent) const {
     }
     figures.blocksNew = blocksNew;
     figures.marked = BlockSetCount(marked);
-    if (volume.ssdBlocks) {
+    if (volume.ssdBlocks && isStoredKnown_ && world_.known.isWhole) {
         const uint64_t reserve = (*volume.ssdBlocks * reservePercent + 99) / 100;
         figures.headroom = static_cast<int64_t>(*volume.ssdBlocks) -
                            static_cast<int64_t>(*figures.marked + storedNew + blocksNew + reserve);

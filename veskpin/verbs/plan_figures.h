@@ -68,6 +68,7 @@ private:
     RequestFill fill_;
     PlanFigures figures_;
     uint64_t blocks_ = 0;
-    uint64_t sentSectors_ = 0; // of the files to be sent
+    bool isStoredKnown_ = true; // the blocks of all stored pins are
+    uint64_t sentSectors_ = 0;  // of the files to be sent
 };
 } // namespace vesk

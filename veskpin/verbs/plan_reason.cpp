@@ -6,6 +6,7 @@
 #include "text/utf8.h"
 
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
@@ -59,7 +60,7 @@ std::optional<SkipReason> SkipReasonOf(const std::string &mountPath,
         return SkipReason::NotUtf8;
     }
     if (!look.hasExtents) {
-        return SkipReason::Unreadable;
+        return geteuid() == 0 ? SkipReason::Unreadable : SkipReason::NoPermission;
     }
     if (look.table.entries.empty()) {
         return SkipReason::NoBlocks;

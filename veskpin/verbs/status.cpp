@@ -72,7 +72,8 @@ void PutVolume(JsonWriter &json, const WorldVolume &world, bool isConfigKnown) {
     json.Number("bitmapBytesNeeded", volume.bitmapBytesNeeded);
     json.Number("blocksMarked", MarkedOf(volume));
     json.Number("blocksHeld", volume.blocksHeld);
-    json.Number("files", IfKnown(world.known.recorded, isConfigKnown));
+    json.Number("files",
+                IfKnown(world.known.recorded, isConfigKnown && world.known.isRecordedKnown));
     json.Number("requests", IfKnown(world.known.requests, isConfigKnown));
     json.Bool("held", volume.held);
     json.EndObject();
@@ -171,7 +172,8 @@ void StatusShowTable(const StatusView &view, bool color, TextSink &out) {
         };
         out.Put(TableRow(
             {TextEscaped(volume.mountPath),
-             UnitsOfCount(IfKnown(world->known.recorded, view.isConfigKnown)),
+             UnitsOfCount(IfKnown(world->known.recorded,
+                                  view.isConfigKnown && world->known.isRecordedKnown)),
              UnitsOfCount(IfKnown(world->known.requests, view.isConfigKnown)),
              bytes(MarkedOf(volume)), bytes(volume.blocksHeld), bytes(volume.ssdBlocks),
              volume.deviceBytes ? UnitsOfBytes(*volume.deviceBytes) : "-", BitmapText(volume)},
@@ -192,7 +194,7 @@ StatusView StatusLook(World &world, const std::vector<std::string> &volumes) {
     view.services = ServicesLook(held, &world.errors);
     view.queue = QueueLook(&world.errors);
     view.isConfigKnown = world.isConfigKnown;
-    view.storedRequests = IfKnown(world.storedRequests, world.isConfigKnown);
+    view.storedRequests = world.storedRequests;
     return view;
 }
 

@@ -30,7 +30,7 @@ std::string Text(const BitRun &run) {
 std::string BlocksOf(const std::vector<FileMappingEntry> &entries) {
     std::string text;
     for (const BitRun &run : FileBlocksOf(Table(entries))) {
-        text += (text.empty() ? "" : " ") + Text(run);
+        text.append(text.empty() ? "" : " ").append(Text(run));
     }
     return text;
 }
@@ -82,7 +82,8 @@ TEST(FileBlocksTest, AreJustTheBitsThatMarkingSets) {
             isFirst = false;
             end = run.first + run.count;
             for (uint64_t bit = run.first; bit < end; ++bit) {
-                set[bit / 8] = static_cast<unsigned char>(set[bit / 8] | 1U << bit % 8);
+                unsigned char &byte = set[static_cast<size_t>(bit / 8)];
+                byte = static_cast<unsigned char>(byte | 1U << bit % 8);
             }
         }
         ASSERT_EQ(set, marked);

@@ -118,7 +118,13 @@ TEST_F(ConfigRecordsTest, VolumesOfAnotherShapeAreToldAndTheOthersRead) {
     const ConfigRecords records =
         Read(R"({"volumes": {"/a": [], "/b": null, "/c": {"files": []}, "/d": {"files": null},
                              "/e": {}, "/f": {"files": {"5": "a"}}, "/g": "x"}})");
-    EXPECT_EQ(Volumes(records), (Messages{"/c:", "/d:", "/e:", "/f: a#5"}));
+    EXPECT_EQ(Volumes(records), (Messages{"/a:", "/c:", "/d:", "/e:", "/f: a#5", "/g:"}));
+    for (const RecordedVolume &volume : records.volumes) {
+        const bool isDamaged =
+            volume.mountPath == "/a" || volume.mountPath == "/c" || volume.mountPath == "/g";
+        EXPECT_EQ(volume.areFilesKnown, !isDamaged) << volume.mountPath;
+        EXPECT_EQ(volume.isWhole, !isDamaged) << volume.mountPath;
+    }
     EXPECT_EQ(records.problems,
               (Messages{"volume /a is no object",
                         "volume /c: \"files\" has another type than it should have",

@@ -99,7 +99,7 @@ TEST_F(FileLookTest, AFileWhoseStatusIsKnownIsNotAskedForItAgain) {
     EXPECT_EQ(look.status.inode, 0x100000007U);
     EXPECT_EQ(look.status.bytes, 99U);
     EXPECT_TRUE(look.hasExtents);
-    EXPECT_EQ(asked_, volume_ + "/share 7");
+    EXPECT_EQ(asked_, volume_ + "/share 4294967303");
 }
 
 TEST_F(FileLookTest, AStatusAloneAsksForNoExtents) {

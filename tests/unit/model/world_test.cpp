@@ -78,8 +78,15 @@ TEST_F(WorldTest, AVolumeWithoutACacheIsThereOnlyWhereItIsNamed) {
 TEST_F(WorldTest, AVolumeWithRecordsWhoseUuidCannotBeReadIsUnknown) {
     FakeAppliance::spaces.push_back({"/dev/space2", "/named", ""});
     FakeAppliance::spaces.push_back({"/dev/space3", "/other", ""});
-    EXPECT_FALSE(WorldLook(config_).errors.isUnknown);
-    EXPECT_TRUE(Look(R"({"volumes": {"/named": {}}})").errors.isUnknown);
+    World world = WorldLook(config_);
+    Wanted(world, {});
+    EXPECT_FALSE(world.errors.isUnknown);
+    world = Look(R"({"volumes": {"/named": {}}})");
+    EXPECT_FALSE(world.errors.isUnknown);
+    Wanted(world, {mountPath_}); // the trouble of another volume is none of this one's
+    EXPECT_FALSE(world.errors.isUnknown);
+    Wanted(world, {});
+    EXPECT_TRUE(world.errors.isUnknown);
 }
 
 TEST_F(WorldTest, ASpaceThatIsNotMountedIsLeftOut) {
@@ -106,9 +113,28 @@ TEST_F(WorldTest, WhatCannotBeUsedOfTheConfigurationIsToldAndNothingUnknown) {
     World world = Look(R"({"volumes": {")" + mountPath_ + R"(": {"files": {"x": "a"}}},
         "requestQueue": ["3"], "requests": {"3": {"type": "pinFiles", "mountPath": ")" +
                        mountPath_ + R"(", "data": "c"}}})");
+    Wanted(world, {});
+    EXPECT_FALSE(world.volumes[0].known.isWhole);
+    EXPECT_TRUE(world.volumes[0].known.isRecordedKnown);
     EXPECT_EQ(TextsOf(world.errors),
               (Texts{config_ + ": volume " + mountPath_ + ": record \"x\" names no file",
                      config_ + ": request 3: Parse file inode from string (c) failed"}));
+}
+
+TEST_F(WorldTest, WhatIsOfAnotherTypeIsUnknownAndNotZero) {
+    const std::string volume = R"({"volumes": {")" + mountPath_ + R"(": )";
+    for (const std::string &text :
+         Texts{R"({"volumes": []})", volume + R"({"files": []}}})", volume + "7}}"}) {
+        World world = Look(text);
+        Wanted(world, {});
+        EXPECT_TRUE(world.errors.isUnknown) << text;
+        EXPECT_FALSE(world.volumes[0].known.isRecordedKnown) << text;
+        EXPECT_EQ(world.storedRequests, 0U);
+    }
+    World world = Look(R"({"requestQueue": {}})");
+    EXPECT_TRUE(world.errors.isUnknown);
+    EXPECT_EQ(world.storedRequests, std::nullopt);
+    EXPECT_FALSE(world.volumes[0].known.isWhole);
 }
 
 TEST_F(WorldTest, SpacesThatCannotBeListedAreToldAndThoseThatWereListedUsed) {
@@ -121,10 +147,11 @@ TEST_F(WorldTest, SpacesThatCannotBeListedAreToldAndThoseThatWereListedUsed) {
 TEST_F(WorldTest, AllVolumesAreWantedWhereNoneIsNamed) {
     World world = Look(R"({"volumes": {"/volume9": {}}})");
     EXPECT_EQ(Wanted(world, {}), (Texts{mountPath_, "/volume9"}));
+    EXPECT_EQ(TextsOf(world.errors), Texts{"/volume9: is not mounted"});
     EXPECT_EQ(Wanted(world, {"/volume9"}), Texts{"/volume9"});
     EXPECT_EQ(Wanted(world, {"/volume9/", mountPath_ + "//", "/volume9"}),
               (Texts{"/volume9", mountPath_}));
-    EXPECT_EQ(TextsOf(world.errors), Texts{"/volume9: is not mounted"});
+    EXPECT_EQ(TextsOf(world.errors), (Texts{"/volume9: is not mounted", "unknown"}));
 }
 
 TEST_F(WorldTest, WhatIsNoVolumeOrHasNoCacheIsToldAndUnknown) {

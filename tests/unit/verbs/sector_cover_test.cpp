@@ -70,7 +70,7 @@ TEST(SectorCoverTest, AgreesWithAMapOfSectors) {
                 sectors - start, unit * (random() % 2 == 0 ? random() % 4 : random() % 40));
             cover.Add(start, count);
             for (uint64_t sector = start; sector < start + count; ++sector) {
-                model[sector] = true;
+                model[static_cast<size_t>(sector)] = true;
             }
             ASSERT_EQ(cover.Sectors(),
                       static_cast<uint64_t>(std::count(model.begin(), model.end(), true)));
