@@ -15,8 +15,8 @@
 namespace vesk {
 struct KnownFile {
     std::string relativePath;
-    std::optional<uint32_t> inode;       // the recorded one, absent where there is only a request
-    int stored = kRequestUnknown;        // the last stored request for it: pin, unpin or none
+    std::optional<uint32_t> inode; // the recorded one, absent where there is only a request
+    int stored = kRequestUnknown;  // the last stored request for it: pin, unpin or none
     std::optional<uint32_t> storedInode = std::nullopt; // that the request names
 };
 
