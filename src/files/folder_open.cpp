@@ -30,6 +30,16 @@ bool IsMountPoint(int folder) {
            (here.st_dev != above.st_dev || here.st_ino == above.st_ino);
 }
 
+// Leaves errno alone.
+bool IsLink(int folder, const std::string &name) {
+    const int error = errno;
+    struct stat status = {};
+    const bool isLink =
+        fstatat(folder, name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISLNK(status.st_mode);
+    errno = error;
+    return isLink;
+}
+
 // The mount point of the filesystem on the way to `path`; `rest` becomes what follows it.
 ScopedFd OpenMountPoint(const std::string &path, dev_t device, std::string &rest) {
     if (path.empty() || path.front() != '/') {
@@ -86,14 +96,20 @@ ScopedFd FolderOpenStepwise(int folder, const std::string &path) {
         start = end == std::string::npos ? end : path.find_first_not_of('/', end);
         if (name == "..") {
             if (steps.empty()) {
+                errno = EXDEV;
                 return ScopedFd();
             }
             steps.pop_back();
         } else if (name != ".") {
             const int here = steps.empty() ? folder : steps.back().Get();
             steps.emplace_back(openat(here, name.c_str(), kOpenAsPlace | O_NOFOLLOW));
+            if (!steps.back().IsOpen()) {
+                errno = errno == ENOTDIR && IsLink(here, name) ? ELOOP : errno;
+                return ScopedFd();
+            }
             // A user's FUSE mount is left before it is asked for anything.
-            if (!steps.back().IsOpen() || DeviceOf(steps.back().Get()) != device) {
+            if (DeviceOf(steps.back().Get()) != device) {
+                errno = EXDEV;
                 return ScopedFd();
             }
         }

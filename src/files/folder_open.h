@@ -21,9 +21,9 @@ constexpr int kOpenForReading = O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
 // failure, or the path does not lead through a mount point of this filesystem.
 ScopedFd FolderOpenOnDevice(const std::string &path, dev_t device);
 
-// The second half: a relative path below an open folder, the folder itself where it is empty. Other
-// filesystems mounted below it are a failure and are asked for nothing: who has mounted one may let
-// every question wait.
+// The second half (errno tells why it fails: ELOOP a link, EXDEV another filesystem): a relative
+// path below an open folder, the folder itself where it is empty. Other filesystems mounted below
+// it are a failure and are asked for nothing: who has mounted one may let every question wait.
 ScopedFd FolderOpenBeneath(int folder, const std::string &path);
 
 // The same where the kernel has no call for it: step by step, each folder from the one above.

@@ -170,6 +170,16 @@ pin_both() {
     same unreadable "$(state_of /volume3/a)"
 }
 
+@test "what is recorded of a volume that has lost its cache is not told to be unpinned" {
+    put_config "{\"volumes\":{\"/volume1\":{\"files\":{\"$(inode d/a)\":\"d/a\"}}}}"
+    printf '{"caches":[]}\n' >"$VESK_FLASHCACHE_CONFIG"
+    look 3 list
+    same null "$(state_of /volume1/d/a)"
+    look 3 list /volume1/d/a
+    same null "$(state_of /volume1/d/a)"
+    volume_configure
+}
+
 @test "paths that cannot be looked at: one of several, and all" {
     : >/tmp/elsewhere
     look 1 list d/a /volume1/nothing

@@ -140,6 +140,25 @@ pinned_as_planned() {
     stop_service
 }
 
+@test "a path that is not there is told, also below a folder that is planned whole" {
+    mkdir d
+    random d/a 4K conv=fsync
+    look 1 plan d d/a d/b
+    same '[1,[["/volume1/d/b","not-found"]]]' \
+        "$(answer '[.volumes[0].fileCount,[.skipped[] | [.path,.reason]]]')"
+}
+
+@test "who may not read a file is told so" {
+    mkdir d
+    random d/a 4K conv=fsync
+    chmod 600 d/a
+    local status=0
+    setpriv --reuid=65534 --regid=65534 --clear-groups \
+        "$BIN/veskpin" --config "$CONF" --json plan /volume1/d >"$ANSWER" || status=$?
+    same 3 "$status"
+    check_schema plan
+}
+
 @test "wrong usage plans nothing" {
     local status
     for arguments in "" "--reserve 101 /volume1" "--reserve x /volume1" "--what /volume1" "--files-from /nowhere"; do

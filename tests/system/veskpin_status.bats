@@ -132,6 +132,55 @@ worker_is_told_ended() {
     stop_service_by TERM
 }
 
+@test "a service of another mount namespace is told apart, and its own configuration looked at" {
+    put_config '{}'
+    (
+        close_descriptors
+        # shellcheck disable=SC2016
+        exec unshare --mount sh -c 'mount -t tmpfs none /run/pin && exec "$0" "$@"' \
+            "$BIN/veskcachepinfiletool" --start-service --config-path "$CONF"
+    ) >/dev/null 2>&1 &
+    SERVICE_PID=$!
+    wait_until service_is_ready
+    set_pending /volume1
+    tool --pin-files /volume1/a --mount-path /volume1
+    its_request_is_seen() { look 0 status && [ "$(service worker)" = busy ]; }
+    wait_until its_request_is_seen
+    same '["mnt"]' "$(service otherNamespaces)"
+    same 0 "$(answer .storedRequests)"
+    stop_service_by TERM
+}
+
+@test "a program of root's that is called by the tool's name is no service" {
+    ln -sf "$(command -v tail)" /tmp/veskcachepinfiletool
+    (
+        close_descriptors
+        exec /tmp/veskcachepinfiletool -f /dev/null -- --start-service
+    ) >/dev/null 2>&1 &
+    SERVICE_PID=$!
+    name_is_the_tools() { [ "$(cat "/proc/$SERVICE_PID/comm")" = veskcachepinfil ]; }
+    wait_until name_is_the_tools
+    look 0 status
+    same '[]' "$(answer .services)"
+    kill "$SERVICE_PID"
+    wait "$SERVICE_PID" || true
+    SERVICE_PID=
+}
+
+@test "the trouble of one volume is none of another's answer" {
+    local spare
+    make_volume 2 64M 16M ext4
+    spare=$(volume_device 2)
+    umount "${spare%/*}" -l
+    look 3 status
+    look 0 status /volume1
+    same '[]' "$(answer .errors)"
+    look 3 status /volume2
+    umount -l /volume2
+    rm -r /tmp/volume2
+    volume_configure
+}
+
 @test "options may be cut short and the configuration relative, as the tool takes them" {
     cd /run
     (

@@ -74,7 +74,8 @@ int Resolve(const std::string &given, std::string *path) {
             *path = Normalized(text);
             return error;
         }
-        rest = folder.substr(last + 1) + (rest.empty() ? "" : "/") + rest;
+        rest.insert(0, rest.empty() ? "" : "/");
+        rest.insert(0, folder, last + 1);
         folder.erase(last + 1);
     }
     *path = error == 0 ? *path : Normalized(*path);
