@@ -109,7 +109,7 @@ std::string CacheDeviceCachedBits(CacheDevice &device) {
     for (const CacheSlot &slot : device.cache.slots) {
         if (slot.block != kNoBlock) {
             char &byte = bits[static_cast<size_t>(slot.block / 8)];
-            byte = static_cast<char>(byte | (1U << (slot.block % 8)));
+            byte = static_cast<char>(static_cast<unsigned char>(byte) | 1U << (slot.block % 8));
         }
     }
     return bits;
