@@ -15,8 +15,7 @@ constexpr uint32_t kFlagsWithoutPlace = FIEMAP_EXTENT_UNKNOWN | FIEMAP_EXTENT_DE
 bool Ask(int fd, uint64_t start, uint32_t extents, fiemap *answer) {
     answer->fm_start = start;
     answer->fm_length = FIEMAP_MAX_OFFSET - start;
-    // Once: with every batch, whoever goes on writing would hold the answer up for each.
-    answer->fm_flags = start == 0 ? FIEMAP_FLAG_SYNC : 0;
+    answer->fm_flags = FIEMAP_FLAG_SYNC;
     answer->fm_mapped_extents = 0;
     answer->fm_reserved = 0;
     answer->fm_extent_count = extents; // 0: they are only counted

@@ -157,6 +157,8 @@ pinned_as_planned() {
         "$BIN/veskpin" --config "$CONF" --json plan /volume1/d >"$ANSWER" || status=$?
     same 3 "$status"
     check_schema plan
+    same '[["/volume1/d/a","no-permission"]]' "$(answer '[.skipped[] | [.path,.reason]]')"
+    same 1 "$(answer '[.errors[] | select(.path == "/volume1/d/a")] | length')"
 }
 
 @test "wrong usage plans nothing" {

@@ -152,16 +152,18 @@ worker_is_told_ended() {
 }
 
 @test "a program of root's that is called by the tool's name is no service" {
-    ln -sf "$(command -v tail)" /tmp/veskcachepinfiletool
+    ln -s "$(command -v dash)" /tmp/veskcachepinfiletool
+    mkfifo /tmp/nobody-writes
     (
         close_descriptors
-        exec /tmp/veskcachepinfiletool -f /dev/null -- --start-service
+        exec /tmp/veskcachepinfiletool -c 'read -r line </tmp/nobody-writes' --start-service
     ) >/dev/null 2>&1 &
     SERVICE_PID=$!
     name_is_the_tools() { [ "$(cat "/proc/$SERVICE_PID/comm")" = veskcachepinfil ]; }
     wait_until name_is_the_tools
     look 0 status
     same '[]' "$(answer .services)"
+    is_child "$SERVICE_PID"
     kill "$SERVICE_PID"
     wait "$SERVICE_PID" || true
     SERVICE_PID=

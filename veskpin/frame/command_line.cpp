@@ -106,8 +106,9 @@ std::string FaultOf(Given &given) {
         }
     }
     for (const std::string &volume : settings.volumes) {
-        if (volume.empty() || volume[0] != '/') {
-            return "a VOLUME is an absolute mount path, not \"" + TextEscaped(volume) + "\"";
+        // The library takes "-0" for a name where no such option is.
+        if (volume.empty() || volume[0] == '-') {
+            return "a VOLUME is a mount path, not \"" + TextEscaped(volume) + "\"";
         }
     }
     return "";

@@ -29,7 +29,8 @@ TEST_F(PathsTest, ANameIsTakenAsItIs) {
 TEST_F(PathsTest, NamesThatTheLibraryHasAMeaningForAreNames) {
     EXPECT_EQ(Paths({"list", "[a,b]", "[c]", "++", "[]", "d"}),
               (Arguments{"./[a,b]", "./[c]", "./++", "./[]", "d"}));
-    ASSERT_TRUE(Read({"list", "[v]", "--config", "[c]"}));
+    ASSERT_TRUE(Read({"status", "[v]", "--config", "[c]"}));
+    EXPECT_EQ(line_.settings.volumes, Arguments{"./[v]"});
     EXPECT_EQ(line_.settings.configPath, "./[c]");
 }
 
