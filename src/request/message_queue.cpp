@@ -20,20 +20,24 @@ const int kSendTries = 3;
 const int kAckTries = 3;
 static_assert((IPC_CREAT | IPC_EXCL | 0644) == 0x7A4, "creation flags");
 
-// Anybody can make a queue at any key, and whoever made or owns one can send to it and give it
-// away. Only root's and the caller's own are trusted. False with errno.
-bool QueueIsTrusted(int queueId, msqid_ds *status) {
-    if (msgctl(queueId, IPC_STAT, status) < 0) {
+// False with errno.
+bool QueueMayBeUsed(int queueId) {
+    msqid_ds status{};
+    if (msgctl(queueId, IPC_STAT, &status) < 0) {
         return false;
     }
-    const auto isTrusted = [](uid_t user) { return user == 0 || user == geteuid(); };
-    if (!isTrusted(status->msg_perm.uid) || !isTrusted(status->msg_perm.cuid)) {
+    if (!MsgQueueIsTrusted(status)) {
         errno = EPERM;
         return false;
     }
     return true;
 }
 } // namespace
+
+bool MsgQueueIsTrusted(const msqid_ds &status) {
+    const auto isTrusted = [](uid_t user) { return user == 0 || user == geteuid(); };
+    return isTrusted(status.msg_perm.uid) && isTrusted(status.msg_perm.cuid);
+}
 
 int GetMsgKey(int *key, const char *path) {
     std::string text;
@@ -105,42 +109,12 @@ int MsgQueueGet(const char *keyFile) {
         return -1;
     }
     queueId = msgget(key, 0);
-    msqid_ds status{};
-    if (queueId == -1 || !QueueIsTrusted(queueId, &status)) {
+    if (queueId == -1 || !QueueMayBeUsed(queueId)) {
         LogError("Can't open message queue: %s", strerror(errno));
         return -1;
     }
     LogVerbose("Get message queue by id (%d) successfully", queueId);
     return queueId;
-}
-
-MsgQueueCause MsgQueueLook(const char *keyFile, MsgQueueState *state) {
-    *state = {};
-    if (PathIsMissing(keyFile) == 1) {
-        return MsgQueueCause::NoKeyFile;
-    }
-    try {
-        if (GetMsgKey(&state->key, keyFile) < 0) {
-            return MsgQueueCause::NoKey;
-        }
-    } catch (const std::logic_error &) {
-        return MsgQueueCause::NoKey;
-    }
-    if (state->key == IPC_PRIVATE) { // asked for, it would be made
-        state->id = -1;
-        return MsgQueueCause::NoQueue;
-    }
-    state->id = msgget(state->key, 0);
-    msqid_ds status{};
-    const bool isTrusted = state->id != -1 && QueueIsTrusted(state->id, &status);
-    if (!isTrusted && errno != EPERM) {
-        return errno == EACCES ? MsgQueueCause::NotAllowed : MsgQueueCause::NoQueue;
-    }
-    state->owner = status.msg_perm.uid;
-    state->messages = status.msg_qnum;
-    state->bytes = status.__msg_cbytes;
-    state->maxBytes = status.msg_qbytes;
-    return isTrusted ? MsgQueueCause::Found : MsgQueueCause::Foreign;
 }
 
 int MsgQueueSend(int queueId, const RequestMessage *message, size_t size) {

@@ -12,8 +12,7 @@
 #include "request/request_record.h"
 
 #include <cstddef>
-#include <cstdint>
-#include <sys/types.h>
+#include <sys/msg.h>
 
 namespace vesk {
 // What clients send: the text is one request record. The header word is 4 bytes on the 32-bit
@@ -48,28 +47,9 @@ int MsgCreateExclusive(const char *keyFile);
 // for a queue whose creator or owner is neither root nor the caller.
 int MsgQueueGet(const char *keyFile);
 
-// What a look at the queue finds.
-enum class MsgQueueCause {
-    Found,
-    NoKeyFile,
-    NoKey, // the file cannot be read or holds no number
-    NoQueue,
-    NotAllowed, // the caller may not ask for it
-    Foreign,    // its creator or owner is neither root nor the caller: MsgQueueGet refuses it
-};
-
-struct MsgQueueState {
-    int key;
-    int id;
-    uid_t owner;
-    uint64_t messages;
-    uint64_t bytes;    // in the messages
-    uint64_t maxBytes; // of all messages
-};
-
-// Looks at the queue that the file's key names: creates, takes and sends nothing. `*state` is
-// filled as far as the cause allows, wholly for Found and Foreign.
-MsgQueueCause MsgQueueLook(const char *keyFile, MsgQueueState *state);
+// Anybody can make a queue at any key, and whoever made or owns one can send to it and give it
+// away: only root's and the caller's own are trusted.
+bool MsgQueueIsTrusted(const msqid_ds &status);
 
 // Sends without blocking, up to three times, a second apart; a failing send takes three seconds.
 // `size` (bytes) does not count the header word. 0, or -1 after an error message with the errno of

@@ -3,6 +3,7 @@
 #include "base/log.h"
 
 #include <cstdio>
+#include <cstring>
 
 namespace vesk {
 namespace {
@@ -34,6 +35,12 @@ int StringToRequestType(const std::string &name) {
         }
     }
     return kRequestUnknown;
+}
+
+void RequestRecordComplete(RequestRecord *record, size_t received) {
+    memset(reinterpret_cast<char *>(record) + received, 0, sizeof(*record) - received);
+    record->mountPath[sizeof(record->mountPath) - 1] = '\0';
+    record->data[sizeof(record->data) - 1] = '\0';
 }
 
 void RequestToString(std::string *out, const RequestRecord *record) {

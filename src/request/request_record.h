@@ -44,6 +44,10 @@ struct RequestRecord {
 };
 static_assert(sizeof(RequestRecord) == 1540, "the record is 1540 bytes on every platform");
 
+// Makes of `received` bytes of a message a record: whoever may write to the queue fills it. What a
+// short message left of the one before is cleared, and the texts end inside their fields.
+void RequestRecordComplete(RequestRecord *record, size_t received);
+
 // Sets `out` to "Request type=%s mountPath=%s data=%s", cut to 1023 characters; for log lines.
 void RequestToString(std::string *out, const RequestRecord *record);
 } // namespace vesk

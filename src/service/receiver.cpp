@@ -18,14 +18,6 @@ namespace vesk {
 int ServerMsgQueueId = -1;
 
 namespace {
-// Whoever may write to the queue fills the record. Before anyone reads it, what a short message
-// left of the one before is cleared and the texts end inside their fields.
-void CompleteRecord(RequestRecord *record, size_t received) {
-    memset(reinterpret_cast<char *>(record) + received, 0, sizeof(*record) - received);
-    record->mountPath[sizeof(record->mountPath) - 1] = '\0';
-    record->data[sizeof(record->data) - 1] = '\0';
-}
-
 // What a taken message asks for, tried until there is memory for it: the message is off the queue,
 // and nobody would send it again.
 template <typename Operation> int DoPatiently(Operation operation) {
@@ -50,7 +42,7 @@ bool ReceiveMessage(RequestMessage *message, const LogPlace &place) {
         LogErrorAt(place, "Receive messaged failed: %s", strerror(errno));
         return false;
     }
-    CompleteRecord(&message->record, static_cast<size_t>(received));
+    RequestRecordComplete(&message->record, static_cast<size_t>(received));
     LogVerboseAt(place, "Get a new message. Request type = %s",
                  RequestTypeForLog(message->record.type));
     return true;

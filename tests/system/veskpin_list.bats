@@ -142,6 +142,28 @@ pin_both() {
     stop_service
 }
 
+@test "what is sent and not yet stored is pinning, and waits on" {
+    pin_both
+    stop_service
+    random d/c 10K conv=fsync
+    tool --unpin-files /volume1/d/a --mount-path /volume1
+    tool --pin-files /volume1/d/c --mount-path /volume1
+    look 1 list
+    same 'unpinning pinned pinning' \
+        "$(state_of /volume1/d/a) $(state_of /volume1/d/b) $(state_of /volume1/d/c)"
+    look 1 list /volume1/d/c
+    same pinning "$(state_of /volume1/d/c)"
+    look 0 status
+    same '[2,0]' "$(answer '[.queuedMessages,.storedRequests]')"
+    start_service
+    is_carried_out() {
+        veskpin --json list /volume1/d/a /volume1/d/c >"$ANSWER" || true
+        [ "$(state_of /volume1/d/a) $(state_of /volume1/d/c)" = 'unpinned pinned' ]
+    }
+    wait_until is_carried_out
+    stop_service
+}
+
 @test "a folder is taken whole, and blocks that its files share count once" {
     start_service
     pin 1 /volume1/d/a

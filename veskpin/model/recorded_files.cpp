@@ -1,35 +1,52 @@
 #include "model/recorded_files.h"
 
+#include "base/malloc_text.h"
 #include "model/look_errors.h"
 #include "request/file_inode_list.h"
+#include "space/relative_path.h"
 
 #include <algorithm>
 #include <map>
 
 namespace vesk {
 namespace {
-// The last stored request for each path, with the inode that it names.
-using Wanted = std::map<std::string, std::pair<int, uint32_t>>;
+struct Want {
+    int type = kRequestUnknown;
+    std::optional<uint32_t> inode; // absent: the service has not asked for it yet
+};
 
-Wanted WantedOf(const std::string &mountPath, const std::vector<StoredRequest> &requests,
-                KnownFiles *known) {
-    Wanted wanted;
-    for (const StoredRequest &request : requests) {
-        if (request.mountPath != mountPath) {
-            continue;
-        }
-        ++known->requests;
-        std::vector<FileInfo> infos;
-        if (RequestHasFiles(request.type) &&
-            RequestDataGetFileInfos(request.data.c_str(), &infos) < 0) {
-            known->problems.push_back("request " + request.number + ": " +
-                                      LookLogTake("its list of files cannot be read"));
-        }
-        for (const FileInfo &info : infos) {
-            wanted[info.szRelativePath] = {request.type, static_cast<uint32_t>(info.inodeNum)};
+// The last request for each path.
+using Wanted = std::map<std::string, Want>;
+
+void AddStored(const StoredRequest &request, KnownFiles *known, Wanted *wanted) {
+    ++known->requests;
+    std::vector<FileInfo> infos;
+    if (RequestHasFiles(request.type) &&
+        RequestDataGetFileInfos(request.data.c_str(), &infos) < 0) {
+        known->problems.push_back("request " + request.number + ": " +
+                                  LookLogTake("its list of files cannot be read"));
+    }
+    for (const FileInfo &info : infos) {
+        (*wanted)[info.szRelativePath] = {request.type, static_cast<uint32_t>(info.inodeNum)};
+    }
+}
+
+// The paths as the receiver will store them. It stores none of a request with one that it refuses,
+// but then ends: until it is started again, who sent the others waits for them.
+void AddSent(const RequestRecord &request, KnownFiles *known, Wanted *wanted) {
+    ++known->sent;
+    std::vector<std::string> paths;
+    if (RequestHasFiles(request.type)) {
+        SplitString(request.data, ";", &paths);
+    }
+    for (const std::string &path : paths) {
+        const MallocText relativePath(
+            FileGetRelativePathByMountPath(request.mountPath, path.c_str()));
+        if (relativePath) {
+            (*wanted)[relativePath.get()] = {request.type, std::nullopt};
         }
     }
-    return wanted;
+    LookLogTake("");
 }
 
 bool IsBefore(const KnownFile &a, const KnownFile &b) {
@@ -38,9 +55,20 @@ bool IsBefore(const KnownFile &a, const KnownFile &b) {
 } // namespace
 
 KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
-                        const std::vector<StoredRequest> &requests) {
+                        const std::vector<StoredRequest> &requests,
+                        const std::vector<RequestRecord> &sent) {
     KnownFiles known;
-    Wanted wanted = WantedOf(mountPath, requests, &known);
+    Wanted wanted;
+    for (const StoredRequest &request : requests) {
+        if (request.mountPath == mountPath) {
+            AddStored(request, &known, &wanted);
+        }
+    }
+    for (const RequestRecord &request : sent) {
+        if (request.mountPath == mountPath) {
+            AddSent(request, &known, &wanted);
+        }
+    }
     if (volume != nullptr) {
         known.recorded = volume->files.size();
         known.files.reserve(volume->files.size() + wanted.size());
@@ -50,16 +78,16 @@ KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
         volume->files.clear();
     }
     const size_t recorded = known.files.size();
-    for (auto &[path, request] : wanted) {
+    for (const auto &[path, want] : wanted) {
         const auto [first, last] = std::equal_range(
             known.files.begin(), known.files.begin() + static_cast<std::ptrdiff_t>(recorded),
             KnownFile{path, std::nullopt, 0}, IsBefore);
         for (auto file = first; file != last; ++file) {
-            file->stored = request.first;
-            file->storedInode = request.second;
+            file->stored = want.type;
+            file->storedInode = want.inode;
         }
         if (first == last) {
-            known.files.push_back({path, std::nullopt, request.first, request.second});
+            known.files.push_back({path, std::nullopt, want.type, want.inode});
         }
     }
     std::inplace_merge(known.files.begin(),

@@ -1,4 +1,5 @@
-// The files of a volume that the configuration knows: recorded, or in a stored request.
+// The files of a volume that are known: recorded, in a stored request, or in one that waits in the
+// queue to be stored.
 //
 // Thread rule: no state.
 #pragma once
@@ -16,8 +17,8 @@ namespace vesk {
 struct KnownFile {
     std::string relativePath;
     std::optional<uint32_t> inode; // the recorded one, absent where there is only a request
-    int stored = kRequestUnknown;  // the last stored request for it: pin, unpin or none
-    std::optional<uint32_t> storedInode = std::nullopt; // that the request names
+    int stored = kRequestUnknown;  // the last request for it: pin, unpin or none
+    std::optional<uint32_t> storedInode = std::nullopt; // that a stored request names
 };
 
 // In ascending order of paths; a path stands there once for each inode recorded under it, since a
@@ -26,6 +27,7 @@ struct KnownFiles {
     std::vector<KnownFile> files;
     uint64_t recorded = 0; // records
     uint64_t requests = 0; // stored requests of the volume
+    uint64_t sent = 0;     // its requests in the queue
     std::vector<std::pair<uint32_t, size_t>>
         byInode;                 // inode, recorded or in a request, and index in `files`; sorted
     bool isRecordedKnown = true; // false: how many records there are cannot be told
@@ -33,9 +35,11 @@ struct KnownFiles {
     std::vector<std::string> problems;
 };
 
-// Takes the records out of `volume`, which may be null, and of the requests those of `mountPath`.
+// Takes the records out of `volume`, which may be null, and of the requests, stored and sent after
+// them, those of `mountPath`.
 KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
-                        const std::vector<StoredRequest> &requests);
+                        const std::vector<StoredRequest> &requests,
+                        const std::vector<RequestRecord> &sent = {});
 
 // The entries of this path, and those at and below this folder (empty: all), as a range of indexes.
 std::pair<size_t, size_t> KnownFilesAt(const KnownFiles &known, const std::string &relativePath);

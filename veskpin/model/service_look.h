@@ -6,6 +6,7 @@
 
 #include "model/look_errors.h"
 #include "request/message_queue.h"
+#include "request/queue_look.h"
 
 #include <sys/types.h>
 

@@ -1,6 +1,7 @@
 #include "model/world.h"
 
 #include "config/config_records.h"
+#include "model/service_look.h"
 
 #include <algorithm>
 #include <set>
@@ -22,6 +23,21 @@ ConfigRecords ReadRecords(World *world) {
     return records;
 }
 
+// What waits in the queue. Read before the document, in which stands what is taken from it
+// meanwhile.
+std::vector<RequestRecord> ReadSent(World *world) {
+    std::vector<RequestRecord> sent;
+    LookErrors errors; // that there is no queue is no error of the files'
+    const Queue queue = QueueLook(&errors);
+    const bool isFound = queue.cause == MsgQueueCause::Found;
+    if (errors.isUnknown || (isFound && MsgQueueCopy(queue.state, &sent) < 0)) {
+        world->areSentKnown = false;
+        LookErrorAdd(&world->errors, kMessageKeyFile,
+                     "the requests that wait in the queue cannot be seen");
+    }
+    return sent;
+}
+
 RecordedVolume *RecordsOf(ConfigRecords *records, const std::string &mountPath) {
     const auto found =
         std::find_if(records->volumes.begin(), records->volumes.end(),
@@ -30,7 +46,8 @@ RecordedVolume *RecordsOf(ConfigRecords *records, const std::string &mountPath) 
 }
 
 // The mount paths that records and requests name.
-std::set<std::string> PathsNamed(const ConfigRecords &records) {
+std::set<std::string> PathsNamed(const ConfigRecords &records,
+                                 const std::vector<RequestRecord> &sent) {
     std::set<std::string> paths;
     for (const RecordedVolume &volume : records.volumes) {
         paths.insert(volume.mountPath);
@@ -38,18 +55,24 @@ std::set<std::string> PathsNamed(const ConfigRecords &records) {
     for (const StoredRequest &request : records.requests) {
         paths.insert(request.mountPath);
     }
+    for (const RequestRecord &request : sent) {
+        if (RequestHasFiles(request.type)) {
+            paths.insert(request.mountPath);
+        }
+    }
     return paths;
 }
 
-void AddVolume(World *world, Volume volume, LookErrors errors, ConfigRecords *records) {
+void AddVolume(World *world, Volume volume, LookErrors errors, ConfigRecords *records,
+               const std::vector<RequestRecord> &sent) {
     WorldVolume added;
     RecordedVolume *recorded = RecordsOf(records, volume.mountPath);
-    added.known = KnownFilesOf(volume.mountPath, recorded, records->requests);
+    added.known = KnownFilesOf(volume.mountPath, recorded, records->requests, sent);
     KnownFiles &known = added.known;
     known.isRecordedKnown = world->isConfigKnown && records->areVolumesKnown &&
                             (recorded == nullptr || recorded->areFilesKnown);
-    known.isWhole = known.isRecordedKnown && records->areRequestsKnown && known.problems.empty() &&
-                    (recorded == nullptr || recorded->isWhole);
+    known.isWhole = known.isRecordedKnown && records->areRequestsKnown && world->areSentKnown &&
+                    known.problems.empty() && (recorded == nullptr || recorded->isWhole);
     for (const std::string &problem : known.problems) {
         LookErrorAdd(&errors, world->configPath, problem);
     }
@@ -64,11 +87,12 @@ World WorldLook(const std::string &configPath) {
     World world;
     world.configPath = configPath;
     LookLogTake("");
+    const std::vector<RequestRecord> sent = ReadSent(&world);
     ConfigRecords records = ReadRecords(&world);
     if (world.isConfigKnown && records.areRequestsKnown) {
         world.storedRequests = records.requests.size();
     }
-    std::set<std::string> named = PathsNamed(records);
+    std::set<std::string> named = PathsNamed(records, sent);
     SpaceCause cause = SpaceCause::Found;
     const std::vector<SpaceEntry> spaces = SpaceList(&cause);
     world.areVolumesKnown = cause == SpaceCause::Found;
@@ -87,7 +111,7 @@ World WorldLook(const std::string &configPath) {
         if (!isNamed && !volume.hasCache) {
             world.withoutCache.push_back(volume.mountPath);
         } else {
-            AddVolume(&world, std::move(volume), std::move(errors), &records);
+            AddVolume(&world, std::move(volume), std::move(errors), &records, sent);
         }
     }
     for (const std::string &mountPath : named) {
@@ -96,7 +120,7 @@ World WorldLook(const std::string &configPath) {
         LookErrors errors;
         LookErrorAdd(&errors, mountPath,
                      world.areVolumesKnown ? "is not mounted" : "cannot be found");
-        AddVolume(&world, std::move(volume), std::move(errors), &records);
+        AddVolume(&world, std::move(volume), std::move(errors), &records, sent);
     }
     std::sort(world.volumes.begin(), world.volumes.end(),
               [](const WorldVolume &a, const WorldVolume &b) {

@@ -22,6 +22,7 @@ struct World {
     std::string configPath;
     bool isConfigKnown = false;
     bool areVolumesKnown = true; // false: not all could be listed
+    bool areSentKnown = true;    // false: requests in the queue cannot be seen
     std::optional<uint64_t> storedRequests;
     // Mounted volumes with a cache, and all with records or requests, in order of their paths.
     std::vector<WorldVolume> volumes;

@@ -28,7 +28,8 @@ struct Sum {
 class VolumeLister {
 public:
     VolumeLister(const WorldVolume &volume, bool search, World &world, const Visit &visit)
-        : world_(volume), errors_(world.errors), visit_(visit), isConfigKnown_(world.isConfigKnown),
+        : world_(volume), errors_(world.errors), visit_(visit),
+          isConfigKnown_(world.isConfigKnown && world.areSentKnown),
           looker_(volume.volume.mountPath) {
         if (search) {
             renamed_ = RenamedFind(volume, &errors_);
@@ -190,7 +191,7 @@ private:
     const WorldVolume &world_;
     LookErrors &errors_;
     const Visit &visit_;
-    const bool isConfigKnown_; // without it no file can be said to be unpinned
+    const bool isConfigKnown_; // without it, and the queue, no file's state can be told
     FileLooker looker_;
     RenamedFiles renamed_;
     FileLook absent_; // of every file where the volume is not there

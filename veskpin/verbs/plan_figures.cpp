@@ -110,7 +110,7 @@ PlanFigures PlanSum::Total(unsigned reservePercent) const {
                                 static_cast<int64_t>(cover_.Sectors() * kSectorBytes);
     }
     figures.ssdBlocks = volume.ssdBlocks;
-    figures.seconds = world_.known.requests + figures.requests +
+    figures.seconds = world_.known.requests + world_.known.sent + figures.requests +
                       sentSectors_ * kSectorBytes / kReadBytesPerSecond;
     if (!volume.marked) {
         return figures;

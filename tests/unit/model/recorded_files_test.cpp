@@ -33,6 +33,14 @@ KnownFiles Known(std::vector<RecordedFile> files, const std::vector<StoredReques
     return known;
 }
 
+RequestRecord Sent(int type, const std::string &data, const std::string &mountPath = kMount) {
+    RequestRecord record{};
+    record.type = type;
+    mountPath.copy(record.mountPath, sizeof(record.mountPath) - 1);
+    data.copy(record.data, sizeof(record.data) - 1);
+    return record;
+}
+
 // The paths of a range.
 Texts Paths(const KnownFiles &known, std::pair<size_t, size_t> range) {
     Texts paths;
@@ -78,6 +86,23 @@ TEST_F(RecordedFilesTest, OtherVolumesRequestsAndThoseWithoutFilesNameNone) {
     EXPECT_EQ(TextsOf(known), Texts{"a 11"});
     EXPECT_EQ(known.requests, 2U);
     EXPECT_EQ(known.problems, Texts{});
+}
+
+TEST_F(RecordedFilesTest, WhatWaitsInTheQueueComesAfterWhatIsStored) {
+    RecordedVolume volume{kMount, {{11, "a"}, {12, "b"}}};
+    const KnownFiles known =
+        KnownFilesOf(kMount, &volume, {Request(kRequestPinFiles, "a#11;c#13")},
+                     {Sent(kRequestUnpinFiles, "/volume1/a;/volume1/d e"),
+                      Sent(kRequestPinFiles, "/volume1/b;;/volume10/x;/volume1/f"),
+                      Sent(kRequestReloadPinBlocks, "/volume1/a"),
+                      Sent(kRequestPinFiles, "/volume2/a", "/volume2")});
+    EXPECT_EQ(TextsOf(known), (Texts{"a 11 unpinFiles", "b 12 pinFiles", "c - pinFiles",
+                                     "d - unpinFiles", "f - pinFiles"}));
+    EXPECT_EQ(known.requests, 1U);
+    EXPECT_EQ(known.sent, 3U);
+    EXPECT_EQ(known.problems, Texts{});
+    EXPECT_EQ(LookLogTake("none"), "none");
+    EXPECT_EQ(KnownFileByInode(known, 13)->relativePath, "c");
 }
 
 TEST_F(RecordedFilesTest, AReplacedFilesPathStandsThereOnceForEachInode) {

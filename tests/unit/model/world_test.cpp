@@ -1,5 +1,7 @@
 #include "model/world.h"
 
+#include "model/service_look.h"
+#include "tests/support/private_world.h"
 #include "tests/unit/model/volume_fixture.h"
 
 namespace vesk {
@@ -51,6 +53,34 @@ TEST_F(WorldTest, VolumesHaveTheirRecordsAndRequests) {
     EXPECT_EQ(world.volumes[0].known.files.size(), 3U);
     EXPECT_TRUE(world.volumes[0].volume.isMounted);
     EXPECT_EQ(TextsOf(world.errors), Texts{});
+}
+
+TEST_F(WorldTest, RequestsThatWaitInTheQueueAreKnownAndStay) {
+    SKIP_WITHOUT_PRIVATE_WORLD();
+    const int id = MsgQueueGet(kMessageKeyFile);
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestPinFiles, mountPath_, mountPath_ + "/a")));
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestPinFiles, "/volume8", "/volume8/a")));
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestAddPendingSpace, "/volume9")));
+    World world = WorldLook(config_);
+    EXPECT_EQ(Paths(world), (Texts{mountPath_, "/volume8"}));
+    EXPECT_EQ(world.volumes[0].known.files.at(0).stored, kRequestPinFiles);
+    EXPECT_EQ(world.volumes[0].known.sent, 1U);
+    EXPECT_EQ(world.volumes[0].known.requests, 0U);
+    EXPECT_TRUE(world.areSentKnown);
+    EXPECT_EQ(CountMessages(id), 3);
+    EmptyPrivateWorld();
+}
+
+TEST_F(WorldTest, AQueueThatCannotBeSeenLeavesNothingWhole) {
+    SKIP_WITHOUT_PRIVATE_WORLD();
+    ASSERT_NE(MsgQueueGet(kMessageKeyFile), -1);
+    FakeLibc::Fail("msgctl", EACCES);
+    const World world = WorldLook(config_);
+    EXPECT_FALSE(world.areSentKnown);
+    EXPECT_FALSE(world.volumes[0].known.isWhole);
+    EXPECT_EQ(TextsOf(world.errors), Texts{std::string(kMessageKeyFile) +
+                                           ": the requests that wait in the queue cannot be seen"});
+    EmptyPrivateWorld();
 }
 
 TEST_F(WorldTest, WhatIsNamedAndNotMountedIsThereToo) {

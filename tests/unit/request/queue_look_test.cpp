@@ -1,5 +1,6 @@
-#include "request/message_queue.h"
+#include "request/queue_look.h"
 
+#include "request/message_queue.h"
 #include "tests/support/ordinary_user.h"
 #include "tests/support/queue_fixture.h"
 
@@ -32,6 +33,16 @@ protected:
         EXPECT_EQ(msgctl(id, IPC_STAT, &status), 0);
         status.msg_perm.uid = owner;
         EXPECT_EQ(msgctl(id, IPC_SET, &status), 0);
+    }
+    // What waits in the queue that was found, each record as its log line.
+    Messages Copied() {
+        std::vector<RequestRecord> records;
+        EXPECT_EQ(MsgQueueCopy(state_, &records), 0);
+        Messages texts(records.size());
+        for (size_t i = 0; i < records.size(); ++i) {
+            RequestToString(&texts[i], &records[i]);
+        }
+        return texts;
     }
     void ExpectState(int key, int id, uid_t owner, uint64_t messages, uint64_t bytes) const {
         EXPECT_EQ(state_.key, key);
@@ -151,5 +162,64 @@ TEST_F(MessageQueueLookTest, AQueueThatSomebodyElseMadeOrOwnsIsForeign) {
         EXPECT_EQ(Look(), queue.forUser);
         ExpectState(kKey, id, queue.owner, 1, 3);
     }
+}
+
+TEST_F(MessageQueueLookTest, RequestsAreCopiedInTheirOrderAndStay) {
+    const int id = Make(0644);
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestPinFiles, "/volume1", "/volume1/a")));
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestUnpinFiles, "/volume2", "/volume2/b;c")));
+    ASSERT_EQ(Look(), MsgQueueCause::Found);
+    EXPECT_EQ(Copied(), (Messages{"Request type=pinFiles mountPath=/volume1 data=/volume1/a",
+                                  "Request type=unpinFiles mountPath=/volume2 data=/volume2/b;c"}));
+    EXPECT_EQ(CountMessages(id), 2);
+}
+
+// Of other types and of lengths that no request has: the receiver takes none, or ends by it.
+TEST_F(MessageQueueLookTest, WhatIsNoRequestIsNotCopied) {
+    const int id = Make(0644);
+    ASSERT_TRUE(PutMessage(id, 2, RecordBytes(kRequestPinFiles, "/volume1", "/volume1/a")));
+    ASSERT_TRUE(PutMessage(id, 1, std::string(kRequestMessageBytes + 1, 'x')));
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestPinFiles, "/volume1", "/volume1/b")));
+    ASSERT_EQ(Look(), MsgQueueCause::Found);
+    EXPECT_EQ(Copied(), Messages{"Request type=pinFiles mountPath=/volume1 data=/volume1/b"});
+    EXPECT_EQ(CountMessages(id), 3);
+}
+
+TEST_F(MessageQueueLookTest, TheTextsOfACopiedRecordEndInsideTheirFields) {
+    const int id = Make(0644);
+    std::string bytes = RecordBytes(kRequestPinFiles, "", "");
+    bytes.replace(4, std::string::npos, bytes.size() - 4, 'x');
+    ASSERT_TRUE(PutMessage(id, 1, bytes));
+    ASSERT_TRUE(PutMessage(id, 1, bytes.substr(0, 10)));
+    ASSERT_EQ(Look(), MsgQueueCause::Found);
+    std::vector<RequestRecord> records;
+    ASSERT_EQ(MsgQueueCopy(state_, &records), 0);
+    ASSERT_EQ(records.size(), 2U);
+    EXPECT_EQ(records[0].mountPath, std::string(kRequestMountPathBytes - 1, 'x'));
+    EXPECT_EQ(records[0].data, std::string(kRequestDataBytes - 1, 'x'));
+    EXPECT_EQ(records[1].mountPath, std::string("xxxxxx"));
+    EXPECT_EQ(records[1].data, std::string());
+}
+
+TEST_F(MessageQueueLookTest, WhatIsTakenMeanwhileIsCopiedAllTheSame) {
+    const int id = Make(0644);
+    for (const char *path : {"/v/a", "/v/b", "/v/c"}) {
+        ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestPinFiles, "/v", path)));
+    }
+    ASSERT_EQ(Look(), MsgQueueCause::Found);
+    TakeMessage(id);
+    EXPECT_EQ(Copied(), (Messages{"Request type=pinFiles mountPath=/v data=/v/b",
+                                  "Request type=pinFiles mountPath=/v data=/v/c"}));
+    EXPECT_EQ(CountMessages(id), 2);
+}
+
+TEST_F(MessageQueueLookTest, AQueueThatIsGoneHasNothingToCopy) {
+    const int id = Make(0644);
+    ASSERT_TRUE(PutMessage(id, 1, RecordBytes(kRequestPinFiles, "/volume1", "/volume1/a")));
+    ASSERT_EQ(Look(), MsgQueueCause::Found);
+    EmptyPrivateWorld();
+    std::vector<RequestRecord> records;
+    EXPECT_EQ(MsgQueueCopy(state_, &records), -1);
+    EXPECT_EQ(records.size(), 0U);
 }
 } // namespace vesk

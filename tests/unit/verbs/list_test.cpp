@@ -267,6 +267,16 @@ TEST_F(ListLookTest, WithoutTheConfigurationNoFileHasAState) {
     EXPECT_EQ(List({"share/a"}), Texts{"share/a null 1/1"});
 }
 
+// A request there may pin or unpin any of them.
+TEST_F(ListLookTest, WhereTheQueueCannotBeSeenNoFileHasAState) {
+    Record({{Make("share/a", 1), "share/a"}});
+    Make("share/b", 2);
+    EXPECT_EQ(List({"share"}), (Texts{"share/a pinned 1/1", "share/b unpinned 0/1"}));
+    world_.areSentKnown = false;
+    EXPECT_EQ(List({"share"}), (Texts{"share/a null 1/1", "share/b null 0/1"}));
+    EXPECT_EQ(Errors(), Texts{"unknown"});
+}
+
 TEST_F(ListLookTest, APathThatCannotBeLookedAtFailsOnce) {
     ASSERT_EQ(symlink("loop", (volume_ + "/loop").c_str()), 0);
     Record({{77, "loop/b"}});
