@@ -107,13 +107,15 @@ arm_make_disk() {
 # What hardens a kernel against others costs an emulated one much time, page by page and call by call.
 ARM_KERNEL_OPTIONS="init_on_alloc=0 init_on_free=0 mitigations=off apparmor=0 audit=0 randomize_kstack_offset=off"
 
-# arm_boot SECONDS FIRST STEP: boots a machine that runs every STEP-th test from the FIRST on and
-# switches itself off; its console goes to standard output. Nothing is kept of what it writes.
+# arm_boot SECONDS: boots a machine of as many processors as this one has, at most four; it runs the tests and switches
+# itself off. Its console goes to standard output. Nothing is kept of what it writes.
 arm_boot() {
-    timeout --foreground "$1" qemu-system-arm -M virt -cpu cortex-a15 -smp 1 -m 1536 -accel tcg \
-        -nographic -no-reboot -nodefaults -serial stdio -snapshot \
+    local processors
+    processors=$(nproc)
+    timeout --foreground "$1" qemu-system-arm -M virt -cpu cortex-a15 -smp $((processors < 4 ? processors : 4)) \
+        -m 2560 -accel tcg,thread=multi -nographic -no-reboot -nodefaults -serial stdio -snapshot \
         -kernel "$ARM_MACHINE/vmlinuz" -initrd "$ARM_MACHINE/initrd.gz" \
-        -append "console=ttyAMA0 quiet panic=-1 $ARM_KERNEL_OPTIONS vesk_share=$2,$3" \
+        -append "console=ttyAMA0 quiet panic=-1 $ARM_KERNEL_OPTIONS" \
         -drive "if=none,file=$ARM_MACHINE/disk.img,format=raw,id=root" \
         -device virtio-blk-device,drive=root </dev/null
 }
