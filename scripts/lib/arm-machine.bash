@@ -6,7 +6,7 @@ ARM_MACHINE=$TREE/build-armhf-machine
 
 ARM_MACHINE_PACKAGES="bash coreutils util-linux util-linux-extra mount fdisk e2fsprogs xfsprogs procps
     kmod libc-bin grep sed mawk findutils diffutils gzip tar hostname debianutils perl-base dash busybox-static bash-static
-    bats jq python3-minimal cmake libjsoncpp25 libmount1 libblkid1 libfuse3-3 libstdc++6 libgtest-dev"
+    bats jq python3-minimal cmake libjsoncpp25 libmount1 libblkid1 libfuse3-3 fuse3 libstdc++6 libgtest-dev"
 ARM_KERNEL=linux-image-armmp
 # Small tools that the tests start by the thousand: busybox's need no dynamic linking, which takes three
 # times as long there as everything else about starting them.

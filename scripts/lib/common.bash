@@ -7,7 +7,7 @@ BUILD_PACKAGES="g++ cmake ninja-build pkg-config libjsoncpp-dev libmount-dev lib
 # shellcheck disable=SC2034
 RUN_PACKAGES="util-linux mount fdisk e2fsprogs xfsprogs procps kmod"
 # shellcheck disable=SC2034
-TEST_PACKAGES="libgtest-dev bats jq python3-minimal python3-jsonschema btrfs-progs"
+TEST_PACKAGES="libgtest-dev bats jq python3-minimal python3-jsonschema btrfs-progs fuse3"
 
 die() {
     echo "$(basename "$0"): $*" >&2

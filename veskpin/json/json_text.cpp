@@ -5,6 +5,7 @@
 #include <json/json.h>
 
 #include <algorithm>
+#include <charconv>
 #include <memory>
 
 namespace vesk {
@@ -27,6 +28,16 @@ std::string Quoted(std::string_view text) {
     return quoted;
 }
 
+template <typename Value> void PutNumber(TextSink &sink, const std::optional<Value> &value) {
+    if (!value) {
+        sink.Put("null");
+        return;
+    }
+    char digits[24];
+    const char *end = std::to_chars(digits, digits + sizeof(digits), *value).ptr;
+    sink.Put(std::string_view(digits, static_cast<size_t>(end - digits)));
+}
+
 bool ParseObject(const std::string &text, Json::Value *root) {
     const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
     try {
@@ -40,10 +51,10 @@ bool ParseObject(const std::string &text, Json::Value *root) {
 
 void JsonWriter::Begin(std::string_view name) {
     if (needsComma_) {
-        sink_.Put(",");
+        sink_.Put(',');
     }
     if (!name.empty()) {
-        sink_.Put("\"");
+        sink_.Put('"');
         sink_.Put(name);
         sink_.Put("\":");
     }
@@ -52,23 +63,23 @@ void JsonWriter::Begin(std::string_view name) {
 
 void JsonWriter::BeginObject(std::string_view name) {
     Begin(name);
-    sink_.Put("{");
+    sink_.Put('{');
     needsComma_ = false;
 }
 
 void JsonWriter::BeginArray(std::string_view name) {
     Begin(name);
-    sink_.Put("[");
+    sink_.Put('[');
     needsComma_ = false;
 }
 
 void JsonWriter::EndObject() {
-    sink_.Put("}");
+    sink_.Put('}');
     needsComma_ = true;
 }
 
 void JsonWriter::EndArray() {
-    sink_.Put("]");
+    sink_.Put(']');
     needsComma_ = true;
 }
 
@@ -78,9 +89,9 @@ void JsonWriter::Text(std::string_view name, std::string_view value) {
         sink_.Put(Quoted(value));
         return;
     }
-    sink_.Put("\"");
+    sink_.Put('"');
     sink_.Put(value);
-    sink_.Put("\"");
+    sink_.Put('"');
 }
 
 void JsonWriter::Text(std::string_view name, const std::optional<std::string> &value) {
@@ -89,12 +100,12 @@ void JsonWriter::Text(std::string_view name, const std::optional<std::string> &v
 
 void JsonWriter::Number(std::string_view name, const std::optional<uint64_t> &value) {
     Begin(name);
-    sink_.Put(value ? std::to_string(*value) : "null");
+    PutNumber(sink_, value);
 }
 
 void JsonWriter::Signed(std::string_view name, const std::optional<int64_t> &value) {
     Begin(name);
-    sink_.Put(value ? std::to_string(*value) : "null");
+    PutNumber(sink_, value);
 }
 
 void JsonWriter::Bool(std::string_view name, const std::optional<bool> &value) {

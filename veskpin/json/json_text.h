@@ -27,6 +27,7 @@ public:
     void EndArray();
     void Text(std::string_view name, std::string_view value);
     void Text(std::string_view name, const std::optional<std::string> &value);
+    void Text(std::string_view name, const char *value) { Text(name, std::string_view(value)); }
     void Number(std::string_view name, const std::optional<uint64_t> &value);
     void Signed(std::string_view name, const std::optional<int64_t> &value);
     void Bool(std::string_view name, const std::optional<bool> &value);

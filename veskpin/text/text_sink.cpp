@@ -5,17 +5,6 @@
 #include <cerrno>
 
 namespace vesk {
-namespace {
-const size_t kKeptMax = 65536; // bytes
-} // namespace
-
-void TextSink::Put(std::string_view text) {
-    kept_.append(text);
-    if (fd_ >= 0 && kept_.size() >= kKeptMax) {
-        Flush();
-    }
-}
-
 bool TextSink::Flush() {
     if (fd_ < 0) {
         return true;

@@ -57,8 +57,7 @@ void ListView::Put(const ListedFile &file) {
         file.volume.empty() ? writer_.Null("volume") : writer_.Path("volume", file.volume);
         writer_.Path("path", file.path);
         writer_.Number("inode", file.inode);
-        writer_.Text("state", file.state ? std::optional<std::string>(FileStateText(*file.state))
-                                         : std::nullopt);
+        file.state ? writer_.Text("state", FileStateText(*file.state)) : writer_.Null("state");
         file.pathNow == nullptr ? writer_.Null("pathNow") : writer_.Path("pathNow", *file.pathNow);
         writer_.Number("bytes", figures.bytes);
         PutFigures(writer_, figures.blocks, figures.marked, figures.resident);

@@ -57,7 +57,7 @@ void PlanShowJson(const Plan &plan, const LookErrors &errors, TextSink &out) {
     for (const SkippedPath &skipped : plan.skipped) {
         json.BeginObject();
         json.Path("path", skipped.path);
-        json.Text("reason", std::string_view(SkipReasonText(skipped.reason)));
+        json.Text("reason", SkipReasonText(skipped.reason));
         json.EndObject();
     }
     json.EndArray();
