@@ -1,8 +1,8 @@
 // system_unanswered_mount MOUNT_POINT SOURCE
 //
-// Makes a FUSE mount as any user may, with fusermount3 and for everybody ("allow_other"), and answers
-// nothing: whoever asks the mounted file system for anything waits until this program ends. Prints
-// "mounted" when it is.
+// Makes a FUSE mount as any user may, with fusermount3 and "allow_other", and answers nothing:
+// whoever asks the mounted file system for anything waits until this program ends. Prints "mounted"
+// when it is.
 #include "base/scoped_fd.h"
 
 #include <cstdio>
