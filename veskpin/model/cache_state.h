@@ -20,7 +20,4 @@ struct CacheState {
 
 // What is not told is absent and no error; what is told and cannot be read is one.
 CacheState CacheStateRead(const std::string &cacheDevice, LookErrors *errors);
-
-// The whole of a regular file of at most `maxBytes`. 0, or the errno of what failed.
-int FileReadAll(const std::string &path, size_t maxBytes, std::string *content);
 } // namespace vesk

@@ -1,6 +1,6 @@
 #include "model/renamed.h"
 
-#include "model/cache_state.h"
+#include "files/file_whole.h"
 #include "model/path_walk.h"
 #include "json/json_text.h"
 
@@ -63,7 +63,7 @@ Births WantedOf(const WorldVolume &world, const Births &last, FileLooker &looker
 }
 } // namespace
 
-RenamedFiles RenamedFind(const WorldVolume &world, LookErrors *errors) {
+RenamedFiles RenamedFind(const WorldVolume &world, ProgressForm progress, LookErrors *errors) {
     RenamedFiles found;
     if (!world.volume.isMounted || !world.volume.uuid) {
         return found;
@@ -76,7 +76,9 @@ RenamedFiles RenamedFind(const WorldVolume &world, LookErrors *errors) {
     if (wanted.empty()) {
         return found;
     }
+    Progress walked(progress, 0);
     PathWalk(looker, "", [&](const WalkEntry &entry) {
+        walked.Step();
         if (entry.kind != WalkKind::File) {
             return;
         }

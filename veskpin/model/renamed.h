@@ -10,6 +10,7 @@
 
 #include "model/file_look.h"
 #include "model/world.h"
+#include "text/progress.h"
 
 #include <cstdint>
 #include <map>
@@ -18,6 +19,7 @@
 namespace vesk {
 using RenamedFiles = std::map<uint32_t, std::string>; // recorded inode, path on the volume now
 
-// A file without birth time in the copy, or of another one, is not found.
-RenamedFiles RenamedFind(const WorldVolume &world, LookErrors *errors);
+// A file without birth time in the copy, or of another one, is not found. The walk, which may be
+// long, shows how far it has come.
+RenamedFiles RenamedFind(const WorldVolume &world, ProgressForm progress, LookErrors *errors);
 } // namespace vesk

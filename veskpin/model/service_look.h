@@ -7,6 +7,7 @@
 #include "model/look_errors.h"
 #include "request/message_queue.h"
 #include "request/queue_look.h"
+#include "service/service_threads.h"
 
 #include <sys/types.h>
 
@@ -16,8 +17,6 @@
 #include <vector>
 
 namespace vesk {
-enum class ThreadLook { Waiting, Busy, Ended };
-
 struct Service {
     pid_t pid = 0;
     std::optional<std::string> config; // absolute path, from the command line of a living thread

@@ -27,12 +27,13 @@ struct Sum {
 // The listing of one volume.
 class VolumeLister {
 public:
-    VolumeLister(const WorldVolume &volume, bool search, World &world, const Visit &visit)
+    VolumeLister(const WorldVolume &volume, std::optional<ProgressForm> search, World &world,
+                 const Visit &visit)
         : world_(volume), errors_(world.errors), visit_(visit),
           isConfigKnown_(world.isConfigKnown && world.areSentKnown),
           looker_(volume.volume.mountPath) {
         if (search) {
-            renamed_ = RenamedFind(volume, &errors_);
+            renamed_ = RenamedFind(volume, *search, &errors_);
         }
         absent_.error = ENODEV;
         WorldVolumeUse(world, volume);
@@ -227,8 +228,8 @@ void ListElsewhere(const Target &target, World &world, const Visit &visit, ListR
 // The listers of the volumes that were met: what they look up for a volume is looked up once.
 using Listers = std::map<const WorldVolume *, std::unique_ptr<VolumeLister>>;
 
-void ListTarget(const Target &target, bool search, World &world, const Visit &visit,
-                Listers *listers, ListResult *result) {
+void ListTarget(const Target &target, std::optional<ProgressForm> search, World &world,
+                const Visit &visit, Listers *listers, ListResult *result) {
     if (target.volume == nullptr) {
         ListElsewhere(target, world, visit, result);
         return;
@@ -273,8 +274,8 @@ uint64_t KnownCount(const World &world) {
 }
 } // namespace
 
-ListResult ListLook(World &world, const std::vector<std::string> &paths, bool search,
-                    const Visit &visit) {
+ListResult ListLook(World &world, const std::vector<std::string> &paths,
+                    std::optional<ProgressForm> search, const Visit &visit) {
     ListResult result;
     if (paths.empty()) {
         for (const WorldVolume &volume : world.volumes) {
@@ -296,8 +297,13 @@ ExitStatus ListCommand(const Settings &settings, TextSink &out) {
     ListView view(out, settings.json, settings.color);
     ListResult result;
     {
-        Progress progress(settings.progress, settings.paths.empty() ? KnownCount(world) : 0);
-        result = ListLook(world, settings.paths, settings.search, [&](const ListedFile &file) {
+        // Rows on a terminal are progress enough, and a line in their midst would spoil them.
+        const bool areRowsSeen =
+            !settings.json && isatty(STDOUT_FILENO) == 1 && settings.progress == ProgressForm::Line;
+        Progress progress(areRowsSeen ? ProgressForm::None : settings.progress,
+                          settings.paths.empty() ? KnownCount(world) : 0);
+        const auto search = settings.search ? std::optional(settings.progress) : std::nullopt;
+        result = ListLook(world, settings.paths, search, [&](const ListedFile &file) {
             view.Put(file);
             progress.Step();
         });

@@ -5,6 +5,7 @@
 #pragma once
 
 #include "model/world.h"
+#include "text/progress.h"
 #include "text/text_sink.h"
 #include "verbs/file_state.h"
 #include "json/json_text.h"
@@ -56,7 +57,8 @@ struct ListResult {
 };
 
 // Looks at everything that is recorded or requested, or at the paths, and gives each file to
-// `visit`. With `search` renamed files are looked for.
-ListResult ListLook(World &world, const std::vector<std::string> &paths, bool search,
+// `visit`. With `search` renamed files are looked for, and it is how that is shown.
+ListResult ListLook(World &world, const std::vector<std::string> &paths,
+                    std::optional<ProgressForm> search,
                     const std::function<void(const ListedFile &)> &visit);
 } // namespace vesk

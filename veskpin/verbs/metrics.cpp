@@ -153,7 +153,7 @@ std::string MetricsText(const MetricsView &view) {
 ExitStatus MetricsCommand(const Settings &settings, TextSink &out) {
     World world = WorldLook(settings.configPath);
     MetricsView view;
-    ListLook(world, {}, false, [&](const ListedFile &file) {
+    ListLook(world, {}, std::nullopt, [&](const ListedFile &file) {
         if (file.state) {
             ++view.states[file.volume][static_cast<size_t>(*file.state)];
         }

@@ -51,7 +51,7 @@ protected:
     static uint32_t Low(const FileStat &status) { return static_cast<uint32_t>(status.inode); }
     RenamedFiles Find() {
         errors_ = {};
-        return RenamedFind(world_, &errors_);
+        return RenamedFind(world_, ProgressForm::None, &errors_);
     }
 
     const TempDir folder_;

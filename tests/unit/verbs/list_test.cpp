@@ -62,7 +62,7 @@ protected:
     Texts ListPaths(const Texts &paths) {
         Texts files;
         world_.errors = {};
-        result_ = ListLook(world_, paths, false, [&](const ListedFile &file) {
+        result_ = ListLook(world_, paths, std::nullopt, [&](const ListedFile &file) {
             const bool isBelow = file.path.compare(0, volume_.size() + 1, volume_ + "/") == 0;
             EXPECT_EQ(file.volume, isBelow ? volume_ : file.volume);
             std::string text = isBelow ? file.path.substr(volume_.size() + 1) : file.path;
@@ -315,7 +315,8 @@ TEST_F(ListLookTest, WithSearchARenamedFileIsFound) {
     std::filesystem::rename(volume_ + "/a", volume_ + "/share/now");
     for (const bool search : {false, true}) {
         Texts files;
-        ListLook(world_, {}, search, [&](const ListedFile &file) {
+        const auto form = search ? std::optional(ProgressForm::None) : std::nullopt;
+        ListLook(world_, {}, form, [&](const ListedFile &file) {
             files.push_back(
                 file.path.substr(volume_.size()) + " " + FileStateText(*file.state) +
                 (file.pathNow == nullptr ? "" : " " + *file.pathNow) +
