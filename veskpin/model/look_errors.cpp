@@ -25,9 +25,14 @@ void LookErrorAdd(LookErrors *errors, const std::string &path, const std::string
     };
     // What repeats itself does so soon; a hundred thousand files are not compared with each other.
     const size_t near = std::min<size_t>(errors->list.size(), 64);
-    if (std::none_of(errors->list.rbegin(),
-                     errors->list.rbegin() + static_cast<std::ptrdiff_t>(near), isSame)) {
+    if (std::any_of(errors->list.rbegin(),
+                    errors->list.rbegin() + static_cast<std::ptrdiff_t>(near), isSame)) {
+        return;
+    }
+    if (errors->list.size() < kLookErrorsMax) {
         errors->list.push_back({path, text});
+    } else {
+        ++errors->more;
     }
 }
 

@@ -4,6 +4,8 @@
 // Thread rule: one thread.
 #pragma once
 
+#include <cstddef>
+#include <cstdint>
 #include <string>
 #include <vector>
 
@@ -13,8 +15,11 @@ struct LookError {
     std::string text;
 };
 
+const size_t kLookErrorsMax = 100000;
+
 struct LookErrors {
-    std::vector<LookError> list;
+    std::vector<LookError> list; // at most kLookErrorsMax: users can make millions of files
+    uint64_t more = 0;           // that are not listed
     // Something that was asked for is not known: a missing answer must not be taken for a "no".
     bool isUnknown = false;
 };

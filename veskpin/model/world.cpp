@@ -141,6 +141,7 @@ void WorldVolumeUse(World &world, const WorldVolume &volume) {
     for (const LookError &error : volume.errors.list) {
         LookErrorAdd(&world.errors, error.path, error.text);
     }
+    world.errors.more += volume.errors.more;
     world.errors.isUnknown = world.errors.isUnknown || volume.errors.isUnknown;
 }
 

@@ -16,6 +16,15 @@ size_t LettersOf(const std::string &text) {
         return (static_cast<unsigned char>(byte) & 0xC0) != 0x80;
     }));
 }
+
+// Those that are listed, and how many are not.
+std::vector<LookError> Shown(const LookErrors &errors) {
+    std::vector<LookError> shown = errors.list;
+    if (errors.more > 0) {
+        shown.push_back({"", "and " + std::to_string(errors.more) + " more"});
+    }
+    return shown;
+}
 } // namespace
 
 void AnswerBegin(JsonWriter &json, const char *command) {
@@ -26,7 +35,7 @@ void AnswerBegin(JsonWriter &json, const char *command) {
 
 void AnswerEnd(JsonWriter &json, TextSink &out, const LookErrors &errors) {
     json.BeginArray("errors");
-    for (const LookError &error : errors.list) {
+    for (const LookError &error : Shown(errors)) {
         json.BeginObject();
         json.Path("path", error.path);
         json.Text("text", std::string_view(error.text));
@@ -38,7 +47,7 @@ void AnswerEnd(JsonWriter &json, TextSink &out, const LookErrors &errors) {
 }
 
 void AnswerErrors(const LookErrors &errors) {
-    for (const LookError &error : errors.list) {
+    for (const LookError &error : Shown(errors)) {
         const std::string path = error.path.empty() ? "" : TextEscaped(error.path) + ": ";
         fprintf(stderr, "veskpin: %s%s\n", path.c_str(), TextEscaped(error.text).c_str());
     }

@@ -20,6 +20,17 @@ TEST_F(LookErrorsTest, WhatIsToldAnewLongAfterIsNotLookedFor) {
         LookErrorAdd(&errors, "/v/" + std::to_string(i > 60 ? i - 60 : i), "is gone");
     }
     EXPECT_EQ(errors.list.size(), 100000U);
+    EXPECT_EQ(errors.more, 0U);
+}
+
+TEST_F(LookErrorsTest, MoreThanAreListedAreCounted) {
+    LookErrors errors;
+    for (size_t i = 0; i < kLookErrorsMax + 3; ++i) {
+        LookUnknownAdd(&errors, "/v/" + std::to_string(i), "is gone");
+    }
+    LookErrorAdd(&errors, "/v/" + std::to_string(kLookErrorsMax - 1), "is gone");
+    EXPECT_EQ(errors.list.size(), kLookErrorsMax);
+    EXPECT_EQ(errors.more, 3U);
 }
 
 TEST_F(LookErrorsTest, WhatIsUnknownStaysUnknownAlsoWhenItWasTold) {

@@ -28,6 +28,23 @@ TEST(AnswerTest, WithoutErrorsTheListIsEmpty) {
     EXPECT_EQ(sink.Kept(), "{\"command\":\"list\",\"schema\":1,\"errors\":[]}\n");
 }
 
+TEST(AnswerTest, WhatIsNotListedIsCounted) {
+    LookErrors errors;
+    LookErrorAdd(&errors, "/v/a", "is gone");
+    errors.more = 7;
+    TextSink sink;
+    JsonWriter json(sink);
+    AnswerBegin(json, "list");
+    AnswerEnd(json, sink, errors);
+    EXPECT_EQ(sink.Kept(), R"({"command":"list","schema":1,"errors":[)"
+                           R"({"path":"/v/a","text":"is gone"},{"path":"","text":"and 7 more"}]})"
+                           "\n");
+    testing::internal::CaptureStderr();
+    AnswerErrors(errors);
+    EXPECT_EQ(testing::internal::GetCapturedStderr(),
+              "veskpin: /v/a: is gone\nveskpin: and 7 more\n");
+}
+
 TEST(AnswerTest, ForPeopleErrorsAreLinesThatNoNameCanForge) {
     LookErrors errors;
     LookErrorAdd(&errors, "/v/a\nveskpin: all is well", "is gone");
