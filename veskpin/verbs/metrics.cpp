@@ -159,7 +159,7 @@ ExitStatus MetricsCommand(const Settings &settings, TextSink &out) {
         }
     });
     view.status = StatusLook(world, {});
-    view.errors = world.errors.list.size();
+    view.errors = world.errors.list.size() + world.errors.more;
     view.lookedAt = time(nullptr);
     const std::string text = MetricsText(view);
     AnswerErrors(world.errors);
