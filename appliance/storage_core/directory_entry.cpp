@@ -27,12 +27,12 @@ bool MayBeRegularFile(const dirent &entry) {
 // other, and reading a large folder takes long.
 class FolderScan {
 public:
-    bool IsOf(const struct stat &folder) const {
-        return isRead_ && folder.st_dev == status_.st_dev && folder.st_ino == status_.st_ino;
+    bool IsOf(const FolderIdentity &folder) const {
+        return isRead_ && folder.device == status_.st_dev && folder.inode == status_.st_ino;
     }
     // Whether these are the folder's files still.
     bool IsAsItWas(const struct stat &folder) const {
-        return IsOf(folder) && IsEqual(folder.st_mtim, status_.st_mtim) &&
+        return IsOf({folder.st_dev, folder.st_ino}) && IsEqual(folder.st_mtim, status_.st_mtim) &&
                IsEqual(folder.st_ctim, status_.st_ctim);
     }
     // Whether a change since the scan would show in the folder's times: one in the same tick of the
@@ -92,32 +92,35 @@ private:
     std::string names_; // each with its NUL
 };
 
-struct FolderAnswer {
-    dev_t device = 0; // of the folder
-    bool isFound = false;
-    bool isLast = true; // reading the folder anew would show nothing else
+std::mutex scanLock;                   // guards lastScan
+auto *const lastScan = new FolderScan; // never destroyed: other threads may still ask at the end
+
+bool SearchRemembered(const FolderIdentity &folder, InodeSearch &search) {
+    const std::lock_guard<std::mutex> guard(scanLock);
+    return lastScan->IsOf(folder) && lastScan->Search(search);
+}
+
+struct Memory {
+    bool isAsItWas = false; // the folder has the files that are remembered
+    bool isCurrent = false; // reading it anew would show nothing else
 };
 
-// Looks for the file in the folder, or only in what is remembered of it. Who finds a file there
-// looks at it himself, so that what is remembered may be old: a folder in which something changes
-// all the time need not be read for each of its files. But that no other file has the same low 32
-// bits is known of the folder as it was only.
-FolderAnswer SearchFolder(int folder, bool remembered, InodeSearch &search) {
-    static std::mutex lock; // guards lastScan
-    static auto *lastScan = new FolderScan;
+Memory MemoryOf(int folder) {
+    struct stat status = {};
+    const bool isKnown = fstat(folder, &status) == 0;
+    const std::lock_guard<std::mutex> guard(scanLock);
+    const bool isAsItWas = isKnown && lastScan->IsAsItWas(status);
+    return {isAsItWas, isAsItWas && lastScan->IsSettled()};
+}
+
+bool SearchAnew(int folder, InodeSearch &search) {
     struct stat status = {};
     if (fstat(folder, &status) != 0) {
-        return {};
+        return false;
     }
-    const std::lock_guard<std::mutex> guard(lock);
-    if (!remembered) {
-        lastScan->Read(folder, status);
-        return {status.st_dev, lastScan->IsOf(status) && lastScan->Search(search), true};
-    }
-    const bool isAsItWas = lastScan->IsAsItWas(status);
-    const bool isFound = lastScan->IsOf(status) && lastScan->Search(search);
-    return {status.st_dev, isFound && (isAsItWas || search.isExact),
-            isAsItWas && lastScan->IsSettled()};
+    const std::lock_guard<std::mutex> guard(scanLock);
+    lastScan->Read(folder, status);
+    return lastScan->IsOf({status.st_dev, status.st_ino}) && lastScan->Search(search);
 }
 
 ScopedFd OpenFound(int folder, dev_t device, const InodeSearch &search) {
@@ -155,21 +158,35 @@ bool InodeSearchFound(const InodeSearch &search) {
     return !search.name.empty() && (search.isExact || !search.isAmbiguous);
 }
 
-ScopedFd DirectoryOpenFile(int folder, uint64_t inode) {
-    for (const bool remembered : {true, false}) {
-        InodeSearch search;
-        search.wanted = inode;
-        const FolderAnswer answer = SearchFolder(folder, remembered, search);
-        if (answer.isFound) {
-            ScopedFd file = OpenFound(folder, answer.device, search);
-            if (file.IsOpen()) {
-                return file;
-            }
-        }
-        if (answer.isLast) {
-            break;
+FolderIdentity FolderIdentityOf(int folder) {
+    struct stat status = {};
+    return fstat(folder, &status) == 0 ? FolderIdentity{status.st_dev, status.st_ino}
+                                       : FolderIdentity{};
+}
+
+ScopedFd DirectoryOpenFile(int directory, const FolderIdentity &identity, uint64_t inode) {
+    // Who finds a file in what is remembered looks at it himself, so that this may be old: a folder
+    // in which something changes all the time need not be read for each of its files. But that no
+    // other file has the same low 32 bits is known of the folder as it was only.
+    InodeSearch search;
+    search.wanted = inode;
+    const bool isFound = SearchRemembered(identity, search);
+    if (isFound && search.isExact) {
+        if (ScopedFd file = OpenFound(directory, identity.device, search); file.IsOpen()) {
+            return file;
         }
     }
-    return ScopedFd();
+    const Memory memory = MemoryOf(directory);
+    if (isFound && !search.isExact && memory.isAsItWas) {
+        if (ScopedFd file = OpenFound(directory, identity.device, search); file.IsOpen()) {
+            return file;
+        }
+    }
+    if (memory.isCurrent) {
+        return ScopedFd();
+    }
+    InodeSearch anew;
+    anew.wanted = inode;
+    return SearchAnew(directory, anew) ? OpenFound(directory, identity.device, anew) : ScopedFd();
 }
 } // namespace vesk

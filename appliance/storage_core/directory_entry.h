@@ -6,6 +6,8 @@
 
 #include "base/scoped_fd.h"
 
+#include <sys/types.h>
+
 #include <cstdint>
 #include <string>
 
@@ -27,8 +29,15 @@ void InodeSearchOffer(InodeSearch &search, uint64_t inode, const char *name);
 // Whether the search found one file; `candidate` and `name` are then its number and its entry.
 bool InodeSearchFound(const InodeSearch &search);
 
+// Which folder an open one is. It stays that as long as it is open.
+struct FolderIdentity {
+    dev_t device = 0;
+    ino_t inode = 0; // 0: cannot be told
+};
+FolderIdentity FolderIdentityOf(int folder);
+
 // Opens the regular file with this inode number (or these low 32 bits of it) in an open directory,
 // for reading, without following a symbolic link; it is on the directory's filesystem. Not open: no
 // such file, or a failure.
-ScopedFd DirectoryOpenFile(int directory, uint64_t inode);
+ScopedFd DirectoryOpenFile(int directory, const FolderIdentity &identity, uint64_t inode);
 } // namespace vesk

@@ -29,6 +29,7 @@ private:
     // object for one request has one question.
     std::string directory_;
     ScopedFd folder_;
+    FolderIdentity identity_;
 };
 
 int FiemapDevice::GetMappingByInode(const std::string &directory, uint64_t inode,
@@ -37,10 +38,11 @@ int FiemapDevice::GetMappingByInode(const std::string &directory, uint64_t inode
     try {
         if (!folder_.IsOpen() || directory != directory_) {
             folder_ = FolderOpenOnDevice(directory, number_);
+            identity_ = FolderIdentityOf(folder_.Get());
             directory_ = directory;
         }
         const ScopedFd file =
-            folder_.IsOpen() ? DirectoryOpenFile(folder_.Get(), inode) : ScopedFd();
+            folder_.IsOpen() ? DirectoryOpenFile(folder_.Get(), identity_, inode) : ScopedFd();
         std::vector<FileMappingEntry> entries;
         if (!file.IsOpen() || !FileExtentsRead(file.Get(), entries)) {
             return -1;

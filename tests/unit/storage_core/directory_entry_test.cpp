@@ -62,7 +62,7 @@ uint64_t InodeOfPath(const std::string &path) {
 
 ScopedFd OpenIn(const std::string &directory, uint64_t inode) {
     const ScopedFd folder(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    return DirectoryOpenFile(folder.Get(), inode);
+    return DirectoryOpenFile(folder.Get(), FolderIdentityOf(folder.Get()), inode);
 }
 
 TEST(DirectoryOpenFile, OpensJustThatFile) {

@@ -1,6 +1,7 @@
 // What is remembered of a folder between two questions, seen from how often it is read.
 #include "storage_core/directory_entry.h"
 
+#include "tests/support/ordinary_user.h"
 #include "tests/support/temp_dir.h"
 
 #include <gtest/gtest.h>
@@ -42,7 +43,7 @@ protected:
         secondsAhead = -1000; // no folder has rested then, however slow the machine
         // A folder may have the number of one that was removed, and its files those of its files.
         const ScopedFd another(open("/", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-        DirectoryOpenFile(another.Get(), 0);
+        DirectoryOpenFile(another.Get(), FolderIdentityOf(another.Get()), 0);
         first_ = Make("first");
         second_ = Make("second");
         EXPECT_EQ(Reads(first_), "opened, read 1");
@@ -69,8 +70,9 @@ protected:
     // What opening this file comes to, and how often the folder was read for it.
     std::string Reads(uint64_t inode) {
         const ScopedFd folder(open(folder_.Path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+        const FolderIdentity identity = FolderIdentityOf(folder.Get());
         const int before = foldersRead;
-        const bool isOpen = DirectoryOpenFile(folder.Get(), inode).IsOpen();
+        const bool isOpen = DirectoryOpenFile(folder.Get(), identity, inode).IsOpen();
         return (isOpen ? "opened, read " : "not opened, read ") +
                std::to_string(foldersRead - before);
     }
@@ -106,7 +108,8 @@ TEST_F(FolderMemoryTest, AnotherFolderTakesItsPlace) {
     struct stat status = {};
     ASSERT_EQ(stat(other.FileMake("file", "text").c_str(), &status), 0);
     const ScopedFd folder(open(other.Path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    EXPECT_TRUE(DirectoryOpenFile(folder.Get(), status.st_ino).IsOpen());
+    const FolderIdentity identity = FolderIdentityOf(folder.Get());
+    EXPECT_TRUE(DirectoryOpenFile(folder.Get(), identity, status.st_ino).IsOpen());
     EXPECT_EQ(Reads(first_), "opened, read 1");
 }
 
@@ -121,5 +124,17 @@ TEST_F(FolderMemoryTest, WhatIsNotThereIsLookedForAnewUntilTheFolderHasRested) {
     EXPECT_EQ(Reads(first_), "opened, read 0");
     ChangeAfterATick();
     EXPECT_EQ(Reads(none), "not opened, read 1");
+}
+
+// Whoever may read the folder and none of its files would otherwise have it read for each.
+TEST_F(FolderMemoryTest, AFileThatMayNotBeOpenedIsNotLookedForAnewInAFolderThatHasRested) {
+    SKIP_WITHOUT_ROOT();
+    ASSERT_EQ(chmod(folder_.Path().c_str(), 0755), 0);
+    ASSERT_EQ(chmod(folder_.Path("second").c_str(), 0), 0);
+    secondsAhead = 1000;
+    EXPECT_EQ(Reads(1), "not opened, read 1");
+    const OrdinaryUser user;
+    EXPECT_EQ(Reads(second_), "not opened, read 0");
+    EXPECT_EQ(Reads(first_), "opened, read 0");
 }
 } // namespace vesk
