@@ -92,12 +92,15 @@ private:
     std::string names_; // each with its NUL
 };
 
-std::mutex scanLock;                   // guards lastScan
-auto *const lastScan = new FolderScan; // never destroyed: other threads may still ask at the end
+std::mutex scanLock; // guards LastScan
+FolderScan &LastScan() {
+    static auto *scan = new FolderScan; // never destroyed: other threads may ask at the end
+    return *scan;
+}
 
 bool SearchRemembered(const FolderIdentity &folder, InodeSearch &search) {
     const std::lock_guard<std::mutex> guard(scanLock);
-    return lastScan->IsOf(folder) && lastScan->Search(search);
+    return LastScan().IsOf(folder) && LastScan().Search(search);
 }
 
 struct Memory {
@@ -109,8 +112,8 @@ Memory MemoryOf(int folder) {
     struct stat status = {};
     const bool isKnown = fstat(folder, &status) == 0;
     const std::lock_guard<std::mutex> guard(scanLock);
-    const bool isAsItWas = isKnown && lastScan->IsAsItWas(status);
-    return {isAsItWas, isAsItWas && lastScan->IsSettled()};
+    const bool isAsItWas = isKnown && LastScan().IsAsItWas(status);
+    return {isAsItWas, isAsItWas && LastScan().IsSettled()};
 }
 
 bool SearchAnew(int folder, InodeSearch &search) {
@@ -119,8 +122,8 @@ bool SearchAnew(int folder, InodeSearch &search) {
         return false;
     }
     const std::lock_guard<std::mutex> guard(scanLock);
-    lastScan->Read(folder, status);
-    return lastScan->IsOf({status.st_dev, status.st_ino}) && lastScan->Search(search);
+    LastScan().Read(folder, status);
+    return LastScan().IsOf({status.st_dev, status.st_ino}) && LastScan().Search(search);
 }
 
 ScopedFd OpenFound(int folder, dev_t device, const InodeSearch &search) {

@@ -55,10 +55,11 @@ mount_unanswered() { # FOLDER
 
 # The companion, too, comes back from looking at the whole volume and knows what is the user's own.
 list_below() {
-    run timeout -k 1 20 "$BIN/veskpin" --config "$CONF" list /volume1
-    echo "$output"
-    same 1 "$status"
-    [[ $output = *pinned*" /volume1/b"* ]]
+    local listed looked=0
+    listed=$(timeout -k 1 20 "$BIN/veskpin" --config "$CONF" list /volume1) || looked=$?
+    echo "$listed"
+    same 1 "$looked"
+    [[ $listed = *pinned*" /volume1/b"* ]]
 }
 
 # it_holds_no_request_up COMMAND...: which makes the mount while a request waits for its turn.
