@@ -13,8 +13,8 @@
 namespace vesk {
 namespace {
 const size_t kProcFileMax = 65536; // bytes
-const uint64_t kYoungSeconds =
-    2; // a process that has begun later may still be starting its threads
+// A process that has begun later may still be starting its threads.
+const uint64_t kYoungSeconds = 2;
 
 std::optional<std::string> ReadProc(const std::string &path) {
     std::string text;
