@@ -49,7 +49,10 @@ mount_unanswered() { # FOLDER
     ) >/tmp/his.log 2>&1 &
     HIS_PID=$!
     it_is_mounted() { grep -q '^mounted$' /tmp/his.log; }
-    wait_until it_is_mounted
+    wait_until it_is_mounted || {
+        cat /tmp/his.log
+        return 1
+    }
     grep -q " $1 fuse .*user_id=$ATTACKER.*allow_other" /proc/self/mounts
 }
 
