@@ -26,6 +26,7 @@ arm_configure() { # ROOT
     rm -rf "$1/var/run"
     mkdir -p "$1/var" "$1/root" "$1/mnt" "$1/tmp" "$1/run" "$1/proc" "$1/sys" "$1/dev"
     ln -sfn /run "$1/var/run"
+    chmod u+s "$1/usr/bin/fusermount3"
     cp "$1/bin/bash-static" "$1/bin/bash" # the shell, which forks all the time, for the same reason
     mkdir -p "$1/opt/quick"
     for tool in $ARM_QUICK_TOOLS; do

@@ -1,14 +1,14 @@
 # Running tests and counting them. To be sourced.
 
-# run_ctest ARGUMENT...: runs ctest with the arguments, two tests for each processor, since system tests wait
-# as long as they compute; the last line printed has the counts. A program
+# run_ctest ARGUMENT...: runs ctest with the arguments, TEST_JOBS tests at once: two for each processor unless
+# told otherwise, since system tests wait as long as they compute. The last line printed has the counts. A program
 # of CTest may hold several tests, a system test file or, in a cross build, all of GoogleTest's: their
 # own lines count then, not the program. Before them comes what failed, with the last lines that it
 # printed. Returns ctest's status.
 run_ctest() {
     local results status=0
     results=$(mktemp)
-    ctest -j $((2 * $(nproc))) --output-junit "$results" --test-output-size-passed 10000000 \
+    ctest -j "${TEST_JOBS:-$((2 * $(nproc)))}" --output-junit "$results" --test-output-size-passed 10000000 \
         --test-output-size-failed 10000000 "$@" || status=$?
     count_tests "$results"
     rm -f "$results"
