@@ -2,10 +2,12 @@
 //
 // Ends a busy service KILLS times at random moments, by SIGKILL and SIGTERM in turn, while three
 // clients send it requests; the next service goes on with what is left. Runs in the same world as
-// fault_runner. SIGTERM must end it with status 0 and lose no request, nineteen times in twenty
-// within a second: the slowest ends tell more about what else the machine does. SIGKILL may lose at
-// most the one that was just taken off the queue; the document must be whole after every end, and
-// in the end every stored request must have been carried out. Ends with 1 where that does not hold.
+// fault_runner. SIGTERM must end it with status 0, nineteen times in twenty within a second: the
+// slowest ends tell more about what else the machine does. It must lose no request, unless the
+// machine has kept the service from storing the one in hand for as long as it is waited for.
+// SIGKILL may lose at most the one that was just taken off the queue; the document must be whole
+// after every end, and in the end every stored request must have been carried out. Ends with 1
+// where that does not hold.
 #include "tests/faults/child.h"
 #include "tests/faults/world.h"
 
@@ -23,6 +25,9 @@ using namespace vesk;
 
 namespace {
 using Clock = std::chrono::steady_clock;
+
+// How long an end waits for the receiver to store what it has in hand.
+const std::chrono::milliseconds kStoreTime(350);
 
 const char kConfig[] = "/run/faults/config.json";
 const std::vector<std::string> kServe = {"--start-service", "--config-path", kConfig};
@@ -91,7 +96,8 @@ int main(int argc, char *argv[]) {
         }
         const long lostBefore = lost;
         lost = Lost(sent);
-        if (lost < lostBefore || lost > lostBefore + (gently ? 0 : 1)) {
+        const bool mayLose = !gently || ends.back() >= kStoreTime;
+        if (lost < lostBefore || lost > lostBefore + (mayLose ? 1 : 0)) {
             return Fail(i, gently ? "SIGTERM loses" : "SIGKILL loses",
                         std::to_string(lost - lostBefore));
         }
@@ -107,7 +113,7 @@ int main(int argc, char *argv[]) {
     std::sort(ends.begin(), ends.end());
     const long most = Milliseconds(ends[ends.size() * 19 / 20]);
     printf("seed %s: %d kills, ends by SIGTERM within %ld ms, 19 of 20 within %ld ms, %ld "
-           "requests sent, %ld lost by SIGKILL, the others carried out\n",
+           "requests sent, %ld lost, the others carried out\n",
            argv[4], kills, Milliseconds(ends.back()), most, sent, lost);
     // Clients that all failed would have left nothing to lose.
     return most <= 1000 && Lost(sent) == lost && sent > kills ? 0 : 1;
