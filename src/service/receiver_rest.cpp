@@ -1,9 +1,10 @@
 #include "service/receiver_rest.h"
 
+#include "base/clock.h"
+
 #include <atomic>
 #include <csignal>
 #include <cstdint>
-#include <ctime>
 #include <pthread.h>
 #include <unistd.h>
 
@@ -11,12 +12,6 @@ namespace vesk {
 namespace {
 const int64_t kRestMilliseconds = 350;
 const useconds_t kTryMicroseconds = 1000;
-
-int64_t NowMilliseconds() {
-    timespec now{};
-    clock_gettime(CLOCK_MONOTONIC, &now);
-    return now.tv_sec * int64_t{1000} + now.tv_nsec / 1000000;
-}
 
 // The receiver clears `atRest` and then looks at `called`; the ending thread sets `called` and then
 // looks at `atRest`: one of them sees the other.
@@ -58,8 +53,8 @@ void ReceiverAwaitRest() {
         return;
     }
     // Again and again: the signal may come just before the receiver begins to wait.
-    const int64_t end = NowMilliseconds() + kRestMilliseconds;
-    while (!atRest && NowMilliseconds() < end) {
+    const int64_t end = NowMs() + kRestMilliseconds;
+    while (!atRest && NowMs() < end) {
         pthread_kill(receiver, SIGUSR1);
         usleep(kTryMicroseconds);
     }

@@ -197,9 +197,12 @@ bool IsToolsProgram(const ServiceThread &thread) {
     return name.compare(0, strlen(kToolName), kToolName) == 0;
 }
 
-// What a process is asked for by one of its threads that lives: one whose first thread has ended
-// has a command line in the others only. Nothing: it is no service of ours.
-std::optional<ServiceProcess> ProcessOf(pid_t pid, const std::string &procFolder, int *error) {
+} // namespace
+
+// What it is asked for is told by a thread that lives: a process whose first thread has ended has a
+// command line in the others only.
+std::optional<ServiceProcess> ServiceProcessAt(const std::string &procFolder, pid_t pid,
+                                               int *error) {
     const std::string folder = procFolder + "/" + std::to_string(pid);
     const std::string name = ReadProc(folder + "/comm", error).value_or("");
     if (name != std::string(kToolName) + "\n" || !IsTrusted(folder, error)) {
@@ -226,7 +229,6 @@ std::optional<ServiceProcess> ProcessOf(pid_t pid, const std::string &procFolder
     found.root = living->folder + "/root";
     return found;
 }
-} // namespace
 
 bool ServiceThreadLives(const ServiceThread &thread) {
     return thread.state != 'Z' && thread.state != 'X' && thread.state != 'x';
@@ -235,7 +237,7 @@ bool ServiceThreadLives(const ServiceThread &thread) {
 std::vector<ServiceProcess> ServiceProcessesFind(const std::string &procFolder, int *error) {
     std::vector<ServiceProcess> found;
     for (const pid_t pid : NumbersIn(procFolder, error)) {
-        if (auto process = ProcessOf(pid, procFolder, error)) {
+        if (auto process = ServiceProcessAt(procFolder, pid, error)) {
             found.push_back(std::move(*process));
         }
     }

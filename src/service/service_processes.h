@@ -37,4 +37,8 @@ bool ServiceThreadLives(const ServiceThread &thread);
 // the kernel shows in `procFolder`. `*error` becomes an errno when not every process can be looked
 // at.
 std::vector<ServiceProcess> ServiceProcessesFind(const std::string &procFolder, int *error);
+
+// The one with this number; nothing: it has ended, is none, or cannot be looked at (`*error`).
+std::optional<ServiceProcess> ServiceProcessAt(const std::string &procFolder, pid_t pid,
+                                               int *error);
 } // namespace vesk

@@ -23,6 +23,9 @@ std::optional<std::string> ReadProc(const std::string &path) {
 
 // Whether the thread waits for a message. Absent where the kernel does not tell the caller.
 std::optional<bool> WaitsForMessage(const ServiceThread &thread) {
+    if (thread.state == 'T' || thread.state == 't') {
+        return false; // it stands still, whatever call it is in
+    }
     const auto place = ReadProc(thread.folder + "/wchan");
     if (place && place->find("msgrcv") != std::string::npos) {
         return true;
@@ -77,22 +80,37 @@ std::optional<ThreadLook> ServiceReceiverLook(const ServiceProcess &process) {
     return *waits ? ThreadLook::Waiting : ThreadLook::Busy;
 }
 
-std::optional<ThreadLook> ServiceWorkerLook(const ServiceProcess &process,
-                                            const std::set<std::string> &heldVolumes,
-                                            const std::string &procFolder) {
+std::optional<uint64_t> ServiceReceiverSleeps(const ServiceProcess &process) {
+    const std::string title = "\nvoluntary_ctxt_switches:\t";
+    const std::string status = ReadProc(process.threads.front().folder + "/status").value_or("");
+    const size_t found = status.find(title);
+    if (found == std::string::npos) {
+        return std::nullopt;
+    }
+    return strtoull(status.c_str() + found + title.size(), nullptr, 10);
+}
+
+std::optional<bool> ServiceWorkerLives(const ServiceProcess &process,
+                                       const std::string &procFolder) {
     if (process.error != 0) {
         return std::nullopt;
     }
     const auto &threads = process.threads;
-    const std::string config = ConfigSeen(process);
     const bool isThere =
         std::any_of(threads.begin(), threads.end(), [](const ServiceThread &thread) {
             return thread.name == kWorkerThreadName && ServiceThreadLives(thread);
         });
-    if (!isThere) {
-        return IsYoung(threads.front(), procFolder) ? std::nullopt
-                                                    : std::optional(ThreadLook::Ended);
+    return isThere || !IsYoung(threads.front(), procFolder) ? std::optional(isThere) : std::nullopt;
+}
+
+std::optional<ThreadLook> ServiceWorkerLook(const ServiceProcess &process,
+                                            const std::set<std::string> &heldVolumes,
+                                            const std::string &procFolder) {
+    const auto lives = ServiceWorkerLives(process, procFolder);
+    if (!lives || !*lives) {
+        return lives ? std::optional(ThreadLook::Ended) : std::nullopt;
     }
+    const std::string config = ConfigSeen(process);
     ConfigRecords records;
     if (config.empty() || ConfigReadRecords(config.c_str(), &records) < 0) {
         return std::nullopt;

@@ -57,10 +57,37 @@ std::string PathOf(const std::string &folder, const std::string &name) {
     path.append(folder.empty() ? "" : "/").append(name);
     return path;
 }
+
+// Gives the entries of a folder to `visit`, and those that are folders to `below`. False: `visit`
+// wants no more.
+bool WalkFolder(const FileLooker &looker, int folder, const std::string &here,
+                const std::vector<std::string> &names,
+                const std::function<bool(const WalkEntry &)> &visit, Level *below) {
+    for (const std::string &name : names) {
+        const std::string path = PathOf(here, name);
+        FileStat status{};
+        const int failure = FileStatAt(folder, name.c_str(), &status);
+        if (failure == ENOENT) {
+            continue;
+        }
+        if (failure == 0 && S_ISDIR(status.mode) && status.device == looker.Device()) {
+            below->folders.push_back(name);
+            continue;
+        }
+        const WalkKind kind = failure == EXDEV ? WalkKind::OtherFileSystem
+                              : failure != 0   ? WalkKind::Unreadable
+                                               : KindOf(status, looker.Device());
+        if (!visit({path, kind, status, failure == EXDEV ? 0 : failure})) {
+            return false;
+        }
+    }
+    std::reverse(below->folders.begin(), below->folders.end());
+    return true;
+}
 } // namespace
 
 void PathWalk(const FileLooker &looker, const std::string &folder,
-              const std::function<void(const WalkEntry &)> &visit) {
+              const std::function<bool(const WalkEntry &)> &visit) {
     if (looker.Error() != 0) {
         visit({folder, WalkKind::Unreadable, {}, looker.Error()});
         return;
@@ -82,28 +109,13 @@ void PathWalk(const FileLooker &looker, const std::string &folder,
         if (error == ENOENT && levels.size() > 1) {
             continue; // gone since its name was read
         }
-        if (error != 0) {
-            visit({here, WalkKind::Unreadable, {}, error});
+        if (error != 0 && !visit({here, WalkKind::Unreadable, {}, error})) {
+            return;
         }
         Level next{here, {}};
-        for (const std::string &name : names) {
-            const std::string path = PathOf(here, name);
-            FileStat status{};
-            const int failure = FileStatAt(fd.Get(), name.c_str(), &status);
-            if (failure == ENOENT) {
-                continue;
-            }
-            if (failure == EXDEV) {
-                visit({path, WalkKind::OtherFileSystem, {}, 0});
-            } else if (failure != 0) {
-                visit({path, WalkKind::Unreadable, {}, failure});
-            } else if (S_ISDIR(status.mode) && status.device == looker.Device()) {
-                next.folders.push_back(name);
-            } else {
-                visit({path, KindOf(status, looker.Device()), status, 0});
-            }
+        if (!WalkFolder(looker, fd.Get(), here, names, visit, &next)) {
+            return;
         }
-        std::reverse(next.folders.begin(), next.folders.end());
         levels.push_back(std::move(next));
     }
 }

@@ -25,7 +25,7 @@ struct WalkEntry {
 };
 
 // `folder` is relative to the looker's volume, empty for all of it. Memory: the names of one folder
-// and of the folders that wait.
+// and of the folders that wait. It ends early when `visit` says false.
 void PathWalk(const FileLooker &looker, const std::string &folder,
-              const std::function<void(const WalkEntry &)> &visit);
+              const std::function<bool(const WalkEntry &)> &visit);
 } // namespace vesk

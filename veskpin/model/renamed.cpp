@@ -80,12 +80,13 @@ RenamedFiles RenamedFind(const WorldVolume &world, ProgressForm progress, LookEr
     PathWalk(looker, "", [&](const WalkEntry &entry) {
         walked.Step();
         if (entry.kind != WalkKind::File) {
-            return;
+            return true;
         }
         const auto file = wanted.find(static_cast<uint32_t>(entry.status.inode));
         if (file != wanted.end() && file->second == entry.status.birth) {
             found.emplace(file->first, entry.relativePath);
         }
+        return true;
     });
     return found;
 }

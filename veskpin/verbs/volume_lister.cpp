@@ -58,6 +58,7 @@ void VolumeLister::ListUnknown(const std::string &folder, ListSum *sum) {
                 ListPath(path, &entry.status, range, sum);
             }
         }
+        return true;
     });
 }
 

@@ -24,7 +24,7 @@ protected:
         WriteWhole(path, content);
     }
     // What is met, in order: "path", with what is no file said behind it.
-    Texts Walk(const std::string &folder = "") const {
+    Texts Walk(const std::string &folder = "", size_t most = 1000) const {
         const FileLooker looker(volume_);
         Texts met;
         PathWalk(looker, folder, [&](const WalkEntry &entry) {
@@ -36,6 +36,7 @@ protected:
             case WalkKind::Unreadable: text += std::string(": ") + strerror(entry.error); break;
             }
             met.push_back(text);
+            return met.size() < most;
         });
         return met;
     }
@@ -84,6 +85,16 @@ TEST_F(PathWalkTest, LinksAreNotFollowedAndNothingIsWaitedFor) {
     EXPECT_EQ(Walk("link"), Texts{"link: Too many levels of symbolic links"});
 }
 
+TEST_F(PathWalkTest, WhoWantsNoMoreGetsNoMore) {
+    Make("a");
+    Make("b/c");
+    Make("b/d");
+    Make("e/f");
+    EXPECT_EQ(Walk("", 1), Texts{"a"});
+    EXPECT_EQ(Walk("", 2), (Texts{"a", "b/c"}));
+    EXPECT_EQ(Walk("none", 1), Texts{"none: No such file or directory"});
+}
+
 TEST_F(PathWalkTest, AFilesStatusComesWithIt) {
     Make("a", "12345");
     const FileLooker looker(volume_);
@@ -96,6 +107,7 @@ TEST_F(PathWalkTest, AFilesStatusComesWithIt) {
         EXPECT_EQ(entry.status.device, looker.Device());
         EXPECT_EQ(entry.error, 0);
         ++met;
+        return true;
     });
     EXPECT_EQ(met, 1);
 }
@@ -109,6 +121,7 @@ TEST_F(PathWalkTest, WhatVanishesMeanwhileIsLeftOut) {
     PathWalk(looker, "", [&](const WalkEntry &entry) {
         met.push_back(entry.relativePath);
         std::filesystem::remove(volume_ + "/b");
+        return true;
     });
     EXPECT_EQ(met, (Texts{"a", "c"}));
 }
@@ -162,6 +175,7 @@ TEST_F(PathWalkTest, OnlyTheFolderThatIsShownStaysOpen) {
     PathWalk(looker, "", [&](const WalkEntry &) {
         ++met;
         EXPECT_LE(CountOpenDescriptors(), before + 1);
+        return true;
     });
     EXPECT_EQ(met, 40);
 }

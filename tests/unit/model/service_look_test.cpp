@@ -1,8 +1,8 @@
 #include "model/service_look.h"
 
+#include "tests/support/fake_proc.h"
 #include "tests/support/look_fixture.h"
 #include "tests/support/ordinary_user.h"
-#include "tests/unit/model/fake_proc.h"
 
 #include <sys/stat.h>
 

@@ -1,7 +1,7 @@
 #include "model/service_look.h"
 
+#include "tests/support/fake_proc.h"
 #include "tests/support/look_fixture.h"
-#include "tests/unit/model/fake_proc.h"
 
 #include <unistd.h>
 
@@ -45,6 +45,13 @@ TEST_F(ServiceThreadsTest, TheReceiverIsBusyOutsideItsWait) {
     EXPECT_EQ(Look(), "busy waiting");
     Put({kPid, "veskcachepinfil", 'S', "hrtimer_nanosleep", "35 0x7ffe 0x0"});
     EXPECT_EQ(Look(), "busy waiting");
+}
+
+TEST_F(ServiceThreadsTest, AReceiverThatStandsStillDoesNotWait) {
+    for (const char state : {'T', 't'}) {
+        Put({kPid, "veskcachepinfil", state, "do_msgrcv"});
+        EXPECT_EQ(Look(), "busy waiting");
+    }
 }
 
 TEST_F(ServiceThreadsTest, WhereTheKernelNamesNoPlaceTheCallTells) {

@@ -19,6 +19,7 @@ struct FakeThread {
     std::string wchan = "do_msgrcv";
     std::string syscall = "0 0x0"; // a read
     uint64_t startTicks = 100;
+    uint64_t sleeps = 7; // of its own accord
 };
 
 using Arguments = std::vector<std::string>;
@@ -68,6 +69,9 @@ public:
         }
         Write(folder + "cmdline", line);
         Write(folder + "wchan", thread.wchan);
+        Write(folder + "status", "Name:\t" + thread.name + "\nvoluntary_ctxt_switches:\t" +
+                                     std::to_string(thread.sleeps) +
+                                     "\nnonvoluntary_ctxt_switches:\t3\n");
         Write(folder + "syscall", thread.syscall + "\n");
         Link(folder + "cwd", "/srv");
         Link(folder + "ns/ipc", "ipc:[1]");

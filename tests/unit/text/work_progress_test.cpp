@@ -1,0 +1,101 @@
+#include "text/work_progress.h"
+
+#include "base/scoped_fd.h"
+
+#include <gtest/gtest.h>
+
+#include <unistd.h>
+
+#include <array>
+#include <functional>
+#include <string>
+
+namespace vesk {
+namespace {
+std::string Written(ProgressForm form, const Work &work,
+                    const std::function<void(WorkProgress &)> &steps) {
+    std::array<int, 2> ends{};
+    if (pipe(ends.data()) != 0) {
+        return "no pipe";
+    }
+    const ScopedFd output(ends[0]);
+    {
+        const ScopedFd input(ends[1]);
+        WorkProgress progress(form, work, input.Get());
+        steps(progress);
+    }
+    std::string text;
+    char letter = 0;
+    while (read(output.Get(), &letter, 1) == 1) {
+        text += letter;
+    }
+    return text;
+}
+
+// The number behind the name.
+long Member(const std::string &text, const std::string &name) {
+    const size_t at = text.find("\"" + name + "\":");
+    return at == std::string::npos ? -1 : strtol(text.c_str() + at + name.size() + 3, nullptr, 10);
+}
+} // namespace
+
+TEST(WorkProgressTest, BeforeAnythingIsDoneTheEstimateIsToldLessTheTime) {
+    const std::string text = Written(ProgressForm::Json, {10, 640, 20}, [](WorkProgress &progress) {
+        usleep(600000);
+        progress.Tick();
+    });
+    EXPECT_EQ(text.rfind("{\"files\":0,\"total\":10,\"blocks\":0,\"blocksTotal\":640,"
+                         "\"blocksPerSecond\":0,\"secondsLeft\":19,\"milliseconds\":",
+                         0),
+              0U)
+        << text;
+    EXPECT_EQ(text.substr(text.size() - 2), "}\n");
+}
+
+TEST(WorkProgressTest, TheRestTakesAsLongAsThePartThatIsDone) {
+    const auto text = [](uint64_t files, uint64_t blocks) {
+        return Written(ProgressForm::Json, {10, 1000, 500}, [&](WorkProgress &progress) {
+            usleep(1000000);
+            progress.Done(files, blocks);
+        });
+    };
+    // A tenth of the blocks took a second: nine more. Whatever is further behind counts.
+    EXPECT_NEAR(static_cast<double>(Member(text(5, 100), "secondsLeft")), 9, 2);
+    EXPECT_NEAR(static_cast<double>(Member(text(1, 500), "secondsLeft")), 9, 2);
+    EXPECT_EQ(Member(text(10, 1000), "secondsLeft"), 0);
+    EXPECT_NEAR(static_cast<double>(Member(text(5, 100), "blocksPerSecond")), 100, 40);
+}
+
+TEST(WorkProgressTest, WhatIsNotKnownIsNull) {
+    const std::string text = Written(ProgressForm::Json, {10, {}, {}}, [](WorkProgress &progress) {
+        usleep(250000);
+        progress.Tick();
+    });
+    EXPECT_NE(text.find("\"blocksTotal\":null,"), std::string::npos) << text;
+    EXPECT_NE(text.find("\"secondsLeft\":null,"), std::string::npos) << text;
+}
+
+TEST(WorkProgressTest, ATerminalGetsALineThatIsClearedAtTheEnd) {
+    const std::string text = Written(ProgressForm::Line, {4, 64, 10}, [](WorkProgress &progress) {
+        usleep(1100000);
+        progress.Done(4, 64);
+    });
+    EXPECT_EQ(text.rfind("\r4 of 4 files, 4.0 MiB of 4.0 MiB, ", 0), 0U) << text;
+    const std::string end = "/s, 0 s left\033[K\r\033[K";
+    EXPECT_EQ(text.substr(text.size() - end.size()), end) << text;
+    const std::string few = Written(ProgressForm::Line, {1, {}, {}}, [](WorkProgress &progress) {
+        usleep(1100000);
+        progress.Tick();
+    });
+    EXPECT_EQ(few, "\r0 of 1 file, 0 B, 0 B/s\033[K\r\033[K");
+}
+
+TEST(WorkProgressTest, NothingIsWrittenWhereNobodyWantsIt) {
+    EXPECT_EQ(Written(ProgressForm::None, {1, 1, 1},
+                      [](WorkProgress &progress) {
+                          usleep(250000);
+                          progress.Done(1, 1);
+                      }),
+              "");
+}
+} // namespace vesk

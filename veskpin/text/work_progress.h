@@ -1,0 +1,42 @@
+// How far the service has come with what it was sent, and how long the rest will take. It takes
+// about a request a second, and reads what it pins: the plan's estimate, corrected by how long the
+// part that is done took.
+//
+// Thread rule: one owner.
+#pragma once
+
+#include "text/progress_line.h"
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+namespace vesk {
+struct Work {
+    uint64_t files = 0;
+    std::optional<uint64_t> blocks;  // of 64 KiB; absent: not known
+    std::optional<uint64_t> seconds; // that all will take
+};
+
+class WorkProgress {
+public:
+    // Writes to this descriptor, which stays the caller's.
+    WorkProgress(ProgressForm form, const Work &work, int fd = 2) : line_(form, fd), work_(work) {}
+
+    // So many files, with so many blocks together, have come to rest.
+    void Done(uint64_t files, uint64_t blocks);
+
+    // Tells it when it is time to; for whoever waits, now and then.
+    void Tick();
+
+private:
+    double Share() const;
+    std::optional<uint64_t> SecondsLeft(int64_t elapsedMs) const;
+    std::string JsonText() const;
+    std::string LineText() const;
+    ProgressLine line_;
+    const Work work_;
+    uint64_t files_ = 0;
+    uint64_t blocks_ = 0;
+};
+} // namespace vesk
