@@ -38,6 +38,21 @@ void AddPaths(CLI::App *command, Given &given) {
     command->add_flag("-0", given.line.settings.nulSeparated, "The list is NUL-separated");
 }
 
+void AddReserve(CLI::App *command, Given &given) {
+    command
+        ->add_option("--reserve", given.line.settings.reservePercent,
+                     "Percent of the SSD to leave free")
+        ->type_name("PERCENT")
+        ->check(CLI::Range(0, 100));
+}
+
+void AddChange(CLI::App *command, Given &given) {
+    Settings &settings = given.line.settings;
+    command->add_flag("--no-wait{false}", settings.waits, "Do not wait for what becomes of it");
+    command->add_option("--timeout", settings.timeoutSeconds, "How long to wait, in seconds")
+        ->type_name("SECONDS");
+}
+
 void AddVolumes(CLI::App *command, Given &given) {
     command->add_option("VOLUME", given.line.settings.volumes, "Mount paths; default: all");
 }
@@ -67,9 +82,16 @@ void AddCommands(CLI::App &app, Given &given) {
     CLI::App *plan =
         AddCommand(app, given, "plan", "What pinning would cost; changes nothing", PlanCommand);
     AddPaths(plan, given);
-    plan->add_option("--reserve", settings.reservePercent, "Percent of the SSD to leave free")
-        ->type_name("PERCENT")
-        ->check(CLI::Range(0, 100));
+    AddReserve(plan, given);
+    CLI::App *pin = AddCommand(app, given, "pin", "Pins files and whole folders", PinCommand);
+    AddPaths(pin, given);
+    AddChange(pin, given);
+    AddReserve(pin, given);
+    pin->add_flag("--force", settings.force, "Also what does not fit on the SSD");
+    CLI::App *unpin =
+        AddCommand(app, given, "unpin", "Lets go what is recorded below the paths", UnpinCommand);
+    AddPaths(unpin, given);
+    AddChange(unpin, given);
     CLI::App *exported =
         AddCommand(app, given, "export", "The recorded paths, for --files-from", ExportCommand);
     AddVolumes(exported, given);
@@ -77,6 +99,10 @@ void AddCommands(CLI::App &app, Given &given) {
     AddCommand(app, given, "metrics", "The figures for Prometheus", MetricsCommand)
         ->add_option("--output", settings.output, "Replace this file instead of printing")
         ->type_name("FILE");
+}
+
+bool NeedsPath(Command command) {
+    return command == PlanCommand || command == PinCommand || command == UnpinCommand;
 }
 
 // What no single option can tell. An error message, or an empty text.
@@ -94,8 +120,8 @@ std::string FaultOf(Given &given) {
     if (settings.paths.empty() && !given.filesFrom.empty()) {
         return "the list of paths is empty";
     }
-    if (settings.paths.empty() && given.line.command == PlanCommand) {
-        return "plan needs a PATH";
+    if (settings.paths.empty() && NeedsPath(given.line.command)) {
+        return "a PATH is needed";
     }
     for (const std::string &path : settings.paths) {
         if (path.empty()) {
@@ -137,7 +163,7 @@ bool WantsColor(const Given &given) {
 std::optional<CommandLine> CommandLineRead(int argc, char *argv[], TextSink &out,
                                            ExitStatus *status) {
     Given given;
-    CLI::App app("Sees and plans what is pinned into SSD caches.", "veskpin");
+    CLI::App app("Sees, plans and pins what SSD caches keep.", "veskpin");
     app.require_subcommand(1);
     app.fallthrough();
     AddGlobalOptions(app, given);

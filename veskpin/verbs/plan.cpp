@@ -19,21 +19,27 @@ namespace {
 // The plan for one volume.
 class VolumePlanner {
 public:
-    VolumePlanner(World &world, const WorldVolume &volume, Plan &plan, Progress &progress)
-        : world_(volume), errors_(world.errors), plan_(plan), progress_(progress),
+    VolumePlanner(World &world, const WorldVolume &volume, Plan &plan, Progress &progress,
+                  const PlanHooks &hooks)
+        : world_(volume), errors_(world.errors), plan_(plan), progress_(progress), hooks_(hooks),
           looker_(volume.volume.mountPath), sum_(volume) {
         WorldVolumeUse(world, volume);
     }
 
     const WorldVolume &Of() const { return world_; }
 
+    bool GoesOn() const { return !hooks_.goesOn || hooks_.goesOn(); }
+
     void AddFile(const std::string &relativePath, const FileStat *status) {
         const FileLook &look = looker_.Look(relativePath, status);
         const std::string &mountPath = world_.volume.mountPath;
         if (const auto reason = SkipReasonOf(mountPath, relativePath, look)) {
             Skip(relativePath, *reason);
-        } else if (!sum_.Add(relativePath, look, IsPinned(look))) {
+        } else if (const auto state = StateOf(look);
+                   !sum_.Add(relativePath, look, state == FileState::Pinned)) {
             Skip(relativePath, SkipReason::SameInode);
+        } else if (hooks_.visit) {
+            hooks_.visit(world_, relativePath, look, state);
         }
         progress_.Step();
     }
@@ -50,6 +56,7 @@ public:
                 Skip(entry.relativePath, SkipReasonOfError(entry.error));
                 break;
             }
+            return GoesOn();
         });
     }
 
@@ -64,10 +71,10 @@ public:
     }
 
 private:
-    bool IsPinned(const FileLook &look) const {
+    std::optional<FileState> StateOf(const FileLook &look) const {
         const KnownFile *known = KnownFileByInode(world_.known, look.status.inode);
         const FileFigures figures = FileFiguresOf(look, world_.volume);
-        return FileStateOf(known, look, figures, world_.volume) == FileState::Pinned;
+        return FileStateOf(known, look, figures, world_.volume);
     }
 
     void Skip(const std::string &relativePath, SkipReason reason) {
@@ -82,6 +89,7 @@ private:
     LookErrors &errors_;
     Plan &plan_;
     Progress &progress_;
+    const PlanHooks &hooks_;
     FileLooker looker_;
     PlanSum sum_;
 };
@@ -138,7 +146,7 @@ std::vector<Target> ResolveOnce(const World &world, const std::vector<std::strin
 } // namespace
 
 Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned reservePercent,
-              Progress &progress) {
+              Progress &progress, const PlanHooks &hooks) {
     Plan plan;
     std::vector<std::unique_ptr<VolumePlanner>> planners;
     const auto plannerOf = [&](const WorldVolume &volume) -> VolumePlanner & {
@@ -147,7 +155,7 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
                 return *planner;
             }
         }
-        planners.push_back(std::make_unique<VolumePlanner>(world, volume, plan, progress));
+        planners.push_back(std::make_unique<VolumePlanner>(world, volume, plan, progress, hooks));
         return *planners.back();
     };
     const std::vector<Target> targets = ResolveOnce(world, paths);
@@ -165,6 +173,9 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
             plannerOf(*target.volume).AddFolder(target.relativePath);
         } else {
             plannerOf(*target.volume).AddFile(target.relativePath, nullptr);
+        }
+        if (hooks.goesOn && !hooks.goesOn()) {
+            break;
         }
     }
     plan.isAllFailed = failed == targets.size();

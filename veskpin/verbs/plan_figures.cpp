@@ -82,6 +82,10 @@ bool PlanSum::Add(const std::string &relativePath, const FileLook &look, bool is
         return true;
     }
     sentSectors_ += sectors;
+    ++figures_.filesToSend;
+    for (const BitRun &run : look.blocks) {
+        figures_.blocksToSend += run.count;
+    }
     const std::string &mountPath = world_.volume.mountPath;
     const std::string path = mountPath + "/" + relativePath;
     if (figures_.requests == 0 || !RequestFillAdd(&fill_, mountPath, path, inode)) {

@@ -4,6 +4,7 @@
 #include "text/progress.h"
 
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -19,6 +20,9 @@ struct Settings {
     bool search = false;          // --search
     unsigned reservePercent = 10; // --reserve: of the SSD
     std::string output;           // --output; empty: standard output
+    bool waits = true;            // without --no-wait
+    bool force = false;           // --force
+    std::optional<unsigned> timeoutSeconds; // --timeout
 };
 
 enum class ExitStatus : int {
@@ -27,6 +31,8 @@ enum class ExitStatus : int {
     Usage = 2,   // nothing was done
     Unknown = 3, // what was asked for could not be looked at
     Service = 4, // the service does not run, has ended or did not carry it out in time
+    Interrupted = 130, // by SIGINT
+    Terminated = 143,  // by SIGTERM
 };
 
 // The first in the order of weight that holds.

@@ -12,5 +12,7 @@ ExitStatus StatusCommand(const Settings &settings, TextSink &out);
 ExitStatus ListCommand(const Settings &settings, TextSink &out);
 ExitStatus PlanCommand(const Settings &settings, TextSink &out);
 ExitStatus ExportCommand(const Settings &settings, TextSink &out);
+ExitStatus PinCommand(const Settings &settings, TextSink &out);
+ExitStatus UnpinCommand(const Settings &settings, TextSink &out);
 ExitStatus MetricsCommand(const Settings &settings, TextSink &out);
 } // namespace vesk

@@ -1,0 +1,79 @@
+#include "act/interrupt.h"
+
+#include "base/clock.h"
+
+#include <csignal>
+#include <gtest/gtest.h>
+#include <thread>
+#include <unistd.h>
+
+namespace vesk {
+namespace {
+class InterruptTest : public testing::Test {
+protected:
+    void SetUp() override {
+        sigaction(SIGINT, nullptr, &int_);
+        sigaction(SIGTERM, nullptr, &term_);
+        InterruptBegin();
+    }
+    void TearDown() override {
+        InterruptBegin(); // forgets the signal that came
+        sigaction(SIGINT, &int_, nullptr);
+        sigaction(SIGTERM, &term_, nullptr);
+    }
+    struct sigaction int_ {};
+    struct sigaction term_ {};
+};
+} // namespace
+
+TEST_F(InterruptTest, WithoutASignalAPauseIsOne) {
+    const int64_t began = NowMs();
+    EXPECT_TRUE(InterruptPause(20));
+    EXPECT_GE(NowMs() - began, 20);
+    EXPECT_EQ(InterruptSignal(), 0);
+}
+
+TEST_F(InterruptTest, ASignalThatCameBeforeEndsThePause) {
+    for (const int number : {SIGINT, SIGTERM}) {
+        InterruptBegin();
+        raise(number);
+        EXPECT_EQ(InterruptSignal(), number);
+        EXPECT_FALSE(InterruptPause(1000000));
+    }
+}
+
+TEST_F(InterruptTest, ASignalEndsThePauseThatItComesIn) {
+    std::thread sender([main = pthread_self()] {
+        usleep(20000);
+        pthread_kill(main, SIGTERM);
+    });
+    EXPECT_FALSE(InterruptPause(1000000));
+    EXPECT_EQ(InterruptSignal(), SIGTERM);
+    sender.join();
+}
+
+TEST_F(InterruptTest, AGraceKeepsASignalFromEndingPausesForSoLong) {
+    InterruptGrace(100);
+    raise(SIGINT);
+    const int64_t began = NowMs();
+    int pauses = 0;
+    while (InterruptPause(10)) {
+        ++pauses;
+    }
+    EXPECT_GE(NowMs() - began, 100);
+    EXPECT_GT(pauses, 0);
+    EXPECT_EQ(InterruptSignal(), SIGINT);
+    InterruptBegin();
+    InterruptGrace(1000000);
+    raise(SIGINT);
+    EXPECT_TRUE(InterruptPause(1));
+    raise(SIGINT);
+    EXPECT_FALSE(InterruptPause(1000000));
+    InterruptBegin();
+    InterruptGrace(1000000);
+    raise(SIGINT);
+    EXPECT_TRUE(InterruptPause(1));
+    InterruptGrace(0);
+    EXPECT_FALSE(InterruptPause(1000000));
+}
+} // namespace vesk

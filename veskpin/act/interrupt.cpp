@@ -1,0 +1,74 @@
+#include "act/interrupt.h"
+
+#include "base/clock.h"
+
+#include <poll.h>
+#include <signal.h>
+
+#include <cstdint>
+#include <ctime>
+#include <initializer_list>
+
+namespace vesk {
+namespace {
+volatile sig_atomic_t signalNoted = 0;
+volatile sig_atomic_t signalsNoted = 0;
+int64_t seenAt = 0; // milliseconds of the monotonic clock; 0: no pause has seen one yet
+unsigned grace = 0; // milliseconds
+
+void Note(int number) {
+    signalNoted = number;
+    signalsNoted = signalsNoted + 1;
+}
+
+bool IsPauseOver() {
+    if (signalsNoted == 0) {
+        return false;
+    }
+    seenAt = seenAt == 0 ? NowMs() : seenAt;
+    return signalsNoted > 1 || NowMs() - seenAt >= grace;
+}
+
+sigset_t BothSignals() {
+    sigset_t signals;
+    sigemptyset(&signals);
+    sigaddset(&signals, SIGINT);
+    sigaddset(&signals, SIGTERM);
+    return signals;
+}
+} // namespace
+
+void InterruptBegin() {
+    signalNoted = 0;
+    signalsNoted = 0;
+    seenAt = 0;
+    grace = 0;
+    struct sigaction action {};
+    action.sa_handler = Note;
+    for (const int number : {SIGINT, SIGTERM}) {
+        sigaction(number, &action, nullptr);
+    }
+}
+
+int InterruptSignal() {
+    return signalNoted;
+}
+
+void InterruptGrace(unsigned milliseconds) {
+    grace = milliseconds;
+}
+
+bool InterruptPause(unsigned milliseconds) {
+    // Held back until the sleep begins: one that comes before would not end it.
+    const sigset_t both = BothSignals();
+    sigset_t before;
+    sigprocmask(SIG_BLOCK, &both, &before);
+    if (!IsPauseOver()) {
+        const timespec time{static_cast<time_t>(milliseconds / 1000),
+                            static_cast<long>(milliseconds % 1000) * 1000000};
+        ppoll(nullptr, 0, &time, &before);
+    }
+    sigprocmask(SIG_SETMASK, &before, nullptr);
+    return !IsPauseOver();
+}
+} // namespace vesk

@@ -1,0 +1,20 @@
+// SIGINT and SIGTERM while pins are changed: they are noted, and whoever waits comes back, so that
+// a command ends by itself and tells what it has done.
+//
+// Thread rule: one thread waits; the signals may come at any time.
+#pragma once
+
+namespace vesk {
+// From here on they are noted.
+void InterruptBegin();
+
+// The last that came, or 0.
+int InterruptSignal();
+
+// For what is not to be left half done: from here on a signal ends pauses only when it is so many
+// milliseconds old, and a second one at once. 0: as before.
+void InterruptGrace(unsigned milliseconds);
+
+// Sleeps for so long, or until one comes. False: one has come, and its grace is over.
+bool InterruptPause(unsigned milliseconds);
+} // namespace vesk

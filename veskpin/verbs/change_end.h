@@ -1,0 +1,23 @@
+// How the changing commands begin and end. Thread rule: one thread.
+#pragma once
+
+#include "act/change_lock.h"
+#include "verbs/change_run.h"
+#include "verbs/settings.h"
+
+#include <initializer_list>
+
+namespace vesk {
+// Takes the lock of all changing commands; another one's end is waited for.
+ChangeLock ChangeBegin(const Deadline &deadline);
+
+// Ends the answer where the lock cannot be had.
+ExitStatus ChangeLockStatus(const ChangeLock &lock, ChangeView &view);
+
+// Adds to the errors why not everything was carried out.
+void ChangeNoteEnd(const ChangeRun &run, LookErrors *errors);
+
+// The status of what was carried out, the first in the order of weight that holds for any of the
+// runs or, where nothing kept the service from it, `otherwise`.
+ExitStatus ChangeStatus(std::initializer_list<const ChangeRun *> runs, ExitStatus otherwise);
+} // namespace vesk

@@ -1,0 +1,80 @@
+// Sending files to the service, request by request, and waiting for what becomes of them.
+//
+// Thread rule: one owner.
+#pragma once
+
+#include "act/deadline.h"
+#include "act/request_watch.h"
+#include "act/service_talk.h"
+#include "model/file_look.h"
+#include "text/work_progress.h"
+#include "verbs/change_outcome.h"
+#include "verbs/settings.h"
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace vesk {
+struct ChangeHooks {
+    ChangeTeller tell;                              // each file once, when it has come to rest
+    std::function<void(const RequestBatch &)> sent; // each request; may be empty
+};
+
+enum class ChangePace {
+    Steady, // what is sent is carried out before much more is sent
+    AtOnce, // as the service takes it
+};
+
+class ChangeRun {
+public:
+    // `deadline` and `progress` outlive it.
+    ChangeRun(const Settings &settings, RequestType type, ChangePace pace, const Deadline &deadline,
+              WorkProgress &progress, ChangeHooks hooks);
+
+    // A file to be sent, as it was looked at, with its state now. Sends a request when one is full.
+    // What cannot be sent any more is told at once.
+    void Add(const std::string &mountPath, const std::string &relativePath, const FileLook &look,
+             std::optional<FileState> state);
+
+    // Sends what is left.
+    void Flush();
+
+    // The same, and waits until all is carried out unless told not to.
+    void Finish();
+
+    uint64_t RequestsSent() const { return sent_; }
+    // Done, or why not everything was carried out.
+    TalkEnd End() const { return end_; }
+    bool HasServiceEnded() const { return hasServiceEnded_; }
+    const std::string &Trouble() const { return talk_.Trouble(); }
+
+private:
+    RequestBatch EmptyBatch(const std::string &mountPath) const {
+        return {mountPath, type_, {}, {}};
+    }
+    void Send(RequestBatch batch, std::vector<BatchFile> *changed);
+    void SendNow(RequestBatch batch);
+    bool AwaitTurn();
+    bool AwaitRoom(size_t most);
+    bool AwaitRestart();
+    void Tell(const RequestBatch &batch, std::optional<ChangeReason> reason);
+
+    const std::string configPath_;
+    const bool waits_;
+    const bool hasTimeout_;
+    const RequestType type_;
+    const ChangePace pace_;
+    const Deadline &deadline_;
+    WorkProgress &progress_;
+    const ChangeHooks hooks_;
+    ServiceTalk talk_;
+    RequestWatch watch_;
+    RequestBatch open_; // that is being filled
+    uint64_t sent_ = 0;
+    TalkEnd end_ = TalkEnd::Done;  // anything else: nothing is sent any more
+    bool hasServiceEnded_ = false; // one did; the next was waited for
+};
+} // namespace vesk

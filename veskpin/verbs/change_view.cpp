@@ -1,0 +1,93 @@
+#include "verbs/change_view.h"
+
+#include "text/escape.h"
+#include "text/units.h"
+#include "verbs/answer.h"
+
+namespace vesk {
+const char *ChangeReasonText(ChangeReason reason) {
+    switch (reason) {
+    case ChangeReason::Dropped: return "dropped";
+    case ChangeReason::Vanished: return "vanished";
+    case ChangeReason::NotTaken: return "not-taken";
+    case ChangeReason::NeedsRepair: break;
+    }
+    return "needs-repair";
+}
+
+ChangeView::ChangeView(const char *command, FileState wanted, std::optional<FileState> underway,
+                       const Settings &settings, TextSink &out)
+    : wanted_(wanted), underway_(settings.waits ? std::nullopt : underway), out_(out), writer_(out),
+      json_(settings.json), color_(settings.color) {
+    if (json_) {
+        AnswerBegin(writer_, command);
+        writer_.BeginArray("files");
+    }
+}
+
+void ChangeView::Skip(const std::string &path, SkipReason reason) {
+    BeginSkipped();
+    ++skipped_;
+    if (!json_) {
+        out_.Put("left out  " + TextEscaped(path) + ": " + SkipReasonText(reason) + "\n");
+        return;
+    }
+    writer_.BeginObject();
+    writer_.Path("path", path);
+    writer_.Text("reason", SkipReasonText(reason));
+    writer_.EndObject();
+}
+
+void ChangeView::BeginSkipped() {
+    if (!hasSkipped_ && json_) {
+        writer_.EndArray();
+        writer_.BeginArray("skipped");
+    }
+    hasSkipped_ = true;
+}
+
+void ChangeView::Put(const ChangedFile &file) {
+    const bool isAsAsked =
+        file.state && !file.reason && (*file.state == wanted_ || file.state == underway_);
+    (isAsAsked ? asAsked_ : others_) += 1;
+    const char *state = file.state ? FileStateText(*file.state) : nullptr;
+    if (!json_) {
+        if (!isAsAsked) {
+            out_.Put(Colored(state == nullptr ? "unknown" : state, 31, color_) + "  " +
+                     TextEscaped(file.path) +
+                     (file.reason ? std::string(": ") + ChangeReasonText(*file.reason) : "") +
+                     "\n");
+        }
+        return;
+    }
+    writer_.BeginObject();
+    writer_.Path("path", file.path);
+    state == nullptr ? writer_.Null("state") : writer_.Text("state", state);
+    file.reason ? writer_.Text("reason", ChangeReasonText(*file.reason)) : writer_.Null("reason");
+    writer_.EndObject();
+}
+
+void ChangeView::End(uint64_t requestsSent, const std::vector<std::string> &repinned,
+                     const LookErrors &errors) {
+    BeginSkipped();
+    if (json_) {
+        writer_.EndArray();
+        writer_.Number("requestsSent", requestsSent);
+        writer_.BeginArray("repinned");
+        for (const std::string &path : repinned) {
+            writer_.Text("", std::string_view(path));
+        }
+        writer_.EndArray();
+        AnswerEnd(writer_, out_, errors);
+        return;
+    }
+    const std::string also = underway_ ? std::string(" or ") + FileStateText(*underway_) : "";
+    out_.Put(UnitsOfThings(asAsked_, "file") + " " + FileStateText(wanted_) + also + ", " +
+             std::to_string(others_) + " not, " + std::to_string(skipped_) + " left out, in " +
+             UnitsOfThings(requestsSent, "request") + "\n");
+    for (const std::string &path : repinned) {
+        out_.Put("pinned again  " + TextEscaped(path) + "\n");
+    }
+    AnswerErrors(errors);
+}
+} // namespace vesk
