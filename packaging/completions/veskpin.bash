@@ -30,7 +30,7 @@ _veskpin_read_words() {
     for ((i = 1; i < COMP_CWORD; ++i)); do
         case "${COMP_WORDS[i]}" in
         =) ;; # between an option and its value
-        --config | --color | --progress | --files-from | --reserve | --output) option=${COMP_WORDS[i]} ;;
+        --config | --color | --progress | --files-from | --reserve | --timeout | --output) option=${COMP_WORDS[i]} ;;
         --) ended=yes ;;
         *)
             [[ -n $option || ${COMP_WORDS[i]} == -* ]] || command=${command:-${COMP_WORDS[i]}}
@@ -49,12 +49,14 @@ _veskpin() {
     --color) mapfile -t COMPREPLY < <(compgen -W "auto always never" -- "$word") && return ;;
     --progress) mapfile -t COMPREPLY < <(compgen -W "auto json none" -- "$word") && return ;;
     --config | --files-from | --output) _veskpin_complete_files "$word" && return ;;
-    --reserve) return ;;
+    --reserve | --timeout) return ;;
     esac
     case "$command" in
-    '') options="status list plan export metrics $options" ;;
+    '') options="status list plan pin unpin export metrics $options" ;;
     list) options="$options --files-from -0 --search" ;;
     plan) options="$options --files-from -0 --reserve" ;;
+    pin) options="$options --files-from -0 --no-wait --timeout --reserve --force" ;;
+    unpin) options="$options --files-from -0 --no-wait --timeout" ;;
     export) options="$options -0" ;;
     metrics) options="$options --output" ;;
     esac
@@ -64,7 +66,7 @@ _veskpin() {
     fi
     case "$command" in
     status | export) _veskpin_complete_volumes "$word" ;;
-    list | plan) _veskpin_complete_files "$word" ;;
+    list | plan | pin | unpin) _veskpin_complete_files "$word" ;;
     esac
 }
 

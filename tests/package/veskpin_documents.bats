@@ -26,9 +26,9 @@ complete_line() { # WORD...: what bash would offer for the last word
 }
 offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
 
-@test "the program has 5 commands and 10 options beside --help" {
-    [ "$(xargs <<<"$COMMANDS")" = "status list plan export metrics" ]
-    [ "$(wc -l <<<"$OPTIONS")" = 10 ]
+@test "the program has 7 commands and 13 options beside --help" {
+    [ "$(xargs <<<"$COMMANDS")" = "status list plan pin unpin export metrics" ]
+    [ "$(wc -l <<<"$OPTIONS")" = 13 ]
 }
 
 @test "manual page and page have every command and option" {
@@ -45,12 +45,28 @@ offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
     done
 }
 
+# texts_of COMMAND JQ_FILTER: of the schema of its document.
+texts_of() { jq -r "$2 | strings" "$TREE/docs/schemas/veskpin-$1.schema.json"; }
+
+@test "the schemas agree on states and reasons" {
+    local command left_out='.properties.skipped.items.properties.reason.enum[]'
+    local state='.properties.files.items.properties.state.enum[]' reason='.properties.files.items.properties.reason.enum[]'
+    [ "$(texts_of pin "$left_out")" = "$(texts_of plan "$left_out")" ]
+    for command in pin unpin; do
+        # Renamed files are not looked for.
+        [ "$(texts_of "$command" "$state")" = "$(texts_of list '."$defs".file.properties.state.enum[]' | grep -vx renamed)" ]
+    done
+    [ "$(texts_of pin "$reason" | xargs)" = "dropped vanished not-taken" ]
+    [ "$(texts_of unpin "$reason" | xargs)" = "dropped vanished not-taken needs-repair" ]
+}
+
 @test "manual page and page have every state and every reason" {
     local manual word
     manual=$(mandoc -T ascii "$PACKAGING/man/veskpin.1" | col -b)
-    for word in $(jq -r '."$defs".file.properties.state.enum[] | strings' "$TREE/docs/schemas/veskpin-list.schema.json") \
-        $(jq -r '.properties.skipped.items.properties.reason.enum[]' "$TREE/docs/schemas/veskpin-plan.schema.json"); do
-        grep -q "\"$word\"" "$TREE"/veskpin/verbs/{file_state,plan_reason}.cpp || { echo "$word"; return 1; }
+    for word in $(texts_of list '."$defs".file.properties.state.enum[]') \
+        $(texts_of plan '.properties.skipped.items.properties.reason.enum[]') \
+        $(texts_of unpin '.properties.files.items.properties.reason.enum[]'); do
+        grep -q "\"$word\"" "$TREE"/veskpin/verbs/{file_state,plan_reason,change_view}.cpp || { echo "$word"; return 1; }
         grep -qE "^[[:space:]]+$word([[:space:]]|\$)" <<<"$manual" || { echo "$word"; return 1; }
         grep -qE "^\| (\`[a-z]+\`, )?\`$word\`" "$TREE/docs/veskpin.md" || { echo "$word"; return 1; }
     done
@@ -58,13 +74,17 @@ offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
 
 @test "bash completes commands and each command's options" {
     local everywhere="--color --config --help --json --progress --version"
-    [ "$(offered "")" = "$everywhere export list metrics plan status" ]
+    [ "$(offered "")" = "$everywhere export list metrics pin plan status unpin" ]
     [ "$(offered --json --config pins.json pl)" = plan ]
     [ "$(offered --color list "-")" = "$everywhere" ]
     [ "$(offered status -)" = "$everywhere" ]
     [ "$(offered list --s)" = --search ]
     [ "$(offered list -)" = "--color --config --files-from --help --json --progress --search --version -0" ]
     [ "$(offered plan -)" = "--color --config --files-from --help --json --progress --reserve --version -0" ]
+    [ "$(offered pin -)" = "--color --config --files-from --force --help --json --no-wait --progress --reserve --timeout --version -0" ]
+    [ "$(offered unpin -)" = "--color --config --files-from --help --json --no-wait --progress --timeout --version -0" ]
+    [ "$(offered pin --no-wait --timeout 9 --f)" = "--files-from --force" ]
+    [ "$(offered --timeout 9 unp)" = unpin ]
     [ "$(offered export -)" = "$everywhere -0" ]
     [ "$(offered metrics --o)" = --output ]
     [ "$(offered metrics "")" = "" ]
@@ -77,8 +97,11 @@ offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
     [ "$(offered --color = n)" = never ]
     [ "$(offered status --progress j)" = json ]
     [ "$(offered plan --reserve "")" = "" ]
+    [ "$(offered pin --reserve "")" = "" ]
+    [ "$(offered unpin --timeout "")" = "" ]
     local option
-    for option in "--config" "list --files-from" "plan --files-from" "metrics --output" "--config =" "list" "list --"; do
+    for option in "--config" "list --files-from" "plan --files-from" "pin --files-from" "metrics --output" "--config =" \
+        "list" "list --" "pin" "pin --timeout 9" "unpin --"; do
         # shellcheck disable=SC2086
         [ "$(complete_line $option f | sort)" = "$(printf 'film 2\nfilm1')" ] || { echo "$option"; return 1; }
     done
@@ -101,6 +124,7 @@ offered() { complete_line "$@" | LC_ALL=C sort | xargs; }
     [ "$(complete_line export '/v\$')" = '/v\$\(touch\ owned\)' ]
     touch "${names[@]}"
     [ "$(complete_line list f | sort)" = "$(printf '%s\n' "${names[@]}" | sort)" ]
+    [ "$(complete_line pin f | sort)" = "$(printf '%s\n' "${names[@]}" | sort)" ]
     [ "$(complete_line --config f | sort)" = "$(printf '%s\n' "${names[@]}" | sort)" ]
     [ ! -e owned ]
 }
@@ -122,10 +146,11 @@ zsh_lines() { timeout 120 zsh -f "$BATS_TEST_DIRNAME/complete.zsh" "$PACKAGING/c
     touch film1
     printf '%s\n' "/dev/sdb /volume1 ext4 rw 0 0" >mounts
     run zsh_lines "pl" "--js" "--color ne" "plan --res" "list --se" "list fi" "--config x status /vol" \
-        "export /vol" "metrics --output fi"
+        "export /vol" "metrics --output fi" "unp" "pin --fo" "pin --res" "pin fi" "unpin --no" "unpin --timeout 9 fi"
     echo "$output"
     for word in "plan" "--json" "--color never" "plan --reserve" "list --search" "list film1" \
-        "--config x status /volume1" "export /volume1" "metrics --output film1"; do
+        "--config x status /volume1" "export /volume1" "metrics --output film1" "unpin" "pin --force" "pin --reserve" \
+        "pin film1" "unpin --no-wait" "unpin --timeout 9 film1"; do
         [[ "$output" == *"<veskpin $word>"* ]] || { echo "$word"; return 1; }
     done
 }
@@ -134,7 +159,7 @@ zsh_lines() { timeout 120 zsh -f "$BATS_TEST_DIRNAME/complete.zsh" "$PACKAGING/c
     cd "$BATS_TEST_TMPDIR"
     hostile_mounts mounts
     touch 'f$(touch owned)' 'g`touch owned`'
-    run zsh_lines "status /v" "status /vo" 'export /v\$' "status /v:" "list f" "plan g"
+    run zsh_lines "status /v" "status /vo" 'export /v\$' "status /v:" "list f" "plan g" "pin f" "unpin g"
     echo "$output"
     [ ! -e owned ]
     [[ "$output" == *"<veskpin status /volume1>"* ]]
@@ -142,4 +167,6 @@ zsh_lines() { timeout 120 zsh -f "$BATS_TEST_DIRNAME/complete.zsh" "$PACKAGING/c
     [[ "$output" == *'<veskpin status /v:m:\{touch\ owned\}>'* ]]
     [[ "$output" == *'<veskpin list f\$\(touch\ owned\)>'* ]]
     [[ "$output" == *'<veskpin plan g\`touch\ owned\`>'* ]]
+    [[ "$output" == *'<veskpin pin f\$\(touch\ owned\)>'* ]]
+    [[ "$output" == *'<veskpin unpin g\`touch\ owned\`>'* ]]
 }
