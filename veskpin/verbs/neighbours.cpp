@@ -3,12 +3,17 @@
 #include "bitmap/pin_bitmap.h"
 
 #include <algorithm>
+#include <cerrno>
 
 namespace vesk {
 namespace {
 bool HasAny(const BlockSet &set, const std::vector<BitRun> &runs) {
     return std::any_of(runs.begin(), runs.end(),
                        [&](const BitRun &run) { return BlockSetCountIn(set, run) > 0; });
+}
+
+bool IsGone(int error) {
+    return error == ENOENT || error == ENOTDIR;
 }
 } // namespace
 
@@ -21,36 +26,52 @@ void Neighbours::Note(const RequestBatch &batch, const World &world) {
     FileLooker looker(batch.mountPath);
     for (const BatchFile &file : batch.files) {
         letGo.inodes.insert(file.inode);
-        for (const BitRun &run : looker.Look(file.relativePath).blocks) {
+        const FileLook &look = looker.Look(file.relativePath);
+        if (!look.hasExtents || !volume->volume.deviceBytes) {
+            LookUnknownAdd(&errors_, VolumePath(batch.mountPath, file.relativePath),
+                           "which files share its blocks cannot be told");
+        }
+        for (const BitRun &run : look.blocks) {
             BlockSetAdd(&letGo.blocks, run);
         }
     }
 }
 
-void Neighbours::Send(const std::string &configPath, ChangeRun &run) const {
+void Neighbours::Send(const std::string &configPath, ChangeRun &run) {
     if (volumes_.empty()) {
         return;
     }
-    const World world = WorldLook(configPath);
+    World world = WorldLook(configPath);
     for (const auto &[mountPath, letGo] : volumes_) {
-        const WorldVolume *volume = WorldVolumeFind(world, mountPath);
-        if (volume == nullptr) {
-            continue; // its records are gone
+        if (const WorldVolume *volume = WorldVolumeFind(world, mountPath)) {
+            WorldVolumeUse(world, *volume);
+            SendOf(*volume, letGo, run);
         }
-        FileLooker looker(mountPath);
-        for (const KnownFile &file : volume->known.files) {
-            // One that is being let go by another request stays let go.
-            if (!file.inode || file.stored == kRequestUnpinFiles ||
-                letGo.inodes.count(*file.inode) > 0) {
-                continue;
-            }
-            const FileLook &look = looker.Look(file.relativePath);
-            if (look.error == 0 && static_cast<uint32_t>(look.status.inode) == *file.inode &&
-                HasAny(letGo.blocks, look.blocks)) {
-                const auto figures = FileFiguresOf(look, volume->volume);
-                run.Add(mountPath, file.relativePath, look,
-                        FileStateOf(&file, look, figures, volume->volume));
-            }
+    }
+    for (const LookError &error : world.errors.list) {
+        LookErrorAdd(&errors_, error.path, error.text);
+    }
+    errors_.isUnknown = errors_.isUnknown || world.errors.isUnknown;
+}
+
+void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run) {
+    const Volume &volume = world.volume;
+    FileLooker looker(volume.mountPath);
+    for (const KnownFile &file : world.known.files) {
+        // One that is being let go by another request stays let go.
+        if (!file.inode || file.stored == kRequestUnpinFiles ||
+            letGo.inodes.count(*file.inode) > 0) {
+            continue;
+        }
+        const FileLook &look = looker.Look(file.relativePath);
+        const bool isItself =
+            look.error == 0 && static_cast<uint32_t>(look.status.inode) == *file.inode;
+        if ((look.error != 0 && !IsGone(look.error)) || (isItself && !look.hasExtents)) {
+            LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
+                           "whether it has lost blocks cannot be told");
+        } else if (isItself && HasAny(letGo.blocks, look.blocks)) {
+            run.Add(volume.mountPath, file.relativePath, look,
+                    FileStateOf(&file, look, FileFiguresOf(look, volume), volume));
         }
     }
 }

@@ -16,17 +16,22 @@
 namespace vesk {
 class Neighbours {
 public:
+    // What keeps one from being found becomes an error: it may have lost blocks.
+    explicit Neighbours(LookErrors &errors) : errors_(errors) {}
+
     // A request to let files go was sent.
     void Note(const RequestBatch &batch, const World &world);
 
     // Sends the recorded files that share blocks with those, as they are now, to be pinned again.
-    void Send(const std::string &configPath, ChangeRun &run) const;
+    void Send(const std::string &configPath, ChangeRun &run);
 
 private:
     struct LetGo {
         BlockSet blocks;
         std::unordered_set<uint32_t> inodes; // low 32 bits
     };
+    void SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run);
+    LookErrors &errors_;
     std::map<std::string, LetGo> volumes_; // by mount path
 };
 } // namespace vesk

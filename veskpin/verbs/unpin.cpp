@@ -82,7 +82,7 @@ void SendUnpins(const WorldVolume &world, const std::set<size_t> &indexes, Chang
 
 // Sends the neighbours of what was sent. That is not left half done: neither a signal nor the end
 // of the time keeps it from being sent within a second.
-void SendNeighbours(const Neighbours &neighbours, const Settings &settings, ChangeRun &pins) {
+void SendNeighbours(Neighbours &neighbours, const Settings &settings, ChangeRun &pins) {
     InterruptGrace(kGraceMs);
     neighbours.Send(settings.configPath, pins);
     pins.Flush();
@@ -104,7 +104,7 @@ ExitStatus UnpinCommand(const Settings &settings, TextSink &out) {
         work.files += indexes.size();
     }
     WorkProgress progress(settings.progress, work);
-    Neighbours neighbours;
+    Neighbours neighbours(world.errors);
     ChangeRun unpins(settings, kRequestUnpinFiles, ChangePace::Steady, deadline, progress,
                      {[&](const ChangedFile &file) { view.Put(file); },
                       [&](const RequestBatch &batch) { neighbours.Note(batch, world); }});

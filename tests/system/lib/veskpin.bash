@@ -42,3 +42,41 @@ shows() {
     shift
     expect_output "$status" /dev/null veskpin "$@"
 }
+
+# shellcheck disable=SC2016
+reason_of() { answer '.files[] | select(.path == $path) | .reason' --arg path "$1" -r; }
+skipped() { answer '[.skipped[] | [.path, .reason]]'; }
+left() { answer '[.requestsSent, (.files | length), (.repinned | length)]'; }
+
+# in_background FILE COMMAND...: veskpin, its JSON into FILE; PIN_PID is its process.
+in_background() {
+    (
+        close_descriptors
+        exec "$BIN/veskpin" --config "$CONF" --json "${@:2}"
+    ) >"$1" 2>/tmp/told &
+    PIN_PID=$!
+}
+
+# All blocks of these files are marked and at the driver, and no others.
+holds_just() { # FILE...
+    same "$(blocks_of "$@")" "$(bitmap_blocks 1)"
+    same "$(blocks_of "$@")" "$(driver_blocks 1)"
+}
+
+# many COUNT: a folder of so many files whose names fill a request each four or five of them.
+many() {
+    local i long
+    long=$(printf '%0100d' 0)
+    mkdir many
+    for i in $(seq "$1"); do random "many/$i-$long" 4K; done
+    sync
+}
+nth() { echo "many/$1-$(printf '%0100d' 0)"; }
+
+# ends_by_itself STATUS COMMAND: what is in the background does so, whatever it waited for.
+ends_by_itself() {
+    local status=0
+    wait "$PIN_PID" || status=$?
+    same "$1" "$status"
+    check_schema "$2"
+}

@@ -56,12 +56,9 @@ TEST_F(InterruptTest, AGraceKeepsASignalFromEndingPausesForSoLong) {
     InterruptGrace(100);
     raise(SIGINT);
     const int64_t began = NowMs();
-    int pauses = 0;
     while (InterruptPause(10)) {
-        ++pauses;
     }
     EXPECT_GE(NowMs() - began, 100);
-    EXPECT_GT(pauses, 0);
     EXPECT_EQ(InterruptSignal(), SIGINT);
     InterruptBegin();
     InterruptGrace(1000000);
