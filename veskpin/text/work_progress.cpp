@@ -3,6 +3,7 @@
 #include "text/units.h"
 
 #include <algorithm>
+#include <cmath>
 
 namespace vesk {
 namespace {
@@ -45,13 +46,13 @@ std::optional<uint64_t> WorkProgress::SecondsLeft(int64_t elapsedMs) const {
     const double elapsed = static_cast<double>(elapsedMs) / 1000;
     const double share = Share();
     if (share > 0) {
-        return static_cast<uint64_t>(elapsed * (1 - share) / share + 0.5);
+        return static_cast<uint64_t>(lround(elapsed * (1 - share) / share));
     }
     if (!work_.seconds) {
         return std::nullopt;
     }
     const double left = static_cast<double>(*work_.seconds) - elapsed;
-    return left < 1 ? 1 : static_cast<uint64_t>(left + 0.5);
+    return left < 1 ? 1 : static_cast<uint64_t>(lround(left));
 }
 
 std::string WorkProgress::JsonText() const {

@@ -54,11 +54,11 @@ void ChangeRun::Flush() {
     // A file that something changes now may take those down that are with it.
     std::vector<BatchFile> changed;
     const std::string mountPath = batch.mountPath;
-    Send(std::move(batch), &changed);
+    Send(batch, &changed);
     for (const BatchFile &file : changed) {
         RequestBatch alone = EmptyBatch(mountPath);
         BatchAdd(&alone, file);
-        Send(std::move(alone), nullptr);
+        Send(alone, nullptr);
     }
 }
 
@@ -74,7 +74,7 @@ void ChangeRun::Finish() {
 
 // Files that have changed since they were looked at are given to `changed`, or sent where that is
 // null.
-void ChangeRun::Send(RequestBatch batch, std::vector<BatchFile> *changed) {
+void ChangeRun::Send(const RequestBatch &batch, std::vector<BatchFile> *changed) {
     bool hasTurn = end_ == TalkEnd::Done &&
                    (pace_ == ChangePace::AtOnce || AwaitRoom(kStoredMost - 1)) && AwaitTurn();
     if (hasTurn && !VolumeCanPin(batch.mountPath)) {

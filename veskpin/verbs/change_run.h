@@ -55,7 +55,7 @@ private:
     RequestBatch EmptyBatch(const std::string &mountPath) const {
         return {mountPath, type_, {}, {}};
     }
-    void Send(RequestBatch batch, std::vector<BatchFile> *changed);
+    void Send(const RequestBatch &batch, std::vector<BatchFile> *changed);
     void SendNow(RequestBatch batch);
     bool AwaitTurn();
     bool AwaitRoom(size_t most);
