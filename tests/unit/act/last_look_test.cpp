@@ -23,7 +23,7 @@ protected:
             return 0;
         };
     }
-    BatchFile Make(const std::string &name, uint64_t bytes) {
+    BatchFile Make(const std::string &name, size_t bytes) {
         const std::string path = volume_ + "/" + name;
         WriteWhole(path, std::string(bytes, 'x'));
         struct stat status {};
