@@ -16,6 +16,18 @@ attacker() {
 # attacker_folder PATH: a folder of his own, as users of a volume have one.
 attacker_folder() { install -d -o "$ATTACKER" -g "$ATTACKER" -m 755 "$1"; }
 
+# his COMMAND...: run by him in his folder, HIS.
+HIS=/volume1/photos
+his() { attacker env -C "$HIS" "$@"; }
+
+# his_files NAME...: with the folders that they need.
+his_files() {
+    his bash -eu -c 'for name in "$@"; do
+        [[ $name != */* ]] || mkdir -p "./${name%/*}"
+        echo data >"./$name"
+    done' - "$@"
+}
+
 # users_volume FILE...: a fresh volume whose top folder is root's, and on it the folder "users", the attacker's, with
 # these files.
 users_volume() {

@@ -210,7 +210,7 @@ END
         echo ": Can't get server messsage queue: File exists"
     )
     # The way out that docs/operations.md has.
-    recipe 'queues_of_root()'
+    recipe 'KEY_FILE='
     send_pin
     waiting_is 2
 }

@@ -1,4 +1,4 @@
-// SIGINT and SIGTERM while pins are changed: they are noted, and whoever waits comes back, so that
+// SIGINT, SIGTERM and the end of the terminal while pins are changed: they are noted, and whoever waits comes back, so that
 // a command ends by itself and tells what it has done.
 //
 // Thread rule: one thread waits; the signals may come at any time.
