@@ -7,7 +7,6 @@
 
 #include <cstdint>
 #include <ctime>
-#include <initializer_list>
 
 namespace vesk {
 namespace {
@@ -29,11 +28,14 @@ bool IsPauseOver() {
     return signalsNoted > 1 || NowMs() - seenAt >= grace;
 }
 
-sigset_t BothSignals() {
+const int kSignals[] = {SIGINT, SIGTERM, SIGHUP};
+
+sigset_t AllSignals() {
     sigset_t signals;
     sigemptyset(&signals);
-    sigaddset(&signals, SIGINT);
-    sigaddset(&signals, SIGTERM);
+    for (const int number : kSignals) {
+        sigaddset(&signals, number);
+    }
     return signals;
 }
 } // namespace
@@ -45,8 +47,12 @@ void InterruptBegin() {
     grace = 0;
     struct sigaction action {};
     action.sa_handler = Note;
-    for (const int number : {SIGINT, SIGTERM}) {
-        sigaction(number, &action, nullptr);
+    for (const int number : kSignals) {
+        struct sigaction before {};
+        sigaction(number, nullptr, &before);
+        if (number != SIGHUP || before.sa_handler != SIG_IGN) {
+            sigaction(number, &action, nullptr);
+        }
     }
 }
 
@@ -60,9 +66,9 @@ void InterruptGrace(unsigned milliseconds) {
 
 bool InterruptPause(unsigned milliseconds) {
     // Held back until the sleep begins: one that comes before would not end it.
-    const sigset_t both = BothSignals();
+    const sigset_t all = AllSignals();
     sigset_t before;
-    sigprocmask(SIG_BLOCK, &both, &before);
+    sigprocmask(SIG_BLOCK, &all, &before);
     if (!IsPauseOver()) {
         const timespec time{static_cast<time_t>(milliseconds / 1000),
                             static_cast<long>(milliseconds % 1000) * 1000000};

@@ -1,11 +1,11 @@
-// SIGINT, SIGTERM and the end of the terminal while pins are changed: they are noted, and whoever waits comes back, so that
-// a command ends by itself and tells what it has done.
+// SIGINT, SIGTERM and SIGHUP while pins are changed: they are noted, and whoever waits comes back,
+// so that a command ends by itself and tells what it has done.
 //
 // Thread rule: one thread waits; the signals may come at any time.
 #pragma once
 
 namespace vesk {
-// From here on they are noted.
+// From here on they are noted, SIGHUP unless it is ignored, as by nohup.
 void InterruptBegin();
 
 // The last that came, or 0.

@@ -10,7 +10,7 @@
 namespace vesk {
 namespace {
 ExitStatus InterruptStatus() {
-    return InterruptSignal() == SIGTERM ? ExitStatus::Terminated : ExitStatus::Interrupted;
+    return InterruptSignal() == SIGINT ? ExitStatus::Interrupted : ExitStatus::Terminated;
 }
 
 const char *TextOf(TalkEnd end) {

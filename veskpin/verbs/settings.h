@@ -32,7 +32,7 @@ enum class ExitStatus : int {
     Unknown = 3,       // what was asked for could not be looked at
     Service = 4,       // the service does not run, has ended or did not carry it out in time
     Interrupted = 130, // by SIGINT
-    Terminated = 143,  // by SIGTERM
+    Terminated = 143,  // by SIGTERM, or the end of the terminal
 };
 
 // The first in the order of weight that holds.

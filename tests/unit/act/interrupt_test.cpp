@@ -14,15 +14,18 @@ protected:
     void SetUp() override {
         sigaction(SIGINT, nullptr, &int_);
         sigaction(SIGTERM, nullptr, &term_);
+        sigaction(SIGHUP, nullptr, &hangUp_);
         InterruptBegin();
     }
     void TearDown() override {
         InterruptBegin(); // forgets the signal that came
         sigaction(SIGINT, &int_, nullptr);
         sigaction(SIGTERM, &term_, nullptr);
+        sigaction(SIGHUP, &hangUp_, nullptr);
     }
     struct sigaction int_ {};
     struct sigaction term_ {};
+    struct sigaction hangUp_ {};
 };
 } // namespace
 
@@ -34,12 +37,20 @@ TEST_F(InterruptTest, WithoutASignalAPauseIsOne) {
 }
 
 TEST_F(InterruptTest, ASignalThatCameBeforeEndsThePause) {
-    for (const int number : {SIGINT, SIGTERM}) {
+    for (const int number : {SIGINT, SIGTERM, SIGHUP}) {
         InterruptBegin();
         raise(number);
         EXPECT_EQ(InterruptSignal(), number);
         EXPECT_FALSE(InterruptPause(1000000));
     }
+}
+
+TEST_F(InterruptTest, WhatIgnoresTheEndOfATerminalGoesOn) {
+    signal(SIGHUP, SIG_IGN);
+    InterruptBegin();
+    raise(SIGHUP);
+    EXPECT_EQ(InterruptSignal(), 0);
+    EXPECT_TRUE(InterruptPause(1));
 }
 
 TEST_F(InterruptTest, ASignalEndsThePauseThatItComesIn) {
