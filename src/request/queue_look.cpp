@@ -36,6 +36,7 @@ MsgQueueCause MsgQueueLook(const char *keyFile, MsgQueueState *state) {
     state->messages = status.msg_qnum;
     state->bytes = status.__msg_cbytes;
     state->maxBytes = status.msg_qbytes;
+    state->lastTaker = status.msg_lrpid;
     return MsgQueueIsTrusted(status) ? MsgQueueCause::Found : MsgQueueCause::Foreign;
 }
 

@@ -27,6 +27,7 @@ struct MsgQueueState {
     uint64_t messages;
     uint64_t bytes;    // in the messages
     uint64_t maxBytes; // of all messages
+    pid_t lastTaker;   // who took the last message, 0 where none was taken
 };
 
 // Looks at the queue that the file's key names. `*state` is filled as far as the cause allows,

@@ -7,6 +7,8 @@ namespace vesk {
 namespace {
 const size_t kTextMax = kRequestDataBytes - 1; // of paths and of the list, without the NUL
 const size_t kRelativePathMax = sizeof(FileInfo::szRelativePath) - 1;
+// A file's folder is told from so many bytes of its path.
+const size_t kPathCut = 512;
 const char kSeparating[] = ";# \t\n\v\f\r";
 
 // Bytes of the file's entry in the list.
@@ -23,7 +25,8 @@ RequestPathFault RequestPathCheck(const std::string &mountPath, const std::strin
     }
     const bool fits = mountPath.size() < kRequestMountPathBytes && filePath.size() <= kTextMax &&
                       filePath.size() - mountPath.size() - 1 <= kRelativePathMax &&
-                      EntryBytes(mountPath, filePath, inode) <= kTextMax;
+                      EntryBytes(mountPath, filePath, inode) <= kTextMax &&
+                      (filePath.size() <= kPathCut || filePath.rfind('/') < kPathCut - 1);
     return fits ? RequestPathFault::None : RequestPathFault::TooLong;
 }
 

@@ -115,7 +115,7 @@ setup() {
     wait "$PIN_PID" || status=$?
     same 1 "$status"
     check_schema pin
-    same '[null,"vanished"]' "$(answer ".files[] | select(.path | startswith(\"/volume1/many/9-\")) | [.state,.reason]")"
+    same '["unpinned","vanished"]' "$(answer ".files[] | select(.path | startswith(\"/volume1/many/9-\")) | [.state,.reason]")"
     same '[19,["pinned",null]]' \
         "$(answer '[.files[] | select(.reason == null)] | [length, (map([.state,.reason]) | unique[])]')"
     holds_just many/*
@@ -175,8 +175,9 @@ setup() {
     umount /volume1
     end_pending /volume1
     wait_until request_is_done 0
-    ends_by_itself 1 pin
-    same '[null,"vanished"]' "$(answer '[.files[] | [.state,.reason]] | unique[]')"
+    ends_by_itself 3 pin
+    same '[null,null]' "$(answer '[.files[] | [.state,.reason]] | unique[]')"
+    same '["/volume1","is not mounted, or has no cache"]' "$(answer '.errors[0] | [.path,.text]')"
     mount "$(volume_loop 1)" /volume1
     exec 7<&-
     stop_service

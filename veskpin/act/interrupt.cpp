@@ -41,6 +41,7 @@ sigset_t AllSignals() {
 } // namespace
 
 void InterruptBegin() {
+    signal(SIGPIPE, SIG_IGN);
     signalNoted = 0;
     signalsNoted = 0;
     seenAt = 0;
@@ -62,6 +63,7 @@ int InterruptSignal() {
 
 void InterruptGrace(unsigned milliseconds) {
     grace = milliseconds;
+    seenAt = 0;
 }
 
 bool InterruptPause(unsigned milliseconds) {

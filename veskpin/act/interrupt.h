@@ -5,14 +5,15 @@
 #pragma once
 
 namespace vesk {
-// From here on they are noted, SIGHUP unless it is ignored, as by nohup.
+// From here on they are noted, SIGHUP unless it is ignored, as by nohup; and output that nobody
+// takes is an error of the one who writes it.
 void InterruptBegin();
 
 // The last that came, or 0.
 int InterruptSignal();
 
-// For what is not to be left half done: from here on a signal ends pauses only when it is so many
-// milliseconds old, and a second one at once. 0: as before.
+// For what is not to be left half done: a signal ends pauses only so many milliseconds after this
+// call, or after it came where that is later, and a second one at once. 0: at once.
 void InterruptGrace(unsigned milliseconds);
 
 // Sleeps for so long, or until one comes. False: one has come, and its grace is over.

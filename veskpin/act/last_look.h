@@ -5,7 +5,6 @@
 #pragma once
 
 #include "act/request_batch.h"
-#include "bitmap/bit_runs.h"
 
 #include <vector>
 
@@ -13,13 +12,12 @@ namespace vesk {
 struct LastLook {
     RequestBatch calm;              // as they were when they were looked at before
     std::vector<BatchFile> changed; // what something changes now, with its size and blocks
-    RequestBatch gone;              // no longer there, another file, or without blocks
+    RequestBatch gone;              // no longer there, or another file
+    RequestBatch empty;             // without blocks now
+    RequestBatch unreadable;        // whose blocks cannot be looked at now
 };
 
 LastLook LastLookAt(const RequestBatch &batch);
-
-// The number of blocks in the runs.
-uint64_t BlocksIn(const std::vector<BitRun> &runs);
 
 // Whether the service would find a cache that can pin on the volume now. It drops the records of a
 // volume without one.

@@ -14,10 +14,9 @@ namespace {
 const int64_t kReadAgainMs = 1000;
 
 bool IsStored(const RequestBatch &batch, const std::vector<StoredRequest> &requests) {
-    const std::string data = BatchStored(batch);
     return std::any_of(requests.begin(), requests.end(), [&](const StoredRequest &request) {
         return request.type == batch.type && request.mountPath == batch.mountPath &&
-               request.data == data;
+               BatchIsStoredAs(batch, request.data);
     });
 }
 } // namespace

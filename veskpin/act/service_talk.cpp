@@ -13,9 +13,16 @@ namespace vesk {
 namespace {
 const unsigned kPauseMs = 20;
 
+// By the folder that it is in: the document may not be there yet.
 std::string Resolved(const std::string &path) {
-    const MallocText real(realpath(path.c_str(), nullptr));
-    return real ? real.get() : path;
+    const size_t slash = path.rfind('/');
+    const std::string folder = slash == std::string::npos ? "." : path.substr(0, slash + 1);
+    const MallocText whole(realpath(path.c_str(), nullptr));
+    const MallocText real(whole ? nullptr : realpath(folder.c_str(), nullptr));
+    if (whole || !real) {
+        return whole ? whole.get() : path;
+    }
+    return std::string(real.get()) + "/" + path.substr(slash == std::string::npos ? 0 : slash + 1);
 }
 } // namespace
 
@@ -27,25 +34,51 @@ void ServiceTalk::Forget() {
     sleepsBefore_.reset();
 }
 
-// The watched service, or the first of this configuration that takes messages from here.
+// The watched service, or one to be watched from here on.
 std::optional<ServiceProcess> ServiceTalk::Find() {
+    if (!watched_) {
+        return FindNew();
+    }
+    int error = 0;
+    auto process = ServiceProcessAt(procFolder_, watched_->pid, &error);
+    isUnknown_ = !process && error != 0;
+    return process;
+}
+
+// Of this configuration, and taking messages from here. What has ended in part is taken only where
+// no other is: it may not have been ended wholly yet when the next one began.
+std::optional<ServiceProcess> ServiceTalk::FindNew() {
     int error = 0;
     isUnknown_ = false;
-    if (watched_) {
-        auto process = ServiceProcessAt(procFolder_, watched_->pid, &error);
-        isUnknown_ = !process && error != 0;
-        return process;
-    }
+    std::optional<ServiceProcess> found;
     for (ServiceProcess &process : ServiceProcessesFind(procFolder_, &error)) {
         isUnknown_ = isUnknown_ || !process.otherNamespaces || !process.config;
-        if (process.otherNamespaces && process.otherNamespaces->empty() && process.config &&
-            Resolved(*process.config) == configPath_) {
-            watched_ = {process.pid, process.threads.front().startTicks};
-            return std::move(process);
+        if (!process.otherNamespaces || !process.otherNamespaces->empty() || !process.config ||
+            Resolved(*process.config) != configPath_) {
+            continue;
+        }
+        const bool lives = ServiceThreadLives(process.threads.front()) &&
+                           ServiceWorkerLives(process, procFolder_) != false;
+        if (!found || lives) {
+            found = std::move(process);
+        }
+        if (lives) {
+            break;
         }
     }
-    isUnknown_ = isUnknown_ || error != 0;
-    return std::nullopt;
+    if (found) {
+        watched_ = {found->pid, found->threads.front().startTicks};
+    }
+    isUnknown_ = !found && (isUnknown_ || error != 0);
+    return found;
+}
+
+// A message is handed over, and its taker noted, before the one who sends it goes on.
+bool ServiceTalk::IsTakenByOthers() const {
+    MsgQueueState queue{};
+    const bool isFound = MsgQueueLook(kMessageKeyFile, &queue) == MsgQueueCause::Found;
+    LookLogTake("");
+    return isFound && queue.messages == 0 && queue.lastTaker != watched_->pid;
 }
 
 TalkState ServiceTalk::Look() {
@@ -67,6 +100,9 @@ TalkState ServiceTalk::Look() {
         return TalkState::Unknown;
     }
     const bool hasTaken = !sleepsBefore_ || *sleeps > *sleepsBefore_;
+    if (!hasTaken && IsTakenByOthers()) {
+        return TalkState::Taken;
+    }
     return worker && *receiver == ThreadLook::Waiting && hasTaken ? TalkState::Takes
                                                                   : TalkState::Busy;
 }
@@ -79,6 +115,7 @@ TalkEnd ServiceTalk::AwaitTurn(const Deadline &deadline) {
         case TalkState::Ended: return TalkEnd::Ended;
         case TalkState::Absent: return TalkEnd::Absent;
         case TalkState::Unknown: return TalkEnd::Unknown;
+        case TalkState::Taken: return TalkEnd::Taken;
         case TalkState::Busy: break;
         }
         if (!InterruptPause(kPauseMs)) {

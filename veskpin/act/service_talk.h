@@ -18,17 +18,30 @@ enum class TalkState {
     Busy,    // not yet
     Ended,   // the service that was watched, its receiver or its worker has ended
     Absent,  // no service of this configuration takes messages from here
+    Taken,   // somebody else has taken the request that was sent
     Unknown, // that cannot be told
 };
 
 // How a wait has ended.
-enum class TalkEnd { Done, Interrupted, TimeOver, Ended, Absent, Unknown, NotSent, NoCache };
+enum class TalkEnd {
+    Done,
+    Interrupted,
+    TimeOver,
+    Ended,
+    Absent,
+    Unknown,
+    NotSent,
+    NoCache,
+    BadConfig,
+    Taken
+};
 
 class ServiceTalk {
 public:
     explicit ServiceTalk(const std::string &configPath, const std::string &procFolder = "/proc");
 
-    // The first look finds the service, the later ones are about that one.
+    // The first look finds the service, one that lives wholly if there is one; the later ones are
+    // about that one.
     TalkState Look();
 
     // Waits until it takes a message. A service that has just begun is waited for.
@@ -45,6 +58,8 @@ public:
 
 private:
     std::optional<ServiceProcess> Find();
+    std::optional<ServiceProcess> FindNew();
+    bool IsTakenByOthers() const;
     struct Watched {
         pid_t pid;
         uint64_t startTicks;

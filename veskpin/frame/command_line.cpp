@@ -18,6 +18,8 @@ const char kDefaultConfig[] = "/var/lib/veskcachepinfiletool/pins.json";
 // What the options leave behind, beside the settings.
 struct Given {
     CommandLine line;
+    std::string name; // of the command
+    bool noWait = false;
     std::string color = "auto";
     std::string progress = "auto";
     std::string filesFrom;
@@ -27,7 +29,10 @@ CLI::App *AddCommand(CLI::App &app, Given &given, const char *name, const char *
                      Command command) {
     CLI::App *added = app.add_subcommand(name, about);
     added->fallthrough();
-    added->final_callback([&given, command] { given.line.command = command; });
+    added->final_callback([&given, command, name] {
+        given.line.command = command;
+        given.name = name;
+    });
     return added;
 }
 
@@ -48,7 +53,7 @@ void AddReserve(CLI::App *command, Given &given) {
 
 void AddChange(CLI::App *command, Given &given) {
     Settings &settings = given.line.settings;
-    command->add_flag("--no-wait{false}", settings.waits, "Do not wait for what becomes of it");
+    command->add_flag("--no-wait", given.noWait, "Do not wait for what becomes of it");
     command->add_option("--timeout", settings.timeoutSeconds, "How long to wait, in seconds")
         ->type_name("SECONDS");
 }
@@ -121,7 +126,7 @@ std::string FaultOf(Given &given) {
         return "the list of paths is empty";
     }
     if (settings.paths.empty() && NeedsPath(given.line.command)) {
-        return "a PATH is needed";
+        return given.name + " needs a PATH";
     }
     for (const std::string &path : settings.paths) {
         if (path.empty()) {
@@ -197,6 +202,7 @@ std::optional<CommandLine> CommandLineRead(int argc, char *argv[], TextSink &out
     if (given.line.settings.configPath.empty()) {
         given.line.settings.configPath = kDefaultConfig;
     }
+    given.line.settings.waits = !given.noWait;
     given.line.settings.color = WantsColor(given);
     given.line.settings.progress = ProgressFormOf(given.progress);
     return given.line;

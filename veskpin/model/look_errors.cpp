@@ -41,6 +41,14 @@ void LookUnknownAdd(LookErrors *errors, const std::string &path, const std::stri
     errors->isUnknown = true;
 }
 
+void LookErrorsAdd(LookErrors *errors, const LookErrors &others) {
+    for (const LookError &error : others.list) {
+        LookErrorAdd(errors, error.path, error.text);
+    }
+    errors->more += others.more;
+    errors->isUnknown = errors->isUnknown || others.isUnknown;
+}
+
 void LookLogBegin() {
     LogSetSink(KeepError);
 }

@@ -30,6 +30,9 @@ void LookErrorAdd(LookErrors *errors, const std::string &path, const std::string
 // The same for what makes the answer an unknown one.
 void LookUnknownAdd(LookErrors *errors, const std::string &path, const std::string &text);
 
+// Adds all of others.
+void LookErrorsAdd(LookErrors *errors, const LookErrors &others);
+
 // Takes the libraries' log from here on.
 void LookLogBegin();
 

@@ -138,11 +138,7 @@ const WorldVolume *WorldVolumeFind(const World &world, const std::string &mountP
 }
 
 void WorldVolumeUse(World &world, const WorldVolume &volume) {
-    for (const LookError &error : volume.errors.list) {
-        LookErrorAdd(&world.errors, error.path, error.text);
-    }
-    world.errors.more += volume.errors.more;
-    world.errors.isUnknown = world.errors.isUnknown || volume.errors.isUnknown;
+    LookErrorsAdd(&world.errors, volume.errors);
 }
 
 std::vector<const WorldVolume *> WorldVolumesWanted(World &world,

@@ -21,7 +21,7 @@ ProgressLine::ProgressLine(ProgressForm form, int fd)
     : form_(form), fd_(fd), start_(NowMs()), written_(start_) {}
 
 ProgressLine::~ProgressLine() {
-    if (hasLine_) {
+    if (hasWritten_ && form_ == ProgressForm::Line) {
         Put("\r\033[K");
     }
 }
@@ -38,11 +38,11 @@ bool ProgressLine::IsDue() const {
 
 void ProgressLine::Write(const std::string &text) {
     written_ = NowMs();
+    hasWritten_ = true;
     if (form_ == ProgressForm::Json) {
         Put(text + "\n");
     } else {
         Put("\r" + text + "\033[K");
-        hasLine_ = true;
     }
 }
 

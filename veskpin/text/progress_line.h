@@ -34,6 +34,8 @@ public:
     // Whether it is time for the next one.
     bool IsDue() const;
 
+    bool HasWritten() const { return hasWritten_; }
+
     // Writes it: a JSON object, or a text for people.
     void Write(const std::string &text);
 
@@ -43,6 +45,6 @@ private:
     const int fd_;
     const int64_t start_; // milliseconds of the monotonic clock
     int64_t written_;
-    bool hasLine_ = false;
+    bool hasWritten_ = false;
 };
 } // namespace vesk

@@ -7,14 +7,15 @@
 
 namespace vesk {
 namespace {
-const unsigned kBlockShift = 16; // a block is 64 KiB
+const unsigned kSectorShift = 9;
+const uint64_t kBlockSectors = 128; // of 64 KiB
 
 std::string NumberOrNull(const std::optional<uint64_t> &number) {
     return number ? std::to_string(*number) : "null";
 }
 
-std::optional<uint64_t> PerSecond(uint64_t blocks, int64_t elapsedMs) {
-    return elapsedMs > 0 ? std::optional(blocks * 1000 / static_cast<uint64_t>(elapsedMs))
+std::optional<uint64_t> PerSecond(uint64_t sectors, int64_t elapsedMs) {
+    return elapsedMs > 0 ? std::optional(sectors * 1000 / static_cast<uint64_t>(elapsedMs))
                          : std::nullopt;
 }
 
@@ -23,10 +24,16 @@ double ShareOf(uint64_t done, uint64_t all) {
 }
 } // namespace
 
-void WorkProgress::Done(uint64_t files, uint64_t blocks) {
+void WorkProgress::Done(uint64_t files, uint64_t sectors) {
     files_ += files;
-    blocks_ += blocks;
+    sectors_ += sectors;
     Tick();
+}
+
+void WorkProgress::End() {
+    if (line_.Form() == ProgressForm::Json && line_.HasWritten()) {
+        line_.Write(JsonText());
+    }
 }
 
 void WorkProgress::Tick() {
@@ -35,11 +42,11 @@ void WorkProgress::Tick() {
     }
 }
 
-// The part that is done. Files stand for the requests, which take a second each, blocks for what is
-// read: whichever is further behind tells more of the rest.
+// The part that is done. Files stand for the requests, which take a second each, sectors for what
+// is read: whichever is further behind tells more of the rest.
 double WorkProgress::Share() const {
     const double files = ShareOf(files_, work_.files);
-    return work_.blocks ? std::min(files, ShareOf(blocks_, *work_.blocks)) : files;
+    return work_.sectors ? std::min(files, ShareOf(sectors_, *work_.sectors)) : files;
 }
 
 std::optional<uint64_t> WorkProgress::SecondsLeft(int64_t elapsedMs) const {
@@ -57,22 +64,23 @@ std::optional<uint64_t> WorkProgress::SecondsLeft(int64_t elapsedMs) const {
 
 std::string WorkProgress::JsonText() const {
     const int64_t elapsed = line_.ElapsedMs();
+    const auto total = work_.sectors ? std::optional(*work_.sectors / kBlockSectors) : std::nullopt;
     return "{\"files\":" + std::to_string(files_) + ",\"total\":" + std::to_string(work_.files) +
-           ",\"blocks\":" + std::to_string(blocks_) +
-           ",\"blocksTotal\":" + NumberOrNull(work_.blocks) +
-           ",\"blocksPerSecond\":" + NumberOrNull(PerSecond(blocks_, elapsed)) +
+           ",\"blocks\":" + std::to_string(sectors_ / kBlockSectors) +
+           ",\"blocksTotal\":" + NumberOrNull(total) +
+           ",\"blocksPerSecond\":" + NumberOrNull(PerSecond(sectors_ / kBlockSectors, elapsed)) +
            ",\"secondsLeft\":" + NumberOrNull(SecondsLeft(elapsed)) +
            ",\"milliseconds\":" + std::to_string(elapsed) + "}";
 }
 
 std::string WorkProgress::LineText() const {
     const int64_t elapsed = line_.ElapsedMs();
-    const auto rate = PerSecond(blocks_, elapsed);
+    const auto rate = PerSecond(sectors_, elapsed);
     const auto left = SecondsLeft(elapsed);
     return std::to_string(files_) + " of " + UnitsOfThings(work_.files, "file") + ", " +
-           UnitsOfBytes(blocks_ << kBlockShift) +
-           (work_.blocks ? " of " + UnitsOfBytes(*work_.blocks << kBlockShift) : "") +
-           (rate ? ", " + UnitsOfBytes(*rate << kBlockShift) + "/s" : "") +
+           UnitsOfBytes(sectors_ << kSectorShift) +
+           (work_.sectors ? " of " + UnitsOfBytes(*work_.sectors << kSectorShift) : "") +
+           (rate ? ", " + UnitsOfBytes(*rate << kSectorShift) + "/s" : "") +
            (left ? ", " + UnitsOfSeconds(*left) + " left" : "");
 }
 } // namespace vesk

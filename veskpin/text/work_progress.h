@@ -14,7 +14,7 @@
 namespace vesk {
 struct Work {
     uint64_t files = 0;
-    std::optional<uint64_t> blocks;  // of 64 KiB; absent: not known
+    std::optional<uint64_t> sectors; // that they have on the device; absent: not known
     std::optional<uint64_t> seconds; // that all will take
 };
 
@@ -23,8 +23,14 @@ public:
     // Writes to this descriptor, which stays the caller's.
     WorkProgress(ProgressForm form, const Work &work, int fd = 2) : line_(form, fd), work_(work) {}
 
-    // So many files, with so many blocks together, have come to rest.
-    void Done(uint64_t files, uint64_t blocks);
+    // More files have turned up.
+    void More(uint64_t files) { work_.files += files; }
+
+    // So many files, with so many sectors together, have come to rest.
+    void Done(uint64_t files, uint64_t sectors);
+
+    // Tells it once more to programs that were told.
+    void End();
 
     // Tells it when it is time to; for whoever waits, now and then.
     void Tick();
@@ -35,8 +41,8 @@ private:
     std::string JsonText() const;
     std::string LineText() const;
     ProgressLine line_;
-    const Work work_;
+    Work work_;
     uint64_t files_ = 0;
-    uint64_t blocks_ = 0;
+    uint64_t sectors_ = 0;
 };
 } // namespace vesk

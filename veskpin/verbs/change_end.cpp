@@ -23,6 +23,9 @@ const char *TextOf(TalkEnd end) {
     case TalkEnd::Unknown: return "whether the service takes requests cannot be told";
     case TalkEnd::NoCache:
         return "the volume is gone or has no cache that can pin: the service would drop its records";
+    case TalkEnd::BadConfig:
+        return "the configuration is not as it should be: a request would end the service";
+    case TalkEnd::Taken: return "somebody else takes messages from the service's queue";
     case TalkEnd::NotSent: break;
     }
     return "the request cannot be sent";
@@ -51,6 +54,21 @@ ExitStatus ChangeLockStatus(const ChangeLock &lock, ChangeView &view) {
     return status;
 }
 
+ExitStatus ChangeEndUnsent(int keepError, ChangeView &view, LookErrors &errors) {
+    ExitStatus status = ExitStatus::Service;
+    if (InterruptSignal() != 0) {
+        LookErrorAdd(&errors, "", "ended by a signal; nothing was sent");
+        status = InterruptStatus();
+    } else if (keepError != 0) {
+        LookErrorAdd(&errors, "", std::string("the files cannot be kept: ") + strerror(keepError));
+        status = ExitStatus::Unknown;
+    } else {
+        LookErrorAdd(&errors, "", "the time is over; nothing was sent");
+    }
+    view.End(0, {}, errors);
+    return status;
+}
+
 void ChangeNoteEnd(const ChangeRun &run, LookErrors *errors) {
     const char *text = TextOf(run.End());
     if (text != nullptr) {
@@ -67,7 +85,8 @@ ExitStatus ChangeStatus(std::initializer_list<const ChangeRun *> runs, ExitStatu
     bool isUnknown = false;
     for (const ChangeRun *run : runs) {
         const TalkEnd end = run->End();
-        const bool isUnsure = end == TalkEnd::Unknown || end == TalkEnd::NoCache;
+        const bool isUnsure =
+            end == TalkEnd::Unknown || end == TalkEnd::NoCache || end == TalkEnd::BadConfig;
         if (run->HasServiceEnded() || (end != TalkEnd::Done && !isUnsure)) {
             return ExitStatus::Service;
         }

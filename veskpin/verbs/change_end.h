@@ -14,6 +14,10 @@ ChangeLock ChangeBegin(const Deadline &deadline);
 // Ends the answer where the lock cannot be had.
 ExitStatus ChangeLockStatus(const ChangeLock &lock, ChangeView &view);
 
+// Ends the answer where nothing was sent since a signal came, the time is over, or, with this
+// errno, the files could not be kept.
+ExitStatus ChangeEndUnsent(int keepError, ChangeView &view, LookErrors &errors);
+
 // Adds to the errors why not everything was carried out.
 void ChangeNoteEnd(const ChangeRun &run, LookErrors *errors);
 

@@ -1,48 +1,93 @@
 #include "verbs/change_outcome.h"
 
 #include "model/world.h"
-#include "verbs/list.h"
+#include "verbs/volume_lister.h"
 
-#include <map>
-#include <vector>
+#include <algorithm>
+#include <cerrno>
 
 namespace vesk {
 namespace {
-struct Seen {
-    std::optional<FileState> state;
-    bool isThere = false; // there is a file or a record of it
-};
+// Whether it is what was asked for, or is on the way to it.
+bool IsDone(bool isPin, FileState state) {
+    return isPin ? state == FileState::Pinned || state == FileState::Marked ||
+                       state == FileState::Pinning
+                 : state == FileState::Unpinned || state == FileState::Unpinning;
+}
 
-std::optional<ChangeReason> ReasonOf(const RequestBatch &batch, const Seen &seen) {
+// Nothing, or another file, is at its path.
+bool IsGone(FileLooker &looker, const BatchFile &file) {
+    FileStat status{};
+    const int error = looker.Stat(file.relativePath, &status);
+    return error == ENOENT || error == ENOTDIR ||
+           (error == 0 && static_cast<uint32_t>(status.inode) != file.inode);
+}
+
+std::optional<ChangeReason> ReasonOf(const RequestBatch &batch, const BatchFile &file,
+                                     FileLooker &looker, FileState state,
+                                     const FileFigures &figures) {
     const bool isPin = batch.type == kRequestPinFiles;
-    if (!seen.isThere || seen.state == FileState::Missing || seen.state == FileState::Replaced) {
+    if (IsDone(isPin, state)) {
+        return std::nullopt;
+    }
+    if (!isPin && (state == FileState::Missing || state == FileState::Replaced)) {
+        return ChangeReason::NeedsRepair; // an older record of the path, which no request undoes
+    }
+    if (IsGone(looker, file)) {
         return isPin ? ChangeReason::Vanished : ChangeReason::NeedsRepair;
     }
-    const bool isDone =
-        isPin ? seen.state != FileState::Unpinned
-              : seen.state == FileState::Unpinned || seen.state == FileState::Unpinning;
-    if (isDone) {
+    // More than was sent for cannot be marked.
+    const bool hasGrown = state == FileState::Partial && figures.blocks > file.blocks;
+    if (batch.isSettled || (isPin && hasGrown)) {
         return std::nullopt;
     }
     return batch.mayBeLost ? ChangeReason::NotTaken : ChangeReason::Dropped;
 }
+
+void TellBatch(World &world, const RequestBatch &batch, std::optional<ChangeReason> reason,
+               const ChangeTeller &tell) {
+    const WorldVolume *volume = WorldVolumeFind(world, batch.mountPath);
+    if (volume == nullptr) {
+        // It has no records any more, and is not mounted or has no cache.
+        LookUnknownAdd(&world.errors, batch.mountPath, "is not mounted, or has no cache");
+        const auto &others = world.withoutCache;
+        const bool isSure =
+            world.areVolumesKnown && world.isConfigKnown &&
+            std::find(others.begin(), others.end(), batch.mountPath) != others.end();
+        for (const BatchFile &file : batch.files) {
+            const auto dropped = batch.type == kRequestPinFiles
+                                     ? std::optional(ChangeReason::Dropped)
+                                     : std::nullopt;
+            tell({VolumePath(batch.mountPath, file.relativePath),
+                  isSure ? std::optional(FileState::Unpinned) : std::nullopt,
+                  reason   ? reason
+                  : isSure ? dropped
+                           : std::nullopt});
+        }
+        return;
+    }
+    FileLooker looker(batch.mountPath);
+    const BatchFile *current = nullptr;
+    const VolumeLister::Visit visit = [&](const ListedFile &file) {
+        const auto why = reason || !file.state
+                             ? reason
+                             : ReasonOf(batch, *current, looker, *file.state, file.figures);
+        tell({file.path, file.state, why});
+    };
+    VolumeLister lister(*volume, std::nullopt, world, visit);
+    for (const BatchFile &file : batch.files) {
+        current = &file;
+        lister.ListAsked(file.relativePath);
+    }
+}
 } // namespace
 
-void OutcomeTell(const std::string &configPath, const RequestBatch &batch,
-                 std::optional<ChangeReason> reason, const ChangeTeller &tell) {
+void OutcomeTell(const std::string &configPath, const std::vector<RequestBatch> &batches,
+                 std::optional<ChangeReason> reason, const ChangeTeller &tell, LookErrors *errors) {
     World world = WorldLook(configPath);
-    std::vector<std::string> paths;
-    paths.reserve(batch.files.size());
-    for (const BatchFile &file : batch.files) {
-        paths.push_back(VolumePath(batch.mountPath, file.relativePath));
+    for (const RequestBatch &batch : batches) {
+        TellBatch(world, batch, reason, tell);
     }
-    std::map<std::string, Seen> files;
-    ListLook(world, paths, std::nullopt, [&](const ListedFile &file) {
-        files[file.path] = {file.state, true};
-    });
-    for (const std::string &path : paths) {
-        const Seen seen = files[path];
-        tell({path, seen.state, reason ? reason : ReasonOf(batch, seen)});
-    }
+    LookErrorsAdd(errors, world.errors);
 }
 } // namespace vesk

@@ -1,4 +1,4 @@
-// What has become of the files of a request. Thread rule: no state.
+// What has become of the files of requests. Thread rule: no state.
 #pragma once
 
 #include "act/request_batch.h"
@@ -7,12 +7,14 @@
 #include <functional>
 #include <optional>
 #include <string>
+#include <vector>
 
 namespace vesk {
 using ChangeTeller = std::function<void(const ChangedFile &)>;
 
-// Tells each file with its state now, as `list` has it, and why it is not what the request was for:
-// the reason given, or else the one that follows from its state.
-void OutcomeTell(const std::string &configPath, const RequestBatch &batch,
-                 std::optional<ChangeReason> reason, const ChangeTeller &tell);
+// Tells each file with its state now, as `list` has it, and why it is not what its request was for:
+// the reason given, or else the one that follows from its state. What cannot be looked at becomes
+// an error.
+void OutcomeTell(const std::string &configPath, const std::vector<RequestBatch> &batches,
+                 std::optional<ChangeReason> reason, const ChangeTeller &tell, LookErrors *errors);
 } // namespace vesk

@@ -3,47 +3,69 @@
 #include "act/interrupt.h"
 #include "act/last_look.h"
 #include "base/clock.h"
+#include "config/config_records.h"
+#include "model/look_errors.h"
 #include "model/volume_look.h"
 
 #include <utility>
 
 namespace vesk {
 namespace {
-const size_t kStoredMost = 2; // so that the service never waits for the next one
+const size_t kSettledMost = 4096; // told together, by one look
+const size_t kStoredMost = 2;     // so that the service never waits for the next one
 const unsigned kPauseMs = 50;
 // How long the next service is waited for where no time was given.
 const int64_t kRestartMs = 1500;
 } // namespace
 
 ChangeRun::ChangeRun(const Settings &settings, RequestType type, ChangePace pace,
-                     const Deadline &deadline, WorkProgress &progress, ChangeHooks hooks)
+                     const Deadline &deadline, WorkProgress &progress, LookErrors &errors,
+                     ChangeHooks hooks)
     : configPath_(settings.configPath), waits_(settings.waits),
       hasTimeout_(settings.timeoutSeconds.has_value()), type_(type),
       pace_(settings.waits ? pace : ChangePace::AtOnce), deadline_(deadline), progress_(progress),
-      hooks_(std::move(hooks)), talk_(configPath_), watch_(configPath_), open_(EmptyBatch("")) {}
+      errors_(errors), hooks_(std::move(hooks)), talk_(configPath_), watch_(configPath_),
+      open_(EmptyBatch("")), settled_(EmptyBatch("")) {}
 
-void ChangeRun::Add(const std::string &mountPath, const std::string &relativePath,
-                    const FileLook &look, std::optional<FileState> state) {
-    const std::string path = VolumePath(mountPath, relativePath);
-    const auto inode = static_cast<uint32_t>(look.status.inode);
-    if (RequestPathCheck(mountPath, path, inode) != RequestPathFault::None) {
+bool ChangeRun::Add(const std::string &mountPath, const BatchFile &file) {
+    const std::string path = VolumePath(mountPath, file.relativePath);
+    if (RequestPathCheck(mountPath, path, file.inode) != RequestPathFault::None) {
         // Only records can name such a path: as part of a request it would be another file's.
+        const bool isPin = type_ == kRequestPinFiles;
         hooks_.tell(
-            {path, state,
-             type_ == kRequestPinFiles ? ChangeReason::NotTaken : ChangeReason::NeedsRepair});
-        return;
+            {path, std::nullopt, isPin ? ChangeReason::NotTaken : ChangeReason::NeedsRepair});
+        return true;
     }
     if (end_ != TalkEnd::Done) {
-        hooks_.tell({path, state, ChangeReason::NotTaken});
-        return;
+        return false;
     }
-    const BatchFile file{relativePath, inode, look.status.bytes, BlocksIn(look.blocks)};
     if (open_.mountPath == mountPath && BatchAdd(&open_, file)) {
-        return;
+        return true;
     }
     Flush();
+    if (end_ != TalkEnd::Done) {
+        return false;
+    }
     open_.mountPath = mountPath;
     BatchAdd(&open_, file); // an empty one has room for every path that can be named
+    return true;
+}
+
+void ChangeRun::AddSettled(const std::string &mountPath, const BatchFile &file) {
+    if (settled_.mountPath != mountPath || settled_.files.size() >= kSettledMost) {
+        TellSettled();
+        settled_.mountPath = mountPath;
+    }
+    settled_.files.push_back(file);
+}
+
+void ChangeRun::TellSettled() {
+    if (settled_.files.empty()) {
+        return;
+    }
+    settled_.isSettled = true;
+    OutcomeTell(configPath_, {settled_}, std::nullopt, hooks_.tell, &errors_);
+    settled_ = EmptyBatch("");
 }
 
 void ChangeRun::Flush() {
@@ -67,29 +89,48 @@ void ChangeRun::Finish() {
     if (waits_ && end_ == TalkEnd::Done) {
         AwaitRoom(0);
     }
-    for (const RequestBatch &batch : watch_.TakeAll()) {
-        Tell(batch, waits_ ? std::optional(ChangeReason::NotTaken) : std::nullopt);
+    TellSettled();
+    Tell(watch_.TakeAll(), waits_ ? std::optional(ChangeReason::NotTaken) : std::nullopt);
+    progress_.End();
+}
+
+// What the service would end by, or drop records for, is not sent.
+bool ChangeRun::MaySendTo(const std::string &mountPath) {
+    ConfigRecords records;
+    const bool isRead = ConfigReadRecords(configPath_.c_str(), &records) == 0;
+    LookLogTake("");
+    if (!isRead || !records.areVolumesKnown || !records.areRequestsKnown) {
+        end_ = TalkEnd::BadConfig;
+    } else if (!VolumeCanPin(mountPath)) {
+        end_ = TalkEnd::NoCache;
+    }
+    return end_ == TalkEnd::Done;
+}
+
+void ChangeRun::Skip(const RequestBatch &batch, SkipReason reason) {
+    for (const BatchFile &file : batch.files) {
+        const std::string path = VolumePath(batch.mountPath, file.relativePath);
+        hooks_.skip ? hooks_.skip(path, reason)
+                    : hooks_.tell({path, std::nullopt, ChangeReason::NeedsRepair});
+        progress_.Done(1, file.sectors);
     }
 }
 
 // Files that have changed since they were looked at are given to `changed`, or sent where that is
 // null.
 void ChangeRun::Send(const RequestBatch &batch, std::vector<BatchFile> *changed) {
-    bool hasTurn = end_ == TalkEnd::Done &&
-                   (pace_ == ChangePace::AtOnce || AwaitRoom(kStoredMost - 1)) && AwaitTurn();
-    if (hasTurn && !VolumeCanPin(batch.mountPath)) {
-        end_ = TalkEnd::NoCache;
-        hasTurn = false;
-    }
-    if (!hasTurn) {
-        Tell(batch, ChangeReason::NotTaken);
+    const bool maySend = end_ == TalkEnd::Done &&
+                         (pace_ == ChangePace::AtOnce || AwaitRoom(kStoredMost - 1)) &&
+                         AwaitTurn() && MaySendTo(batch.mountPath);
+    if (!maySend) {
+        Tell({batch}, ChangeReason::NotTaken);
         return;
     }
     LastLook last = LastLookAt(batch);
-    if (!last.gone.files.empty()) {
-        Tell(last.gone,
-             type_ == kRequestPinFiles ? ChangeReason::Vanished : ChangeReason::NeedsRepair);
-    }
+    Tell({last.gone},
+         type_ == kRequestPinFiles ? ChangeReason::Vanished : ChangeReason::NeedsRepair);
+    Skip(last.empty, SkipReason::NoBlocks);
+    Skip(last.unreadable, SkipReason::Unreadable);
     if (changed != nullptr) {
         *changed = std::move(last.changed);
     } else {
@@ -109,7 +150,7 @@ void ChangeRun::SendNow(RequestBatch batch) {
     }
     if (sent != TalkEnd::Done) {
         end_ = end_ == TalkEnd::Done ? sent : end_;
-        Tell(batch, ChangeReason::NotTaken);
+        Tell({batch}, ChangeReason::NotTaken);
         return;
     }
     ++sent_;
@@ -127,7 +168,7 @@ void ChangeRun::SendNow(RequestBatch batch) {
         return;
     }
     end_ = taken;
-    Tell(batch, ChangeReason::NotTaken);
+    Tell({batch}, ChangeReason::NotTaken);
 }
 
 // Until the service takes a message. False: never again.
@@ -150,9 +191,7 @@ bool ChangeRun::AwaitTurn() {
 // Until at most so many requests are stored. False: never again.
 bool ChangeRun::AwaitRoom(size_t most) {
     for (;;) {
-        for (const RequestBatch &batch : watch_.TakeFinished()) {
-            Tell(batch, std::nullopt);
-        }
+        Tell(watch_.TakeFinished(), std::nullopt);
         if (watch_.Waiting().size() <= most) {
             return true;
         }
@@ -200,12 +239,18 @@ bool ChangeRun::AwaitRestart() {
     }
 }
 
-void ChangeRun::Tell(const RequestBatch &batch, std::optional<ChangeReason> reason) {
-    uint64_t blocks = 0;
-    for (const BatchFile &file : batch.files) {
-        blocks += file.blocks;
+void ChangeRun::Tell(const std::vector<RequestBatch> &batches, std::optional<ChangeReason> reason) {
+    uint64_t files = 0;
+    uint64_t sectors = 0;
+    for (const RequestBatch &batch : batches) {
+        files += batch.files.size();
+        for (const BatchFile &file : batch.files) {
+            sectors += file.sectors;
+        }
     }
-    OutcomeTell(configPath_, batch, reason, hooks_.tell);
-    progress_.Done(batch.files.size(), blocks);
+    if (files > 0) {
+        OutcomeTell(configPath_, batches, reason, hooks_.tell, &errors_);
+        progress_.Done(files, sectors);
+    }
 }
 } // namespace vesk

@@ -19,7 +19,9 @@
 
 namespace vesk {
 struct ChangeHooks {
-    ChangeTeller tell;                              // each file once, when it has come to rest
+    ChangeTeller tell; // each file once, when it has come to rest
+    // What cannot be pinned after all. Where it is empty such a file is told.
+    std::function<void(const std::string &path, SkipReason reason)> skip;
     std::function<void(const RequestBatch &)> sent; // each request; may be empty
 };
 
@@ -30,14 +32,16 @@ enum class ChangePace {
 
 class ChangeRun {
 public:
-    // `deadline` and `progress` outlive it.
+    // `deadline`, `progress` and `errors` outlive it.
     ChangeRun(const Settings &settings, RequestType type, ChangePace pace, const Deadline &deadline,
-              WorkProgress &progress, ChangeHooks hooks);
+              WorkProgress &progress, LookErrors &errors, ChangeHooks hooks);
 
-    // A file to be sent, as it was looked at, with its state now. Sends a request when one is full.
-    // What cannot be sent any more is told at once.
-    void Add(const std::string &mountPath, const std::string &relativePath, const FileLook &look,
-             std::optional<FileState> state);
+    // A file to be sent, as it was looked at. Sends a request when one is full. False, with nothing
+    // done: nothing is sent any more.
+    bool Add(const std::string &mountPath, const BatchFile &file);
+
+    // A file that is as asked already. It is told when many are there, or at the end.
+    void AddSettled(const std::string &mountPath, const BatchFile &file);
 
     // Sends what is left.
     void Flush();
@@ -56,11 +60,14 @@ private:
         return {mountPath, type_, {}, {}};
     }
     void Send(const RequestBatch &batch, std::vector<BatchFile> *changed);
+    bool MaySendTo(const std::string &mountPath);
+    void Skip(const RequestBatch &batch, SkipReason reason);
     void SendNow(RequestBatch batch);
     bool AwaitTurn();
     bool AwaitRoom(size_t most);
     bool AwaitRestart();
-    void Tell(const RequestBatch &batch, std::optional<ChangeReason> reason);
+    void Tell(const std::vector<RequestBatch> &batches, std::optional<ChangeReason> reason);
+    void TellSettled();
 
     const std::string configPath_;
     const bool waits_;
@@ -69,10 +76,12 @@ private:
     const ChangePace pace_;
     const Deadline &deadline_;
     WorkProgress &progress_;
+    LookErrors &errors_;
     const ChangeHooks hooks_;
     ServiceTalk talk_;
     RequestWatch watch_;
     RequestBatch open_; // that is being filled
+    RequestBatch settled_;
     uint64_t sent_ = 0;
     TalkEnd end_ = TalkEnd::Done;  // anything else: nothing is sent any more
     bool hasServiceEnded_ = false; // one did; the next was waited for

@@ -27,7 +27,7 @@ ChangeView::ChangeView(const char *command, FileState wanted, std::optional<File
 
 void ChangeView::Skip(const std::string &path, SkipReason reason) {
     BeginSkipped();
-    ++skipped_;
+    ++skipped_[reason];
     if (!json_) {
         out_.Put("left out  " + TextEscaped(path) + ": " + SkipReasonText(reason) + "\n");
         return;
@@ -67,6 +67,18 @@ void ChangeView::Put(const ChangedFile &file) {
     writer_.EndObject();
 }
 
+// "3 left out (2 name, 1 no-blocks)".
+std::string ChangeView::SkippedText() const {
+    std::string reasons;
+    uint64_t count = 0;
+    for (const auto &[reason, files] : skipped_) {
+        count += files;
+        reasons +=
+            (reasons.empty() ? " (" : ", ") + std::to_string(files) + " " + SkipReasonText(reason);
+    }
+    return std::to_string(count) + " left out" + reasons + (reasons.empty() ? "" : ")");
+}
+
 void ChangeView::End(uint64_t requestsSent, const std::vector<std::string> &repinned,
                      const LookErrors &errors) {
     BeginSkipped();
@@ -83,11 +95,12 @@ void ChangeView::End(uint64_t requestsSent, const std::vector<std::string> &repi
     }
     const std::string also = underway_ ? std::string(" or ") + FileStateText(*underway_) : "";
     out_.Put(UnitsOfThings(asAsked_, "file") + " " + FileStateText(wanted_) + also + ", " +
-             std::to_string(others_) + " not, " + std::to_string(skipped_) + " left out, in " +
-             UnitsOfThings(requestsSent, "request") + "\n");
-    for (const std::string &path : repinned) {
-        out_.Put("pinned again  " + TextEscaped(path) + "\n");
-    }
+             std::to_string(others_) + " not, " + SkippedText() + ", in " +
+             UnitsOfThings(requestsSent, "request") +
+             (repinned.empty()
+                  ? ""
+                  : "; " + UnitsOfThings(repinned.size(), "neighbour") + " pinned again") +
+             "\n");
     AnswerErrors(errors);
 }
 } // namespace vesk

@@ -9,6 +9,7 @@
 #include "json/json_text.h"
 
 #include <cstdint>
+#include <map>
 #include <optional>
 #include <string>
 #include <vector>
@@ -44,10 +45,11 @@ public:
     void End(uint64_t requestsSent, const std::vector<std::string> &repinned,
              const LookErrors &errors);
 
-    bool IsAllAsAsked() const { return others_ == 0 && skipped_ == 0; }
+    bool IsAllAsAsked() const { return others_ == 0 && skipped_.empty(); }
 
 private:
     void BeginSkipped();
+    std::string SkippedText() const;
     const FileState wanted_;
     const std::optional<FileState> underway_;
     TextSink &out_;
@@ -57,6 +59,6 @@ private:
     bool hasSkipped_ = false; // the list has begun
     uint64_t asAsked_ = 0;
     uint64_t others_ = 0;
-    uint64_t skipped_ = 0;
+    std::map<SkipReason, uint64_t> skipped_; // files
 };
 } // namespace vesk

@@ -12,6 +12,13 @@ bool HasAny(const BlockSet &set, const std::vector<BitRun> &runs) {
                        [&](const BitRun &run) { return BlockSetCountIn(set, run) > 0; });
 }
 
+// Whether the file that is there is recorded, or will be by a request that comes before.
+bool IsToStay(const KnownFile &file, const FileLook &look) {
+    const auto inode = static_cast<uint32_t>(look.status.inode);
+    return file.inode == inode ||
+           (file.stored == kRequestPinFiles && file.storedInode.value_or(inode) == inode);
+}
+
 bool IsGone(int error) {
     return error == ENOENT || error == ENOTDIR;
 }
@@ -48,31 +55,34 @@ void Neighbours::Send(const std::string &configPath, ChangeRun &run) {
             SendOf(*volume, letGo, run);
         }
     }
-    for (const LookError &error : world.errors.list) {
-        LookErrorAdd(&errors_, error.path, error.text);
-    }
-    errors_.isUnknown = errors_.isUnknown || world.errors.isUnknown;
+    LookErrorsAdd(&errors_, world.errors);
 }
 
 void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run) {
     const Volume &volume = world.volume;
+    std::vector<BatchFile> neighbours;
     FileLooker looker(volume.mountPath);
     for (const KnownFile &file : world.known.files) {
         // One that is being let go by another request stays let go.
-        if (!file.inode || file.stored == kRequestUnpinFiles ||
-            letGo.inodes.count(*file.inode) > 0) {
+        if (file.stored == kRequestUnpinFiles ||
+            (file.inode && letGo.inodes.count(*file.inode) > 0)) {
             continue;
         }
         const FileLook &look = looker.Look(file.relativePath);
-        const bool isItself =
-            look.error == 0 && static_cast<uint32_t>(look.status.inode) == *file.inode;
+        const bool isItself = look.error == 0 && IsToStay(file, look) &&
+                              letGo.inodes.count(static_cast<uint32_t>(look.status.inode)) == 0;
         if ((look.error != 0 && !IsGone(look.error)) || (isItself && !look.hasExtents)) {
             LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
                            "whether it has lost blocks cannot be told");
         } else if (isItself && HasAny(letGo.blocks, look.blocks)) {
-            run.Add(volume.mountPath, file.relativePath, look,
-                    FileStateOf(&file, look, FileFiguresOf(look, volume), volume));
+            neighbours.push_back(BatchFileOf(file.relativePath, look));
         }
     }
+    for (const BatchFile &file : neighbours) {
+        if (!run.Add(volume.mountPath, file)) {
+            unsent_.push_back(VolumePath(volume.mountPath, file.relativePath));
+        }
+    }
+    count_ += neighbours.size();
 }
 } // namespace vesk

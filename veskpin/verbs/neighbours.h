@@ -12,6 +12,7 @@
 #include <map>
 #include <string>
 #include <unordered_set>
+#include <vector>
 
 namespace vesk {
 class Neighbours {
@@ -25,6 +26,10 @@ public:
     // Sends the recorded files that share blocks with those, as they are now, to be pinned again.
     void Send(const std::string &configPath, ChangeRun &run);
 
+    uint64_t Count() const { return count_; }
+    // Absolute paths of those that could not be sent any more.
+    const std::vector<std::string> &Unsent() const { return unsent_; }
+
 private:
     struct LetGo {
         BlockSet blocks;
@@ -32,6 +37,8 @@ private:
     };
     void SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run);
     LookErrors &errors_;
+    uint64_t count_ = 0;
+    std::vector<std::string> unsent_;
     std::map<std::string, LetGo> volumes_; // by mount path
 };
 } // namespace vesk

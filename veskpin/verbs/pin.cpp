@@ -1,8 +1,8 @@
 #include "act/interrupt.h"
-#include "base/clock.h"
 #include "bitmap/pin_bitmap.h"
 #include "text/units.h"
 #include "verbs/change_end.h"
+#include "verbs/change_queue.h"
 #include "verbs/plan.h"
 #include "verbs/verbs.h"
 
@@ -11,9 +11,6 @@
 
 namespace vesk {
 namespace {
-// After a signal the files that were not reached are told as such for so long.
-const int64_t kTellMs = 1000;
-
 // What keeps the whole call from being sent.
 void NoteWhatDoesNotFit(const Plan &plan, LookErrors *errors) {
     for (const PlannedVolume &volume : plan.volumes) {
@@ -39,13 +36,13 @@ Work WorkOf(const Plan &plan) {
     Work work{0, 0, 0};
     for (const PlannedVolume &volume : plan.volumes) {
         work.files += volume.figures.filesToSend;
-        *work.blocks += volume.figures.blocksToSend;
+        *work.sectors += volume.figures.sectorsToSend;
         *work.seconds += volume.figures.seconds;
     }
     return work;
 }
 
-// One call: the files are looked at twice, first for what they cost together, then each to be sent.
+// One call: all files are looked at and kept before the first is sent.
 class PinCall {
 public:
     PinCall(const Settings &settings, const Deadline &deadline, TextSink &out)
@@ -53,75 +50,62 @@ public:
           view_("pin", FileState::Pinned, FileState::Pinning, settings, out) {}
 
     ExitStatus Carry() {
-        const Plan whole = LookAtAll();
-        if (InterruptSignal() != 0) {
-            LookErrorAdd(&world_.errors, "", "ended by a signal; nothing was sent");
-            view_.End(0, {}, world_.errors);
-            return ChangeStatus({}, ExitStatus::Done);
+        Plan plan = LookAtAll();
+        if (InterruptSignal() != 0 || deadline_.IsOver() || queue_.Error() != 0) {
+            return ChangeEndUnsent(queue_.Error(), view_, world_.errors);
         }
-        isRefused_ = !settings_.force && !Fits(whole);
-        if (isRefused_) {
-            NoteWhatDoesNotFit(whole, &world_.errors);
+        queue_.Close();
+        if (!settings_.force && !Fits(plan)) {
+            NoteWhatDoesNotFit(plan, &world_.errors);
+            queue_.SkipAll(SkipReason::NoRoom, view_);
+            End(plan, 0);
+            return ExitStatusOf(world_.errors.isUnknown || plan.isAllFailed, false);
         }
-        WorkProgress progress(isRefused_ ? ProgressForm::None : settings_.progress, WorkOf(whole));
+        WorkProgress progress(settings_.progress, WorkOf(plan));
         ChangeRun run(settings_, kRequestPinFiles, ChangePace::Steady, deadline_, progress,
-                      {[this](const ChangedFile &file) { view_.Put(file); }, {}});
-        const Plan each = SendEach(run);
+                      world_.errors,
+                      {[this](const ChangedFile &file) { view_.Put(file); },
+                       [&](const std::string &path, SkipReason reason) {
+                           plan.skipped.push_back({path, reason});
+                       },
+                       {}});
+        queue_.SendAll(run, view_);
         run.Finish();
-        for (const SkippedPath &skipped : each.skipped) {
-            view_.Skip(skipped.path, skipped.reason);
-        }
+        queue_.TellRest({}, view_, &world_.errors);
         ChangeNoteEnd(run, &world_.errors);
-        view_.End(run.RequestsSent(), {}, world_.errors);
-        return ChangeStatus({&run}, ExitStatusOf(world_.errors.isUnknown || each.isAllFailed,
-                                                 view_.IsAllAsAsked()));
+        End(plan, run.RequestsSent());
+        const bool isUnknown = world_.errors.isUnknown || plan.isAllFailed;
+        return ChangeStatus({&run}, ExitStatusOf(isUnknown, view_.IsAllAsAsked()));
     }
 
 private:
     Plan LookAtAll() {
         Progress progress(settings_.progress, 0);
+        const PlanVisit keep = [this](const WorldVolume &volume, const std::string &relativePath,
+                                      const FileLook &look, std::optional<FileState> state) {
+            const bool isUnderway = state == FileState::Pinning && !settings_.waits;
+            // The service would drop the records of a volume that cannot be pinned to.
+            const auto action = state == FileState::Pinned || isUnderway ? QueueAction::TellOnly
+                                : volume.volume.supportsPin == true      ? QueueAction::Send
+                                                                         : QueueAction::CannotSend;
+            queue_.Put(volume.volume.mountPath, relativePath, look, state, action);
+        };
         return PlanLook(world_, settings_.paths, settings_.reservePercent, progress,
-                        {{}, [] { return InterruptSignal() == 0; }});
+                        {keep, [this] { return InterruptSignal() == 0 && !deadline_.IsOver(); }});
     }
 
-    Plan SendEach(ChangeRun &run) {
-        Progress quiet(ProgressForm::None, 0);
-        Plan plan;
-        std::vector<SkippedPath> refused;
-        const PlanVisit visit = [&](const WorldVolume &volume, const std::string &relativePath,
-                                    const FileLook &look, std::optional<FileState> state) {
-            const std::string &mountPath = volume.volume.mountPath;
-            const std::string path = VolumePath(mountPath, relativePath);
-            if (isRefused_) {
-                refused.push_back({path, SkipReason::NoRoom});
-            } else if (state == FileState::Pinned ||
-                       (state == FileState::Pinning && !settings_.waits)) {
-                view_.Put({path, state, std::nullopt});
-            } else if (volume.volume.supportsPin != true) {
-                // The service would drop the volume's records.
-                view_.Put({path, state, ChangeReason::NotTaken});
-            } else {
-                run.Add(mountPath, relativePath, look, state);
-            }
-        };
-        std::optional<int64_t> signalSeen;
-        plan = PlanLook(world_, settings_.paths, settings_.reservePercent, quiet,
-                        {visit, [&] {
-                             if (InterruptSignal() == 0) {
-                                 return true;
-                             }
-                             signalSeen = signalSeen.value_or(NowMs());
-                             return NowMs() - *signalSeen < kTellMs;
-                         }});
-        plan.skipped.insert(plan.skipped.end(), refused.begin(), refused.end());
-        return plan;
+    void End(const Plan &plan, uint64_t requestsSent) {
+        for (const SkippedPath &skipped : plan.skipped) {
+            view_.Skip(skipped.path, skipped.reason);
+        }
+        view_.End(requestsSent, {}, world_.errors);
     }
 
     const Settings &settings_;
     const Deadline &deadline_;
     World world_;
+    ChangeQueue queue_;
     ChangeView view_;
-    bool isRefused_ = false;
 };
 } // namespace
 

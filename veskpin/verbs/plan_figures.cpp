@@ -81,11 +81,8 @@ bool PlanSum::Add(const std::string &relativePath, const FileLook &look, bool is
     if (isPinned) {
         return true;
     }
-    sentSectors_ += sectors;
+    figures_.sectorsToSend += sectors;
     ++figures_.filesToSend;
-    for (const BitRun &run : look.blocks) {
-        figures_.blocksToSend += run.count;
-    }
     const std::string &mountPath = world_.volume.mountPath;
     const std::string path = mountPath + "/" + relativePath;
     if (figures_.requests == 0 || !RequestFillAdd(&fill_, mountPath, path, inode)) {
@@ -115,7 +112,7 @@ PlanFigures PlanSum::Total(unsigned reservePercent) const {
     }
     figures.ssdBlocks = volume.ssdBlocks;
     figures.seconds = world_.known.requests + world_.known.sent + figures.requests +
-                      sentSectors_ * kSectorBytes / kReadBytesPerSecond;
+                      figures_.sectorsToSend * kSectorBytes / kReadBytesPerSecond;
     if (!volume.marked) {
         return figures;
     }

@@ -42,8 +42,8 @@ struct PlanFigures {
     std::optional<uint64_t> marked;
     std::optional<int64_t> headroom; // blocks left on the SSD when all is pinned
     std::optional<bool> fits;
-    uint64_t filesToSend = 0;  // what is pinned already is not sent
-    uint64_t blocksToSend = 0; // theirs, file by file
+    uint64_t filesToSend = 0;   // what is pinned already is not sent
+    uint64_t sectorsToSend = 0; // theirs
     uint64_t requests = 0;
     uint64_t seconds = 0;
 };
@@ -71,6 +71,5 @@ private:
     PlanFigures figures_;
     uint64_t blocks_ = 0;
     bool isStoredKnown_ = true; // the blocks of all stored pins are
-    uint64_t sentSectors_ = 0;  // of the files to be sent
 };
 } // namespace vesk

@@ -1,6 +1,7 @@
 #include "act/interrupt.h"
 #include "model/targets.h"
 #include "verbs/change_end.h"
+#include "verbs/change_queue.h"
 #include "verbs/neighbours.h"
 #include "verbs/verbs.h"
 
@@ -12,7 +13,7 @@
 
 namespace vesk {
 namespace {
-const unsigned kGraceMs = 1000;
+const unsigned kSendSeconds = 1;
 
 // The known files of each volume, by their indexes.
 using FilesOf = std::map<const WorldVolume *, std::set<size_t>>;
@@ -31,6 +32,9 @@ FilesOf FilesBelow(World &world, const std::vector<std::string> &paths) {
     FilesOf files;
     for (const std::string &path : paths) {
         const Target target = TargetResolve(world, path);
+        if (target.isWithoutCache) {
+            LookUnknownAdd(&world.errors, target.path, "lies on a volume without a cache");
+        }
         if (target.volume == nullptr) {
             NoteFailedPath(target, &world.errors);
             continue;
@@ -54,88 +58,127 @@ bool IsItself(const KnownFile &file, const FileLook &look) {
            (!file.inode || *file.inode == static_cast<uint32_t>(look.status.inode));
 }
 
-void SendUnpins(const WorldVolume &world, const std::set<size_t> &indexes, ChangeRun &run,
-                ChangeView &view) {
-    const Volume &volume = world.volume;
-    FileLooker looker(volume.mountPath);
-    const std::vector<KnownFile> &files = world.known.files;
-    for (auto index = indexes.begin(); index != indexes.end();) {
-        const KnownFile *file = &files[*index];
-        const FileLook &look = looker.Look(file->relativePath);
-        bool isItself = IsItself(*file, look);
-        // A path has a record for each inode that was pinned under it; it is told once.
-        while (++index != indexes.end() && files[*index].relativePath == file->relativePath) {
-            if (!isItself) {
-                file = &files[*index];
-                isItself = IsItself(*file, look);
+// One call: all files are looked at and kept before the first is sent.
+class UnpinCall {
+public:
+    UnpinCall(const Settings &settings, const Deadline &deadline, ChangeView &view)
+        : settings_(settings), deadline_(deadline), world_(WorldLook(settings.configPath)),
+          view_(view), neighbours_(world_.errors) {}
+
+    ExitStatus Carry() {
+        for (const auto &[volume, indexes] : FilesBelow(world_, settings_.paths)) {
+            LookAt(*volume, indexes);
+        }
+        if (InterruptSignal() != 0 || deadline_.IsOver() || queue_.Error() != 0) {
+            return ChangeEndUnsent(queue_.Error(), view_, world_.errors);
+        }
+        queue_.Close();
+        Work work;
+        work.files = queue_.Count();
+        WorkProgress progress(settings_.progress, work);
+        ChangeRun unpins(settings_, kRequestUnpinFiles, ChangePace::Steady, deadline_, progress,
+                         world_.errors,
+                         {[this](const ChangedFile &file) { Tell(file); },
+                          {},
+                          [this](const RequestBatch &batch) { neighbours_.Note(batch, world_); }});
+        queue_.SendAll(unpins, view_);
+        unpins.Flush();
+        const Deadline soon(kSendSeconds);
+        const bool isShort = unpins.End() == TalkEnd::TimeOver;
+        ChangeRun pins(settings_, kRequestPinFiles, ChangePace::AtOnce, isShort ? soon : deadline_,
+                       progress, world_.errors,
+                       {[this](const ChangedFile &file) { TellNeighbour(file); }, {}, {}});
+        SendNeighbours(pins, progress);
+        unpins.Finish();
+        pins.Finish();
+        queue_.TellRest(told_, view_, &world_.errors);
+        ChangeNoteEnd(unpins, &world_.errors);
+        ChangeNoteEnd(pins, &world_.errors);
+        view_.End(unpins.RequestsSent() + pins.RequestsSent(), repinned_, world_.errors);
+        return ChangeStatus({&unpins, &pins},
+                            ExitStatusOf(world_.errors.isUnknown, view_.IsAllAsAsked()));
+    }
+
+private:
+    void LookAt(const WorldVolume &world, const std::set<size_t> &indexes) {
+        const Volume &volume = world.volume;
+        const std::vector<KnownFile> &files = world.known.files;
+        if (!volume.isMounted && !indexes.empty()) {
+            LookUnknownAdd(&world_.errors, volume.mountPath, "is not mounted");
+        }
+        FileLooker looker(volume.mountPath);
+        for (auto index = indexes.begin(); index != indexes.end();) {
+            if (InterruptSignal() != 0 || deadline_.IsOver()) {
+                return;
+            }
+            const KnownFile *file = &files[*index];
+            const FileLook &look = looker.Look(file->relativePath);
+            bool isItself = IsItself(*file, look);
+            // A path has a record for each inode that was pinned under it; it is told once.
+            while (++index != indexes.end() && files[*index].relativePath == file->relativePath) {
+                if (!isItself) {
+                    file = &files[*index];
+                    isItself = IsItself(*file, look);
+                }
+            }
+            const std::string path = VolumePath(volume.mountPath, file->relativePath);
+            const auto state = FileStateOf(file, look, FileFiguresOf(look, volume), volume);
+            if (!volume.isMounted) {
+                view_.Put({path, std::nullopt, std::nullopt});
+            } else if (isItself) {
+                queue_.Put(volume.mountPath, file->relativePath, look, state, QueueAction::Send);
+            } else {
+                view_.Put({path, state, ChangeReason::NeedsRepair});
             }
         }
-        const auto state = FileStateOf(file, look, FileFiguresOf(look, volume), volume);
-        if (isItself) {
-            run.Add(volume.mountPath, file->relativePath, look, state);
-        } else {
-            view.Put({VolumePath(volume.mountPath, file->relativePath), state,
-                      ChangeReason::NeedsRepair});
+    }
+
+    // Those of what was sent. That is not left half done: neither a signal nor the end of the time
+    // keeps it from being sent within a second.
+    void SendNeighbours(ChangeRun &pins, WorkProgress &progress) {
+        InterruptGrace(kSendSeconds * 1000);
+        neighbours_.Send(settings_.configPath, pins);
+        progress.More(neighbours_.Count());
+        pins.Flush();
+        InterruptGrace(0);
+        for (const std::string &path : neighbours_.Unsent()) {
+            TellNeighbour({path, std::nullopt, ChangeReason::NotTaken});
         }
     }
-}
 
-// Sends the neighbours of what was sent. That is not left half done: neither a signal nor the end
-// of the time keeps it from being sent within a second.
-void SendNeighbours(Neighbours &neighbours, const Settings &settings, ChangeRun &pins) {
-    InterruptGrace(kGraceMs);
-    neighbours.Send(settings.configPath, pins);
-    pins.Flush();
-    InterruptGrace(0);
-}
+    void Tell(const ChangedFile &file) {
+        view_.Put(file);
+        if (file.reason == ChangeReason::NotTaken) {
+            told_.insert(file.path); // it may be a neighbour of what was sent
+        }
+    }
+
+    // Of one that is not what it was each has to be told.
+    void TellNeighbour(const ChangedFile &file) {
+        const bool isUnderway = !settings_.waits && file.state == FileState::Pinning;
+        if ((file.state == FileState::Pinned || isUnderway) && !file.reason) {
+            repinned_.push_back(file.path);
+        } else if (told_.insert(file.path).second) {
+            view_.Put(file);
+        }
+    }
+
+    const Settings &settings_;
+    const Deadline &deadline_;
+    World world_;
+    ChangeView &view_;
+    ChangeQueue queue_;
+    Neighbours neighbours_;
+    std::set<std::string> told_; // absolute paths, of those that could be told twice
+    std::vector<std::string> repinned_;
+};
 } // namespace
 
 ExitStatus UnpinCommand(const Settings &settings, TextSink &out) {
     const Deadline deadline(settings.timeoutSeconds);
     const ChangeLock lock = ChangeBegin(deadline);
     ChangeView view("unpin", FileState::Unpinned, FileState::Unpinning, settings, out);
-    if (lock.error != 0) {
-        return ChangeLockStatus(lock, view);
-    }
-    World world = WorldLook(settings.configPath);
-    const FilesOf files = FilesBelow(world, settings.paths);
-    Work work;
-    for (const auto &[volume, indexes] : files) {
-        work.files += indexes.size();
-    }
-    WorkProgress progress(settings.progress, work);
-    Neighbours neighbours(world.errors);
-    ChangeRun unpins(settings, kRequestUnpinFiles, ChangePace::Steady, deadline, progress,
-                     {[&](const ChangedFile &file) { view.Put(file); },
-                      [&](const RequestBatch &batch) { neighbours.Note(batch, world); }});
-    for (const auto &[volume, indexes] : files) {
-        SendUnpins(*volume, indexes, unpins, view);
-    }
-    unpins.Flush();
-
-    const Deadline soon(1);
-    std::vector<std::string> repinned;
-    WorkProgress quiet(ProgressForm::None, {});
-    ChangeRun pins(settings, kRequestPinFiles, ChangePace::AtOnce,
-                   unpins.End() == TalkEnd::TimeOver ? soon : deadline, quiet,
-                   {[&](const ChangedFile &file) {
-                        const bool isUnderway = !settings.waits && file.state == FileState::Pinning;
-                        // Of a neighbour that is not what it was each has to be told.
-                        if ((file.state == FileState::Pinned || isUnderway) && !file.reason) {
-                            repinned.push_back(file.path);
-                        } else {
-                            view.Put(file);
-                        }
-                    },
-                    {}});
-    SendNeighbours(neighbours, settings, pins);
-    unpins.Finish();
-    pins.Finish();
-
-    ChangeNoteEnd(unpins, &world.errors);
-    ChangeNoteEnd(pins, &world.errors);
-    view.End(unpins.RequestsSent() + pins.RequestsSent(), repinned, world.errors);
-    return ChangeStatus({&unpins, &pins},
-                        ExitStatusOf(world.errors.isUnknown, view.IsAllAsAsked()));
+    return lock.error != 0 ? ChangeLockStatus(lock, view)
+                           : UnpinCall(settings, deadline, view).Carry();
 }
 } // namespace vesk

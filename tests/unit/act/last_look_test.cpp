@@ -30,7 +30,7 @@ protected:
         EXPECT_EQ(lstat(path.c_str(), &status), 0);
         const auto inode = static_cast<uint32_t>(status.st_ino);
         bytesOf_[inode] = bytes;
-        return {name, inode, bytes, bytes};
+        return {name, inode, bytes, bytes, bytes * 128};
     }
     RequestBatch Batch(const std::vector<BatchFile> &files) const {
         RequestBatch batch{volume_, kRequestPinFiles, {}, {}};
@@ -87,7 +87,9 @@ TEST_F(LastLookTest, WhatIsNoLongerThereIsGone) {
     std::filesystem::create_symlink("target", volume_ + "/link");
     const LastLook last = LastLookAt(Batch({gone, other, empty, link, Make("c", 1)}));
     EXPECT_EQ(Names(last.calm.files), "c ");
-    EXPECT_EQ(Names(last.gone.files), "gone other empty link ");
+    EXPECT_EQ(Names(last.gone.files), "gone other link ");
+    EXPECT_EQ(Names(last.empty.files), "empty ");
+    EXPECT_EQ(Names(last.unreadable.files), "");
     EXPECT_EQ(last.gone.mountPath, volume_);
     EXPECT_EQ(LookLogTake("silent"), "silent");
 }
@@ -98,8 +100,11 @@ TEST_F(LastLookTest, WithoutItsVolumeEverythingIsGone) {
     EXPECT_EQ(Names(LastLookAt(Batch({a})).gone.files), "a ");
 }
 
-TEST_F(LastLookTest, BlocksAreCountedOverAllRuns) {
-    EXPECT_EQ(BlocksIn({}), 0U);
-    EXPECT_EQ(BlocksIn({{5, 2}, {9, 1}}), 3U);
+TEST_F(LastLookTest, WhoseBlocksCannotBeSeenIsToldApart) {
+    const BatchFile a = Make("a", 1);
+    FakeAppliance::onLookup = [](const std::string &, uint64_t, int, FileMappingTable &) {
+        return -1;
+    };
+    EXPECT_EQ(Names(LastLookAt(Batch({a})).unreadable.files), "a ");
 }
 } // namespace vesk

@@ -8,7 +8,7 @@ class RequestWatchTest : public LookTest {
 protected:
     static RequestBatch Batch(const std::string &path, RequestType type = kRequestPinFiles) {
         RequestBatch batch{"/volume1", type, {}, {}};
-        EXPECT_TRUE(BatchAdd(&batch, {path, 11, 1, 1}));
+        EXPECT_TRUE(BatchAdd(&batch, {path, 11, 1, 1, 128}));
         return batch;
     }
     // A document in which these file-inode lists are stored as requests to pin.
@@ -54,7 +54,9 @@ TEST_F(RequestWatchTest, WhatIsNoLongerStoredIsFinished) {
 
 TEST_F(RequestWatchTest, OnlyTheSameRequestIsTheOne) {
     watch_.Add(Batch("a"));
-    Store({"a#12"}); // another inode
+    Store({"a#12"}); // replaced before the receiver looked at it
+    EXPECT_EQ(Finished(), Texts{});
+    Store({"b#11"});
     EXPECT_EQ(Finished(), Texts{"/volume1/a"});
     watch_.Add(Batch("a"));
     Store({"a#11"}, "/volume10");

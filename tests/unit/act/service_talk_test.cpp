@@ -4,12 +4,15 @@
 #include "tests/support/look_fixture.h"
 #include "tests/support/private_world.h"
 
+#include "request/message_queue.h"
+
 #include <csignal>
+#include <sys/wait.h>
 
 namespace vesk {
 namespace {
 const bool kPrivateWorld = UsePrivateWorld();
-const pid_t kPid = 100;
+const pid_t kPid = getpid(); // who takes a message here is the service
 
 class ServiceTalkTest : public LookTest {
 protected:
@@ -28,7 +31,7 @@ protected:
     }
     RequestBatch Batch() const {
         RequestBatch batch{"/volume1", kRequestUnpinFiles, {}, {}};
-        EXPECT_TRUE(BatchAdd(&batch, {"a", 11, 1, 1}));
+        EXPECT_TRUE(BatchAdd(&batch, {"a", 11, 1, 1, 128}));
         return batch;
     }
     const FakeProc proc_;
@@ -47,7 +50,8 @@ TEST_F(ServiceTalkTest, AReceiverThatWaitsTakes) {
 TEST_F(ServiceTalkTest, AServiceOfAnotherConfigurationOrNamespaceIsNone) {
     ServiceTalk other(folder_.Path("other.json"), proc_.Path());
     EXPECT_EQ(other.Look(), TalkState::Absent);
-    proc_.Link("100/task/100/ns/ipc", "ipc:[2]");
+    const std::string pid = std::to_string(kPid);
+    proc_.Link(pid + "/task/" + pid + "/ns/ipc", "ipc:[2]");
     EXPECT_EQ(talk_.Look(), TalkState::Absent);
 }
 
@@ -69,7 +73,7 @@ TEST_F(ServiceTalkTest, OneThatHasEndedIsToldHoweverItEnds) {
     EXPECT_EQ(talk_.Look(), TalkState::Ended);
     talk_.Forget();
     EXPECT_EQ(talk_.Look(), TalkState::Takes);
-    std::filesystem::remove_all(proc_.Path("100"));
+    std::filesystem::remove_all(proc_.Path(std::to_string(kPid)));
     EXPECT_EQ(talk_.Look(), TalkState::Ended);
     talk_.Forget();
     EXPECT_EQ(talk_.Look(), TalkState::Absent);
@@ -81,6 +85,7 @@ TEST_F(ServiceTalkTest, AfterARequestItTakesTheNextWhenItHasSleptAnew) {
     const int queue = MsgQueueGet(kMessageKeyFile);
     ASSERT_EQ(talk_.AwaitTurn(Deadline(std::nullopt)), TalkEnd::Done);
     ASSERT_EQ(talk_.Send(Batch()), TalkEnd::Done);
+    EXPECT_EQ(talk_.Look(), TalkState::Busy);
     EXPECT_EQ(TakeMessage(queue).text, RecordBytes(kRequestUnpinFiles, "/volume1", "/volume1/a"));
     // The message is handed over before the thread runs, which seems to wait for it still.
     EXPECT_EQ(talk_.Look(), TalkState::Busy);
@@ -90,6 +95,41 @@ TEST_F(ServiceTalkTest, AfterARequestItTakesTheNextWhenItHasSleptAnew) {
     PutReceiver("do_msgrcv", 9);
     EXPECT_EQ(talk_.Look(), TalkState::Takes);
     EmptyPrivateWorld();
+}
+
+TEST_F(ServiceTalkTest, ARequestThatSomebodyElseTakesIsNotWaitedFor) {
+    SKIP_WITHOUT_PRIVATE_WORLD();
+    EmptyPrivateWorld();
+    const int queue = MsgQueueGet(kMessageKeyFile);
+    ASSERT_EQ(talk_.AwaitTurn(Deadline(std::nullopt)), TalkEnd::Done);
+    ASSERT_EQ(talk_.Send(Batch()), TalkEnd::Done);
+    const pid_t other = fork();
+    if (other == 0) {
+        RequestMessage message{};
+        _exit(msgrcv(queue, &message, kRequestMessageBytes, 0, IPC_NOWAIT) > 0 ? 0 : 1);
+    }
+    int status = -1;
+    ASSERT_EQ(waitpid(other, &status, 0), other);
+    ASSERT_EQ(status, 0);
+    EXPECT_EQ(talk_.Look(), TalkState::Taken);
+    EXPECT_EQ(talk_.AwaitTurn(Deadline(std::nullopt)), TalkEnd::Taken);
+    EmptyPrivateWorld();
+}
+
+TEST_F(ServiceTalkTest, OneThatLivesIsFoundBesideOneThatHasEnded) {
+    const pid_t next = kPid + 1000;
+    PutReceiver("0", 8, 'Z');
+    ASSERT_EQ(ServiceTalk(config_, proc_.Path()).Look(), TalkState::Ended);
+    proc_.AddService(next, Serving(config_));
+    EXPECT_EQ(talk_.Look(), TalkState::Takes);
+}
+
+TEST_F(ServiceTalkTest, ADocumentThatIsNotThereYetIsKnownByItsFolder) {
+    std::filesystem::remove(config_);
+    ServiceTalk talk(folder_.Path() + "/../" + folder_.Path().substr(folder_.Path().rfind('/')) +
+                         "/pins.json",
+                     proc_.Path());
+    EXPECT_EQ(talk.Look(), TalkState::Takes);
 }
 
 TEST_F(ServiceTalkTest, WithoutAQueueNothingIsSent) {

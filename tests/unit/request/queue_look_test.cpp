@@ -24,7 +24,7 @@ protected:
         }
     }
     MsgQueueCause Look() {
-        state_ = {1, 2, 3, 4, 5, 6}; // of another queue
+        state_ = {1, 2, 3, 4, 5, 6, 7}; // of another queue
         return MsgQueueLook(KeyFile(), &state_);
     }
     static int Make(int mode) { return msgget(kKey, IPC_CREAT | IPC_EXCL | mode); }

@@ -49,13 +49,18 @@ TEST(RequestPathCheckTest, ARelativePathHas511Bytes) {
     EXPECT_EQ(RequestPathCheck(kMount, Below(std::string(512, 'x')), 1), RequestPathFault::TooLong);
 }
 
-TEST(RequestPathCheckTest, AMountPathHas511BytesAndTheWholePath1023) {
-    const std::string mount = "/" + std::string(510, 'm');
+TEST(RequestPathCheckTest, TheFolderOfALongPathHas510Bytes) {
+    // From a longer one the service would make a shorter: it cuts the path at 512 bytes first.
+    const std::string mount = "/" + std::string(509, 'm');
     EXPECT_EQ(RequestPathCheck(mount, mount + "/" + std::string(511, 'x'), 1),
               RequestPathFault::None);
-    EXPECT_EQ(RequestPathCheck(mount + "m", mount + "m/x", 1), RequestPathFault::TooLong);
     EXPECT_EQ(RequestPathCheck(mount, mount + "/" + std::string(512, 'x'), 1),
               RequestPathFault::TooLong);
+    EXPECT_EQ(RequestPathCheck(mount + "m", mount + "m/x", 1), RequestPathFault::TooLong);
+    EXPECT_EQ(RequestPathCheck(mount + "m", mount + "m/", 1), RequestPathFault::None); // 512 in all
+    const std::string folder = kMount + std::string("/") + std::string(502, 'f');
+    EXPECT_EQ(RequestPathCheck(kMount, folder + "/x", 1), RequestPathFault::TooLong);
+    EXPECT_EQ(RequestPathCheck(kMount, folder.substr(0, 510) + "/xx", 1), RequestPathFault::None);
 }
 
 TEST(RequestFillTest, PathsFillARequestToItsLastByte) {

@@ -42,7 +42,7 @@ long Member(const std::string &text, const std::string &name) {
 
 TEST(WorkProgressTest, BeforeAnythingIsDoneTheEstimateIsToldLessTheTime) {
     const std::string text =
-        Written(ProgressForm::Json, {10, 640, 200}, [](WorkProgress &progress) {
+        Written(ProgressForm::Json, {10, 640 * 128, 200}, [](WorkProgress &progress) {
             usleep(600000);
             progress.Tick();
         });
@@ -57,9 +57,9 @@ TEST(WorkProgressTest, BeforeAnythingIsDoneTheEstimateIsToldLessTheTime) {
 
 TEST(WorkProgressTest, TheRestTakesAsLongAsThePartThatIsDone) {
     const auto text = [](uint64_t files, uint64_t blocks) {
-        return Written(ProgressForm::Json, {10, 1000, 500}, [&](WorkProgress &progress) {
+        return Written(ProgressForm::Json, {10, 128000, 500}, [&](WorkProgress &progress) {
             usleep(600000);
-            progress.Done(files, blocks);
+            progress.Done(files, blocks * 128);
         });
     };
     // A tenth is done, of the files or of the blocks: whatever is further behind counts.
@@ -73,6 +73,25 @@ TEST(WorkProgressTest, TheRestTakesAsLongAsThePartThatIsDone) {
     EXPECT_EQ(Member(rate, "blocksPerSecond"), 100000 / Member(rate, "milliseconds"));
 }
 
+TEST(WorkProgressTest, ProgramsThatWereToldAreToldTheEnd) {
+    const std::string text = Written(ProgressForm::Json, {2, 256, 9}, [](WorkProgress &progress) {
+        usleep(250000);
+        progress.Done(1, 128);
+        progress.More(1);
+        progress.Done(2, 128);
+        progress.End();
+    });
+    const size_t second = text.find('\n') + 1;
+    EXPECT_EQ(text.rfind("{\"files\":1,\"total\":2,\"blocks\":1,", 0), 0U) << text;
+    EXPECT_EQ(text.find("{\"files\":3,\"total\":3,\"blocks\":2,"), second) << text;
+    EXPECT_EQ(Written(ProgressForm::Json, {1, 1, 1},
+                      [](WorkProgress &progress) {
+                          progress.Done(1, 1);
+                          progress.End();
+                      }),
+              "");
+}
+
 TEST(WorkProgressTest, WhatIsNotKnownIsNull) {
     const std::string text = Written(ProgressForm::Json, {10, {}, {}}, [](WorkProgress &progress) {
         usleep(250000);
@@ -83,10 +102,11 @@ TEST(WorkProgressTest, WhatIsNotKnownIsNull) {
 }
 
 TEST(WorkProgressTest, ATerminalGetsALineThatIsClearedAtTheEnd) {
-    const std::string text = Written(ProgressForm::Line, {4, 64, 10}, [](WorkProgress &progress) {
-        usleep(1100000);
-        progress.Done(4, 64);
-    });
+    const std::string text =
+        Written(ProgressForm::Line, {4, 64 * 128, 10}, [](WorkProgress &progress) {
+            usleep(1100000);
+            progress.Done(4, 64 * 128);
+        });
     EXPECT_EQ(text.rfind("\r4 of 4 files, 4.0 MiB of 4.0 MiB, ", 0), 0U) << text;
     const std::string end = "/s, 0 s left\033[K\r\033[K";
     EXPECT_EQ(text.substr(text.size() - end.size()), end) << text;

@@ -55,11 +55,15 @@ TEST_F(ChangeViewTest, PeopleAreToldWhatIsNotAsAskedAndHowMuchIs) {
     view.Put({kB, FileState::Pinning, ChangeReason::NotTaken});
     EXPECT_FALSE(view.IsAllAsAsked());
     view.Skip("/volume1/c\n", SkipReason::Name);
+    view.Skip("/volume1/d", SkipReason::NoBlocks);
+    view.Skip("/volume1/e ", SkipReason::Name);
     view.End(1, {"/volume1/e\n"}, {});
     EXPECT_EQ(sink_.Kept(), "pinning  /volume1/b\\xff: not-taken\n"
                             "left out  /volume1/c\\x0a: name\n"
-                            "1 file pinned, 1 not, 1 left out, in 1 request\n"
-                            "pinned again  /volume1/e\\x0a\n");
+                            "left out  /volume1/d: no-blocks\n"
+                            "left out  /volume1/e : name\n"
+                            "1 file pinned, 1 not, 3 left out (2 name, 1 no-blocks), in 1 request; "
+                            "1 neighbour pinned again\n");
 }
 
 TEST_F(ChangeViewTest, WhoDoesNotWaitIsContentWithWhatIsUnderway) {

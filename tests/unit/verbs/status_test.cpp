@@ -18,7 +18,7 @@ protected:
         view_.isConfigKnown = true;
         view_.volumes = {&world_};
         view_.queue.cause = MsgQueueCause::Found;
-        view_.queue.state = {-7, 32768, 0, 3, 4620, 1576960};
+        view_.queue.state = {-7, 32768, 0, 3, 4620, 1576960, 0};
         view_.services = {Service{}};
         view_.services[0].pid = 100;
         view_.services[0].config = "/etc/pins.json";
