@@ -1,5 +1,6 @@
 #include "verbs/plan.h"
 
+#include "bitmap/pin_bitmap.h"
 #include "model/path_walk.h"
 #include "model/targets.h"
 #include "verbs/answer.h"
@@ -24,6 +25,7 @@ public:
         : world_(volume), errors_(world.errors), plan_(plan), progress_(progress), hooks_(hooks),
           looker_(volume.volume.mountPath), sum_(volume) {
         WorldVolumeUse(world, volume);
+        NoteWhatIsLetGo();
     }
 
     const WorldVolume &Of() const { return world_; }
@@ -35,7 +37,7 @@ public:
         const std::string &mountPath = world_.volume.mountPath;
         if (const auto reason = SkipReasonOf(mountPath, relativePath, look)) {
             Skip(relativePath, *reason);
-        } else if (const auto state = StateOf(look);
+        } else if (const auto state = StateOf(relativePath, look);
                    !sum_.Add(relativePath, look, state == FileState::Pinned)) {
             Skip(relativePath, SkipReason::SameInode);
         } else if (hooks_.visit) {
@@ -71,10 +73,34 @@ public:
     }
 
 private:
-    std::optional<FileState> StateOf(const FileLook &look) const {
+    // A stored request to let a file go takes the blocks of its neighbours along.
+    void NoteWhatIsLetGo() {
+        for (const KnownFile &known : world_.known.files) {
+            if (known.stored != kRequestUnpinFiles) {
+                continue;
+            }
+            if (letGo_.empty()) {
+                letGo_ = BlockSetOf(world_.volume.deviceBytes.value_or(0) >> kBitmapByteShift);
+            }
+            for (const BitRun &run : looker_.Look(known.relativePath).blocks) {
+                BlockSetAdd(&letGo_, run);
+            }
+        }
+    }
+
+    // By its inode, also where that is recorded under another path: then it is pinned already.
+    std::optional<FileState> StateOf(const std::string &relativePath, const FileLook &look) const {
         const KnownFile *known = KnownFileByInode(world_.known, look.status.inode);
+        const auto at = KnownFilesAt(world_.known, relativePath);
+        if (known == nullptr && at.first < at.second) {
+            known = &world_.known.files[at.first];
+        }
         const FileFigures figures = FileFiguresOf(look, world_.volume);
-        return FileStateOf(known, look, figures, world_.volume);
+        const auto state = FileStateOf(known, look, figures, world_.volume);
+        const bool willLoseBlocks =
+            std::any_of(look.blocks.begin(), look.blocks.end(),
+                        [&](const BitRun &run) { return BlockSetCountIn(letGo_, run) > 0; });
+        return state == FileState::Pinned && willLoseBlocks ? FileState::Partial : state;
     }
 
     void Skip(const std::string &relativePath, SkipReason reason) {
@@ -91,6 +117,7 @@ private:
     Progress &progress_;
     const PlanHooks &hooks_;
     FileLooker looker_;
+    BlockSet letGo_; // blocks that stored requests let go
     PlanSum sum_;
 };
 
