@@ -111,3 +111,25 @@ $(reason_of /volume1/d/b) $(state_of /volume1/d/below/c) $(reason_of /volume1/d/
     same needs-repair "$(reason_of '/volume1/d/a;b')"
     stop_service
 }
+
+@test "neighbours of what has grown meanwhile are pinned again" {
+    local i status=0 neighbours
+    mkdir small
+    for i in 1 2 3 4 5 6; do random "small/$i" 8K; done
+    sync
+    start_service
+    look 0 pin /volume1/small /volume1/d
+    set_pending /volume1
+    wait_until messages_are_taken
+    in_background "$ANSWER" unpin /volume1/small/3
+    wait_until request_is_stored 2
+    # Into blocks of others, wherever it finds room.
+    dd if=/dev/urandom of=small/3 bs=4K seek=2 count=40 conv=fsync,notrunc status=none
+    neighbours=$(common "$(blocks_of small/3)" "$(blocks_of small/1 small/2 small/4 small/5 small/6 d/a d/b d/below/c)")
+    end_pending /volume1
+    wait "$PIN_PID" || status=$?
+    same 0 "$status"
+    [ -n "$neighbours" ]
+    holds_just small/1 small/2 small/4 small/5 small/6 d/a d/b d/below/c
+    stop_service
+}

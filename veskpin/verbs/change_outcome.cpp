@@ -10,8 +10,7 @@ namespace vesk {
 namespace {
 // Whether it is what was asked for, or is on the way to it.
 bool IsDone(bool isPin, FileState state) {
-    return isPin ? state == FileState::Pinned || state == FileState::Marked ||
-                       state == FileState::Pinning
+    return isPin ? state == FileState::Pinned || state == FileState::Pinning
                  : state == FileState::Unpinned || state == FileState::Unpinning;
 }
 

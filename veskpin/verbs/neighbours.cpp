@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <utility>
 
 namespace vesk {
 namespace {
@@ -17,6 +18,10 @@ bool IsToStay(const KnownFile &file, const FileLook &look) {
     const auto inode = static_cast<uint32_t>(look.status.inode);
     return file.inode == inode ||
            (file.stored == kRequestPinFiles && file.storedInode.value_or(inode) == inode);
+}
+
+bool IsPinned(const KnownFile &file, const FileLook &look, const Volume &volume) {
+    return FileStateOf(&file, look, FileFiguresOf(look, volume), volume) == FileState::Pinned;
 }
 
 bool IsGone(int error) {
@@ -33,6 +38,7 @@ void Neighbours::Note(const RequestBatch &batch, const World &world) {
     FileLooker looker(batch.mountPath);
     for (const BatchFile &file : batch.files) {
         letGo.inodes.insert(file.inode);
+        letGo.paths.push_back(file.relativePath);
         const FileLook &look = looker.Look(file.relativePath);
         if (!look.hasExtents || !volume->volume.deviceBytes) {
             LookUnknownAdd(&errors_, VolumePath(batch.mountPath, file.relativePath),
@@ -58,6 +64,32 @@ void Neighbours::Send(const std::string &configPath, ChangeRun &run) {
     LookErrorsAdd(&errors_, world.errors);
 }
 
+// Leaves only blocks that were not known of. False: there are none.
+bool Neighbours::FindGrown() {
+    uint64_t grown = 0;
+    for (auto &[mountPath, letGo] : volumes_) {
+        FileLooker looker(mountPath);
+        BlockSet blocks = BlockSetOf(uint64_t{letGo.blocks.size()} * 8);
+        for (const std::string &path : letGo.paths) {
+            for (const BitRun &run : looker.Look(path).blocks) {
+                for (uint64_t at = run.first; at < run.first + run.count; ++at) {
+                    const bool isKnown = BlockSetCountIn(letGo.blocks, {at, 1}) > 0;
+                    grown += isKnown ? 0 : BlockSetAdd(&blocks, {at, 1});
+                }
+            }
+        }
+        letGo.blocks = std::move(blocks);
+    }
+    return grown > 0;
+}
+
+void Neighbours::SendOfGrown(const std::string &configPath, ChangeRun &run) {
+    isAllDone_ = true;
+    if (FindGrown()) {
+        Send(configPath, run);
+    }
+}
+
 void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run) {
     const Volume &volume = world.volume;
     std::vector<BatchFile> neighbours;
@@ -74,7 +106,8 @@ void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun 
         if ((look.error != 0 && !IsGone(look.error)) || (isItself && !look.hasExtents)) {
             LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
                            "whether it has lost blocks cannot be told");
-        } else if (isItself && HasAny(letGo.blocks, look.blocks)) {
+        } else if (isItself && HasAny(letGo.blocks, look.blocks) &&
+                   !(isAllDone_ && IsPinned(file, look, volume))) {
             neighbours.push_back(BatchFileOf(file.relativePath, look));
         }
     }

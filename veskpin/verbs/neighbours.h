@@ -26,6 +26,10 @@ public:
     // Sends the recorded files that share blocks with those, as they are now, to be pinned again.
     void Send(const std::string &configPath, ChangeRun &run);
 
+    // Once all is carried out: a file that has grown meanwhile was let go with blocks that were not
+    // known of. Sends those who share these and have lost them.
+    void SendOfGrown(const std::string &configPath, ChangeRun &run);
+
     uint64_t Count() const { return count_; }
     // Absolute paths of those that could not be sent any more.
     const std::vector<std::string> &Unsent() const { return unsent_; }
@@ -34,9 +38,12 @@ private:
     struct LetGo {
         BlockSet blocks;
         std::unordered_set<uint32_t> inodes; // low 32 bits
+        std::vector<std::string> paths;      // below the volume
     };
+    bool FindGrown();
     void SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run);
     LookErrors &errors_;
+    bool isAllDone_ = false; // who is pinned now has lost nothing
     uint64_t count_ = 0;
     std::vector<std::string> unsent_;
     std::map<std::string, LetGo> volumes_; // by mount path

@@ -52,10 +52,12 @@ FilesOf FilesBelow(World &world, const std::vector<std::string> &paths) {
     return files;
 }
 
-// The service finds the blocks to let go by the file: one without any is given up.
+// The service finds the blocks to let go by the file: one without any is given up. A file that has
+// taken the place of a recorded one may have a pin that is not carried out yet.
 bool IsItself(const KnownFile &file, const FileLook &look) {
+    const auto inode = static_cast<uint32_t>(look.status.inode);
     return look.error == 0 && !look.blocks.empty() &&
-           (!file.inode || *file.inode == static_cast<uint32_t>(look.status.inode));
+           (!file.inode || file.inode == inode || file.storedInode == inode);
 }
 
 // One call: all files are looked at and kept before the first is sent.
@@ -91,6 +93,10 @@ public:
         SendNeighbours(pins, progress);
         unpins.Finish();
         pins.Finish();
+        if (settings_.waits && unpins.End() == TalkEnd::Done && pins.End() == TalkEnd::Done) {
+            neighbours_.SendOfGrown(settings_.configPath, pins);
+            pins.Finish();
+        }
         queue_.TellRest(told_, view_, &world_.errors);
         ChangeNoteEnd(unpins, &world_.errors);
         ChangeNoteEnd(pins, &world_.errors);
