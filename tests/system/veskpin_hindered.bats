@@ -50,6 +50,23 @@ setup() {
     stop_service
 }
 
+@test "an interrupted one whose answer nobody reads ends all the same" {
+    local status=0
+    start_service
+    set_pending /volume1
+    wait_until messages_are_taken
+    mkfifo /tmp/unread
+    exec 7<>/tmp/unread
+    dd if=/dev/zero of=/tmp/unread bs=4096 oflag=nonblock status=none 2>/dev/null || true
+    in_background /tmp/unread pin /volume1/d
+    wait_until request_is_stored 0
+    kill -s INT "$PIN_PID"
+    wait "$PIN_PID" || status=$?
+    exec 7<&-
+    same 130 "$status"
+    stop_service
+}
+
 @test "a service that ends is told, with the paths" {
     local status=0
     start_service

@@ -12,6 +12,9 @@ public:
     // Writes to this descriptor, which stays the caller's; without one all is kept.
     explicit TextSink(int fd = -1) : fd_(fd) {}
 
+    // From here on nothing waits for a reader who takes nothing for a second while `isEnded` holds.
+    void GiveUpWhen(bool (*isEnded)()) { isEnded_ = isEnded; }
+
     // These are called for every word of an answer.
     void Put(std::string_view text) {
         kept_.append(text);
@@ -27,7 +30,9 @@ public:
 
 private:
     static constexpr size_t kKeptMax = 65536; // bytes
+    bool MayWrite() const;
     int fd_;
+    bool (*isEnded_)() = nullptr;
     int error_ = 0; // the errno of the write that failed
     std::string kept_;
 };

@@ -32,8 +32,9 @@ const char *TextOf(TalkEnd end) {
 }
 } // namespace
 
-ChangeLock ChangeBegin(const Deadline &deadline) {
+ChangeLock ChangeBegin(const Deadline &deadline, TextSink &out) {
     InterruptBegin();
+    out.GiveUpWhen([] { return InterruptSignal() != 0; });
     return ChangeLockTake(
         deadline, [] { fprintf(stderr, "veskpin: another veskpin changes pins; waiting\n"); });
 }

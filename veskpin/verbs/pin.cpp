@@ -111,7 +111,7 @@ private:
 
 ExitStatus PinCommand(const Settings &settings, TextSink &out) {
     const Deadline deadline(settings.timeoutSeconds);
-    const ChangeLock lock = ChangeBegin(deadline);
+    const ChangeLock lock = ChangeBegin(deadline, out);
     if (lock.error != 0) {
         ChangeView view("pin", FileState::Pinned, FileState::Pinning, settings, out);
         return ChangeLockStatus(lock, view);

@@ -182,7 +182,7 @@ private:
 
 ExitStatus UnpinCommand(const Settings &settings, TextSink &out) {
     const Deadline deadline(settings.timeoutSeconds);
-    const ChangeLock lock = ChangeBegin(deadline);
+    const ChangeLock lock = ChangeBegin(deadline, out);
     ChangeView view("unpin", FileState::Unpinned, FileState::Unpinning, settings, out);
     return lock.error != 0 ? ChangeLockStatus(lock, view)
                            : UnpinCall(settings, deadline, view).Carry();

@@ -5,8 +5,12 @@
 #include "tests/support/temp_dir.h"
 
 #include <cerrno>
+#include <climits>
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <string>
+#include <thread>
+#include <unistd.h>
 
 namespace vesk {
 namespace {
@@ -18,6 +22,28 @@ protected:
     std::string Written() const { return ReadWhole(path_); }
     const TempDir folder_;
     const std::string path_ = folder_.Path("out");
+};
+
+// A pipe that holds one page, full.
+class FullPipeTest : public LeakCheckedTest {
+protected:
+    void SetUp() override {
+        LeakCheckedTest::SetUp();
+        int ends[2];
+        EXPECT_EQ(pipe(ends), 0);
+        reading_ = ScopedFd(ends[0]);
+        writing_ = ScopedFd(ends[1]);
+        EXPECT_EQ(fcntl(writing_.Get(), F_SETPIPE_SZ, PIPE_BUF), PIPE_BUF);
+        EXPECT_EQ(write(writing_.Get(), std::string(PIPE_BUF, '-').data(), PIPE_BUF), PIPE_BUF);
+    }
+    void TearDown() override {
+        reading_ = ScopedFd();
+        writing_ = ScopedFd();
+        LeakCheckedTest::TearDown();
+    }
+
+    ScopedFd reading_;
+    ScopedFd writing_;
 };
 } // namespace
 
@@ -73,5 +99,40 @@ TEST_F(TextSinkTest, AFailureIsForGoodAndTellsItsCauseAlsoLater) {
     EXPECT_EQ(errno, ENOSPC);
     EXPECT_EQ(FakeLibc::Calls("write"), 1);
     EXPECT_EQ(Written(), ""); // nothing behind a hole
+}
+
+TEST_F(FullPipeTest, WhoIsToEndGivesAReaderUpWhoTakesNothing) {
+    TextSink sink(writing_.Get());
+    static int asked;
+    asked = 0;
+    sink.GiveUpWhen([] { return ++asked > 2; });
+    sink.Put("abc");
+    EXPECT_FALSE(sink.Flush());
+    EXPECT_EQ(errno, EINTR);
+    EXPECT_EQ(asked, 2 + 11); // ten looks more: a second
+    EXPECT_FALSE(sink.Flush());
+    EXPECT_EQ(asked, 2 + 11); // for good
+}
+
+TEST_F(FullPipeTest, AReaderWhoTakesAPieceNowAndThenGetsAll) {
+    TextSink sink(writing_.Get());
+    sink.GiveUpWhen([] { return true; });
+    const std::string text(3 * PIPE_BUF + 7, 'x');
+    sink.Put(text);
+    std::string taken;
+    std::thread reader([&] {
+        char piece[PIPE_BUF];
+        while (taken.size() < PIPE_BUF + text.size()) {
+            const ssize_t bytes = read(reading_.Get(), piece, sizeof(piece));
+            if (bytes <= 0) {
+                return;
+            }
+            taken.append(piece, static_cast<size_t>(bytes));
+        }
+    });
+    EXPECT_TRUE(sink.Flush());
+    writing_ = ScopedFd();
+    reader.join();
+    EXPECT_EQ(taken, std::string(PIPE_BUF, '-') + text);
 }
 } // namespace vesk
