@@ -4,9 +4,9 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <json/reader.h>
 #include <memory>
+#include <sstream>
 #include <sys/ipc.h>
 #include <sys/msg.h>
 #include <sys/stat.h>
@@ -169,8 +169,10 @@ bool WorldParse(const std::string &text, Json::Value &root) {
 }
 
 std::string WorldRead(const std::string &path) {
-    std::ifstream file(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(file), std::istreambuf_iterator<char>()};
+    // By a stream and not by iterators, which throw where a process ends while its status is read.
+    std::ostringstream content;
+    content << std::ifstream(path, std::ios::binary).rdbuf();
+    return content.str();
 }
 
 void WorldWrite(const std::string &path, const std::string &content) {

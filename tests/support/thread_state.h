@@ -2,7 +2,6 @@
 #pragma once
 
 #include <fstream>
-#include <iterator>
 #include <linux/futex.h>
 #include <string>
 #include <sys/types.h>
@@ -13,7 +12,9 @@ namespace vesk {
 inline bool ThreadSleeps(pid_t process, pid_t thread) {
     std::ifstream file("/proc/" + std::to_string(process) + "/task/" + std::to_string(thread) +
                        "/stat");
-    const std::string status((std::istreambuf_iterator<char>(file)), {});
+    std::string status;
+    std::getline(
+        file, status); // which, unlike an iterator, does not throw where the thread ends meanwhile
     return status.rfind(") S") != std::string::npos;
 }
 

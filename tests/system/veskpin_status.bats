@@ -45,13 +45,15 @@ service() { answer ".services[0].$1" -r; }
 @test "for people the same stands in a table" {
     start_service
     pin 1 /volume1/a
+    local size
+    size="$(($(bitmap_blocks 1 | wc -l) * 64)) KiB"
     shows 0 status <<END
 Service $SERVICE_PID: receiver waiting, worker waiting, configuration $CONF
 Queue $(ipcs -q | awk '/^0x/ { print $2 }') of user 0: 0 messages waiting
 Configuration $CONF: 0 requests stored
 
 VOLUME         FILES  REQUESTS    MARKED      HELD       SSD  OF DEVICE     STATE
-/volume1           1         0   256 KiB   256 KiB    16 MiB  64 MiB        pinning
+/volume1           1         0   $size   $size    16 MiB  64 MiB        pinning
 END
     stop_service
 }
