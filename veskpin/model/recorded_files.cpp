@@ -125,11 +125,23 @@ std::pair<size_t, size_t> KnownFilesBelow(const KnownFiles &known, const std::st
     return {at(folder + "/"), at(folder + "0")};
 }
 
-const KnownFile *KnownFileByInode(const KnownFiles &known, uint64_t inode) {
+std::optional<KnownFile> KnownFileByInode(const KnownFiles &known, uint64_t inode) {
     const auto wanted = static_cast<uint32_t>(inode);
-    const auto found = std::lower_bound(known.byInode.begin(), known.byInode.end(),
-                                        std::make_pair(wanted, size_t{0}));
-    return found == known.byInode.end() || found->first != wanted ? nullptr
-                                                                  : &known.files[found->second];
+    std::optional<KnownFile> found;
+    for (auto entry = std::lower_bound(known.byInode.begin(), known.byInode.end(),
+                                       std::make_pair(wanted, size_t{0}));
+         entry != known.byInode.end() && entry->first == wanted; ++entry) {
+        const KnownFile &file = known.files[entry->second];
+        const bool isRecorded = file.inode == wanted;
+        if (!found || (isRecorded && !found->inode)) {
+            found = {file.relativePath, isRecorded ? file.inode : std::nullopt,
+                     found ? found->stored : kRequestUnknown};
+        }
+        if (file.stored != kRequestUnknown && file.storedInode.value_or(wanted) == wanted) {
+            found->stored = file.stored;
+            found->storedInode = file.storedInode;
+        }
+    }
+    return found;
 }
 } // namespace vesk

@@ -45,6 +45,8 @@ KnownFiles KnownFilesOf(const std::string &mountPath, RecordedVolume *volume,
 std::pair<size_t, size_t> KnownFilesAt(const KnownFiles &known, const std::string &relativePath);
 std::pair<size_t, size_t> KnownFilesBelow(const KnownFiles &known, const std::string &folder);
 
-// The entry whose recorded inode has these low 32 bits, or null.
-const KnownFile *KnownFileByInode(const KnownFiles &known, uint64_t inode);
+// What is known of the file whose inode has these low 32 bits, under whatever path: the first one
+// that it is recorded under, or else stands in a request with. What is stored for that path and
+// another inode is none of its own.
+std::optional<KnownFile> KnownFileByInode(const KnownFiles &known, uint64_t inode);
 } // namespace vesk

@@ -8,8 +8,8 @@
 #include <initializer_list>
 
 namespace vesk {
-// Takes the lock of all changing commands; another one's end is waited for. From here on signals end
-// it, also where nobody reads the answer.
+// Takes the lock of all changing commands; another one's end is waited for. From here on signals
+// end it, also where nobody reads the answer.
 ChangeLock ChangeBegin(const Deadline &deadline, TextSink &out);
 
 // Ends the answer where the lock cannot be had.

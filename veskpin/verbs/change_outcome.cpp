@@ -22,18 +22,28 @@ bool IsGone(FileLooker &looker, const BatchFile &file) {
            (error == 0 && static_cast<uint32_t>(status.inode) != file.inode);
 }
 
+// An older record of the path, which no request undoes, hides that the file is recorded, too: under
+// another path, since it was renamed.
+bool IsHidden(const KnownFiles &known, const BatchFile &file, FileState state) {
+    const auto elsewhere = KnownFileByInode(known, file.inode);
+    return state == FileState::Replaced && elsewhere && elsewhere->inode;
+}
+
 std::optional<ChangeReason> ReasonOf(const RequestBatch &batch, const BatchFile &file,
-                                     FileLooker &looker, FileState state,
+                                     const KnownFiles &known, FileLooker &looker, FileState state,
                                      const FileFigures &figures) {
     const bool isPin = batch.type == kRequestPinFiles;
     if (IsDone(isPin, state)) {
         return std::nullopt;
     }
     if (!isPin && (state == FileState::Missing || state == FileState::Replaced)) {
-        return ChangeReason::NeedsRepair; // an older record of the path, which no request undoes
+        return ChangeReason::NeedsRepair;
     }
     if (IsGone(looker, file)) {
         return isPin ? ChangeReason::Vanished : ChangeReason::NeedsRepair;
+    }
+    if (IsHidden(known, file, state)) {
+        return ChangeReason::NeedsRepair;
     }
     // More than was sent for cannot be marked.
     const bool hasGrown = state == FileState::Partial && figures.blocks > file.blocks;
@@ -68,9 +78,9 @@ void TellBatch(World &world, const RequestBatch &batch, std::optional<ChangeReas
     FileLooker looker(batch.mountPath);
     const BatchFile *current = nullptr;
     const VolumeLister::Visit visit = [&](const ListedFile &file) {
-        const auto why = reason || !file.state
-                             ? reason
-                             : ReasonOf(batch, *current, looker, *file.state, file.figures);
+        const auto why = reason || !file.state ? reason
+                                               : ReasonOf(batch, *current, volume->known, looker,
+                                                          *file.state, file.figures);
         tell({file.path, file.state, why});
     };
     VolumeLister lister(*volume, std::nullopt, world, visit);

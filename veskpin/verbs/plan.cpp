@@ -90,7 +90,8 @@ private:
 
     // By its inode, also where that is recorded under another path: then it is pinned already.
     std::optional<FileState> StateOf(const std::string &relativePath, const FileLook &look) const {
-        const KnownFile *known = KnownFileByInode(world_.known, look.status.inode);
+        const auto ofInode = KnownFileByInode(world_.known, look.status.inode);
+        const KnownFile *known = ofInode ? &*ofInode : nullptr;
         const auto at = KnownFilesAt(world_.known, relativePath);
         if (known == nullptr && at.first < at.second) {
             known = &world_.known.files[at.first];

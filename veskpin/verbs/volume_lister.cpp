@@ -90,8 +90,7 @@ std::string VolumeLister::PathOf(const std::string &relativePath) const {
 // What the configuration has of the file: the entry of this path with the inode that is there,
 // else any of this path, else, for a path that it does not have, the entry of this inode: a
 // hard link is judged by its own.
-const KnownFile *VolumeLister::KnownOf(std::pair<size_t, size_t> range,
-                                       const FileLook &look) const {
+const KnownFile *VolumeLister::KnownOf(std::pair<size_t, size_t> range, const FileLook &look) {
     for (size_t i = range.first; i < range.second; ++i) {
         const KnownFile &known = world_.known.files[i];
         if (known.inode && look.error == 0 &&
@@ -102,7 +101,8 @@ const KnownFile *VolumeLister::KnownOf(std::pair<size_t, size_t> range,
     if (range.first < range.second) {
         return &world_.known.files[range.first];
     }
-    return look.error == 0 ? KnownFileByInode(world_.known, look.status.inode) : nullptr;
+    ofInode_ = look.error == 0 ? KnownFileByInode(world_.known, look.status.inode) : std::nullopt;
+    return ofInode_ ? &*ofInode_ : nullptr;
 }
 
 void VolumeLister::ListPath(const std::string &relativePath, const FileStat *status,

@@ -42,7 +42,7 @@ public:
 
 private:
     std::string PathOf(const std::string &relativePath) const;
-    const KnownFile *KnownOf(std::pair<size_t, size_t> range, const FileLook &look) const;
+    const KnownFile *KnownOf(std::pair<size_t, size_t> range, const FileLook &look);
     void ListPath(const std::string &relativePath, const FileStat *status,
                   std::pair<size_t, size_t> range, ListSum *sum);
     std::optional<FileState> StateOf(const KnownFile *known, const FileLook &look,
@@ -56,6 +56,7 @@ private:
     const bool isConfigKnown_; // without it, and the queue, no file's state can be told
     FileLooker looker_;
     RenamedFiles renamed_;
-    FileLook absent_; // of every file where the volume is not there
+    FileLook absent_;                  // of every file where the volume is not there
+    std::optional<KnownFile> ofInode_; // what KnownOf points to
 };
 } // namespace vesk

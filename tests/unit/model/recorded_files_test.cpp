@@ -65,7 +65,7 @@ TEST_F(RecordedFilesTest, WithoutAnythingThereIsNothing) {
     EXPECT_EQ(TextsOf(known), Texts{});
     EXPECT_EQ(known.recorded, 0U);
     EXPECT_EQ(known.requests, 0U);
-    EXPECT_EQ(KnownFileByInode(known, 0), nullptr);
+    EXPECT_FALSE(KnownFileByInode(known, 0));
     EXPECT_EQ(KnownFilesAt(known, "a"), (std::pair<size_t, size_t>{0, 0}));
     EXPECT_EQ(KnownFilesBelow(known, ""), (std::pair<size_t, size_t>{0, 0}));
 }
@@ -135,8 +135,8 @@ TEST_F(RecordedFilesTest, AnInodeIsFoundByItsLow32Bits) {
     const KnownFiles known = Known({{5, "b"}, {7, "c"}, {0xFFFFFFFF, "d"}, {0, "e"}},
                                    {Request(kRequestPinFiles, "f#6")});
     const auto pathOf = [&](uint64_t inode) {
-        const KnownFile *file = KnownFileByInode(known, inode);
-        return file == nullptr ? "(none)" : file->relativePath;
+        const auto file = KnownFileByInode(known, inode);
+        return file ? file->relativePath : "(none)";
     };
     EXPECT_EQ(pathOf(5), "b");
     EXPECT_EQ(pathOf(0x100000005), "b");
@@ -149,7 +149,23 @@ TEST_F(RecordedFilesTest, AnInodeIsFoundByItsLow32Bits) {
 
 TEST_F(RecordedFilesTest, AnInodeThatIsRecordedTwiceIsItsFirstPath) {
     const KnownFiles known = Known({{5, "x"}, {5, "y"}}, {});
-    ASSERT_NE(KnownFileByInode(known, 5), nullptr);
+    ASSERT_TRUE(KnownFileByInode(known, 5));
     EXPECT_EQ(KnownFileByInode(known, 5)->relativePath, "x");
+}
+
+TEST_F(RecordedFilesTest, ARequestForARecordedPathIsThatOfItsOwnInode) {
+    const KnownFiles known = Known({{5, "x"}, {6, "b"}}, {Request(kRequestPinFiles, "x#7"),
+                                                          Request(kRequestUnpinFiles, "a#6")});
+    const auto old = KnownFileByInode(known, 5); // of the file that was there before
+    EXPECT_EQ(old->inode, 5U);
+    EXPECT_EQ(old->stored, kRequestUnknown);
+    const auto now = KnownFileByInode(known, 7);
+    EXPECT_EQ(now->inode, std::nullopt);
+    EXPECT_EQ(now->stored, kRequestPinFiles);
+    // Recorded under one path, in a request under another.
+    const auto renamed = KnownFileByInode(known, 6);
+    EXPECT_EQ(renamed->relativePath, "b");
+    EXPECT_EQ(renamed->inode, 6U);
+    EXPECT_EQ(renamed->stored, kRequestUnpinFiles);
 }
 } // namespace vesk
