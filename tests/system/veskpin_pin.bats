@@ -41,6 +41,19 @@ $(state_of /volume1/d/below/c) $(reason_of /volume1/d/below/c)"
     look 0 pin /volume1/d
 }
 
+@test "what is recorded under the path from which it was renamed is pinned, unless another has its path" {
+    start_service
+    look 0 pin /volume1/d
+    mv d/a d/new
+    look 0 pin /volume1/d/new
+    same '[0,1,0]' "$(left)"
+    mv d/new d/b
+    look 1 pin /volume1/d/b
+    same '[0,1,0]' "$(left)"
+    same 'replaced needs-repair' "$(state_of /volume1/d/b) $(reason_of /volume1/d/b)"
+    stop_service
+}
+
 @test "what cannot be pinned is left out, and why" {
     : >d/empty
     random 'd/a blank' 10K

@@ -133,3 +133,21 @@ $(reason_of /volume1/d/b) $(state_of /volume1/d/below/c) $(reason_of /volume1/d/
     holds_just small/1 small/2 small/4 small/5 small/6 d/a d/b d/below/c
     stop_service
 }
+
+@test "a neighbour whose path is known twice is pinned again once" {
+    mkdir small
+    random small/1 4K
+    random small/2 4K
+    sync
+    [ -n "$(common "$(blocks_of small/1)" "$(blocks_of small/2)")" ]
+    start_service
+    look 0 pin /volume1/small
+    # The record of a file that was there before, and a request.
+    put_config "$(jq -c '.volumes["/volume1"].files["4000000000"] = "small/2"' "$CONF")"
+    set_pending /volume1
+    tool --pin-files /volume1/small/2 --mount-path /volume1
+    wait_until request_is_stored 1
+    look 0 unpin --no-wait /volume1/small/1
+    same '[2,["/volume1/small/2"]]' "$(answer '[.requestsSent, .repinned]')"
+    stop_service
+}

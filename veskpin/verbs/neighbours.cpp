@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <set>
 #include <utility>
 
 namespace vesk {
@@ -93,6 +94,7 @@ void Neighbours::SendOfGrown(const std::string &configPath, ChangeRun &run) {
 void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run) {
     const Volume &volume = world.volume;
     std::vector<BatchFile> neighbours;
+    std::set<uint32_t> inodes; // of those: a path may be known more than once
     FileLooker looker(volume.mountPath);
     for (const KnownFile &file : world.known.files) {
         // One that is being let go by another request stays let go.
@@ -107,7 +109,8 @@ void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun 
             LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
                            "whether it has lost blocks cannot be told");
         } else if (isItself && HasAny(letGo.blocks, look.blocks) &&
-                   !(isAllDone_ && IsPinned(file, look, volume))) {
+                   !(isAllDone_ && IsPinned(file, look, volume)) &&
+                   inodes.insert(static_cast<uint32_t>(look.status.inode)).second) {
             neighbours.push_back(BatchFileOf(file.relativePath, look));
         }
     }
