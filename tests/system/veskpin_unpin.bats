@@ -112,26 +112,47 @@ $(reason_of /volume1/d/b) $(state_of /volume1/d/below/c) $(reason_of /volume1/d/
     stop_service
 }
 
-@test "neighbours of what has grown meanwhile are pinned again" {
-    local i status=0 neighbours
-    mkdir small
-    for i in 1 2 3 4 5 6; do random "small/$i" 8K; done
-    sync
+# It has looked for neighbours then.
+has_told_for_a_while() { [ "$(wc -l </tmp/told)" -gt 3 ]; }
+
+# grows_meanwhile NAME: d/a, which may be given another name, while a request to let it go is stored.
+# Its new blocks can only be those which d/b leaves out.
+grows_meanwhile() {
+    local status=0 before
+    rm d/b
+    random between 128K conv=fsync
+    random d/b 700K conv=fsync
+    before=$(blocks_of d/a)
+    [ -z "$(common "$before" "$(blocks_of d/b d/below/c)")" ]
     start_service
-    look 0 pin /volume1/small /volume1/d
+    look 0 pin /volume1/d
+    echo 0 >"/sys/fs/ext4/$(basename "$(findmnt -no SOURCE /volume1)")/reserved_clusters"
+    dd if=/dev/zero of=fill bs=4K status=none 2>/dev/null || true
+    sync
+    fallocate --punch-hole -o 320K -l 32K d/b
+    sync
     set_pending /volume1
     wait_until messages_are_taken
-    in_background "$ANSWER" unpin /volume1/small/3
-    wait_until request_is_stored 2
-    # Into blocks of others, wherever it finds room.
-    dd if=/dev/urandom of=small/3 bs=4K seek=2 count=40 conv=fsync,notrunc status=none
-    neighbours=$(common "$(blocks_of small/3)" "$(blocks_of small/1 small/2 small/4 small/5 small/6 d/a d/b d/below/c)")
+    in_background "$ANSWER" --progress json unpin /volume1/d/a
+    wait_until request_is_stored 1
+    wait_until has_told_for_a_while
+    [ "$1" = a ] || mv d/a "d/$1"
+    random "d/$1" 20K conv=notrunc,fsync oflag=append
+    [ -n "$(common "$(blocks_of d/b)" "$(comm -13 <(sort <<<"$before") <(blocks_of "d/$1" | sort))")" ]
     end_pending /volume1
     wait "$PIN_PID" || status=$?
     same 0 "$status"
-    [ -n "$neighbours" ]
-    holds_just small/1 small/2 small/4 small/5 small/6 d/a d/b d/below/c
+    # Without the blocks that no file has any more.
+    same "$(blocks_of d/b d/below/c)" "$(common "$(blocks_of d/b d/below/c "d/$1")" "$(bitmap_blocks 1)")"
     stop_service
+}
+
+@test "neighbours of what has grown meanwhile are pinned again" {
+    grows_meanwhile a
+}
+
+@test "also where it has another name by then: the service finds it by its inode" {
+    grows_meanwhile new
 }
 
 @test "a neighbour whose path is known twice is pinned again once" {

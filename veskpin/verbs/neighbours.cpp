@@ -4,8 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <set>
-#include <utility>
+#include <optional>
 
 namespace vesk {
 namespace {
@@ -21,8 +20,16 @@ bool IsToStay(const KnownFile &file, const FileLook &look) {
            (file.stored == kRequestPinFiles && file.storedInode.value_or(inode) == inode);
 }
 
-bool IsPinned(const KnownFile &file, const FileLook &look, const Volume &volume) {
-    return FileStateOf(&file, look, FileFiguresOf(look, volume), volume) == FileState::Pinned;
+void Add(BlockSet *set, const std::vector<BitRun> &runs) {
+    for (const BitRun &run : runs) {
+        BlockSetAdd(set, run);
+    }
+}
+
+void Add(BlockSet *set, const std::optional<BlockSet> &more) {
+    for (size_t i = 0; more && i < std::min(set->size(), more->size()); ++i) {
+        (*set)[i] = static_cast<unsigned char>((*set)[i] | (*more)[i]);
+    }
 }
 
 bool IsGone(int error) {
@@ -35,19 +42,18 @@ void Neighbours::Note(const RequestBatch &batch, const World &world) {
     LetGo &letGo = volumes_[batch.mountPath];
     if (letGo.blocks.empty()) {
         letGo.blocks = BlockSetOf((volume->volume.deviceBytes.value_or(0) >> kBitmapByteShift) + 1);
+        letGo.owed = BlockSet(letGo.blocks.size());
+        Add(&letGo.owed, volume->volume.marked);
     }
     FileLooker looker(batch.mountPath);
     for (const BatchFile &file : batch.files) {
         letGo.inodes.insert(file.inode);
-        letGo.paths.push_back(file.relativePath);
         const FileLook &look = looker.Look(file.relativePath);
         if (!look.hasExtents || !volume->volume.deviceBytes) {
             LookUnknownAdd(&errors_, VolumePath(batch.mountPath, file.relativePath),
                            "which files share its blocks cannot be told");
         }
-        for (const BitRun &run : look.blocks) {
-            BlockSetAdd(&letGo.blocks, run);
-        }
+        Add(&letGo.blocks, look.blocks);
     }
 }
 
@@ -56,61 +62,56 @@ void Neighbours::Send(const std::string &configPath, ChangeRun &run) {
         return;
     }
     World world = WorldLook(configPath);
-    for (const auto &[mountPath, letGo] : volumes_) {
+    for (auto &[mountPath, letGo] : volumes_) {
         if (const WorldVolume *volume = WorldVolumeFind(world, mountPath)) {
             WorldVolumeUse(world, *volume);
-            SendOf(*volume, letGo, run);
+            if (isAllDone_) {
+                FindLost(volume->volume, &letGo);
+            } else {
+                Add(&letGo.owed, volume->volume.marked); // by pins that were stored before
+            }
+            SendOf(*volume, &letGo, run);
         }
     }
     LookErrorsAdd(&errors_, world.errors);
 }
 
-// Leaves only blocks that were not known of. False: there are none.
-bool Neighbours::FindGrown() {
-    uint64_t grown = 0;
-    for (auto &[mountPath, letGo] : volumes_) {
-        FileLooker looker(mountPath);
-        BlockSet blocks = BlockSetOf(uint64_t{letGo.blocks.size()} * 8);
-        for (const std::string &path : letGo.paths) {
-            for (const BitRun &run : looker.Look(path).blocks) {
-                for (uint64_t at = run.first; at < run.first + run.count; ++at) {
-                    const bool isKnown = BlockSetCountIn(letGo.blocks, {at, 1}) > 0;
-                    grown += isKnown ? 0 : BlockSetAdd(&blocks, {at, 1});
-                }
-            }
-        }
-        letGo.blocks = std::move(blocks);
+// Leaves only blocks that should be marked and are not.
+void Neighbours::FindLost(const Volume &volume, LetGo *letGo) {
+    letGo->blocks = letGo->owed;
+    for (size_t i = 0; i < letGo->blocks.size(); ++i) {
+        const bool isKnown = volume.marked && i < volume.marked->size();
+        const unsigned marked = isKnown ? (*volume.marked)[i] : 0xFF;
+        letGo->blocks[i] = static_cast<unsigned char>(letGo->blocks[i] & ~marked);
     }
-    return grown > 0;
 }
 
-void Neighbours::SendOfGrown(const std::string &configPath, ChangeRun &run) {
+void Neighbours::SendOfLost(const std::string &configPath, ChangeRun &run) {
     isAllDone_ = true;
-    if (FindGrown()) {
-        Send(configPath, run);
-    }
+    Send(configPath, run);
 }
 
-void Neighbours::SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run) {
+void Neighbours::SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run) {
     const Volume &volume = world.volume;
     std::vector<BatchFile> neighbours;
-    std::set<uint32_t> inodes; // of those: a path may be known more than once
     FileLooker looker(volume.mountPath);
     for (const KnownFile &file : world.known.files) {
         // One that is being let go by another request stays let go.
         if (file.stored == kRequestUnpinFiles ||
-            (file.inode && letGo.inodes.count(*file.inode) > 0)) {
+            (file.inode && letGo->inodes.count(*file.inode) > 0)) {
             continue;
         }
         const FileLook &look = looker.Look(file.relativePath);
+        if (file.stored == kRequestPinFiles) {
+            Add(&letGo->owed, look.blocks);
+        }
         const bool isItself = look.error == 0 && IsToStay(file, look) &&
-                              letGo.inodes.count(static_cast<uint32_t>(look.status.inode)) == 0;
+                              letGo->inodes.count(static_cast<uint32_t>(look.status.inode)) == 0;
         if ((look.error != 0 && !IsGone(look.error)) || (isItself && !look.hasExtents)) {
             LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
                            "whether it has lost blocks cannot be told");
-        } else if (isItself && HasAny(letGo.blocks, look.blocks) &&
-                   !(isAllDone_ && IsPinned(file, look, volume)) &&
-                   inodes.insert(static_cast<uint32_t>(look.status.inode)).second) {
+        } else if (isItself && HasAny(letGo->blocks, look.blocks) &&
+                   letGo->sent.insert(static_cast<uint32_t>(look.status.inode)).second) {
             neighbours.push_back(BatchFileOf(file.relativePath, look));
         }
     }

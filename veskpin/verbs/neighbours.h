@@ -26,9 +26,9 @@ public:
     // Sends the recorded files that share blocks with those, as they are now, to be pinned again.
     void Send(const std::string &configPath, ChangeRun &run);
 
-    // Once all is carried out: a file that has grown meanwhile was let go with blocks that were not
-    // known of. Sends those who share these and have lost them.
-    void SendOfGrown(const std::string &configPath, ChangeRun &run);
+    // Once all is carried out: what was let go may have had more blocks by then, or have been
+    // another file. Sends those who have lost a block all the same.
+    void SendOfLost(const std::string &configPath, ChangeRun &run);
 
     uint64_t Count() const { return count_; }
     // Absolute paths of those that could not be sent any more.
@@ -37,11 +37,12 @@ public:
 private:
     struct LetGo {
         BlockSet blocks;
+        BlockSet owed;                       // marked before, or to be by a stored pin
         std::unordered_set<uint32_t> inodes; // low 32 bits
-        std::vector<std::string> paths;      // below the volume
+        std::unordered_set<uint32_t> sent;   // of neighbours: a path may be known more than once
     };
-    bool FindGrown();
-    void SendOf(const WorldVolume &world, const LetGo &letGo, ChangeRun &run);
+    static void FindLost(const Volume &volume, LetGo *letGo);
+    void SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run);
     LookErrors &errors_;
     bool isAllDone_ = false; // who is pinned now has lost nothing
     uint64_t count_ = 0;

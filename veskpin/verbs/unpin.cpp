@@ -94,7 +94,7 @@ public:
         unpins.Finish();
         pins.Finish();
         if (settings_.waits && unpins.End() == TalkEnd::Done && pins.End() == TalkEnd::Done) {
-            neighbours_.SendOfGrown(settings_.configPath, pins);
+            neighbours_.SendOfLost(settings_.configPath, pins);
             pins.Finish();
         }
         queue_.TellRest(told_, view_, &world_.errors);
