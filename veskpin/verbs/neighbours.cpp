@@ -57,6 +57,12 @@ void Neighbours::Note(const RequestBatch &batch, const World &world) {
     }
 }
 
+void Neighbours::NoteAgain(const RequestBatch &batch) {
+    for (const BatchFile &file : batch.files) {
+        volumes_[batch.mountPath].again.insert(file.inode);
+    }
+}
+
 void Neighbours::Send(const std::string &configPath, ChangeRun &run) {
     if (volumes_.empty()) {
         return;
@@ -94,6 +100,7 @@ void Neighbours::SendOfLost(const std::string &configPath, ChangeRun &run) {
 void Neighbours::SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run) {
     const Volume &volume = world.volume;
     std::vector<BatchFile> neighbours;
+    std::unordered_set<uint32_t> inodes = letGo->again; // a path may be known more than once
     FileLooker looker(volume.mountPath);
     for (const KnownFile &file : world.known.files) {
         // One that is being let go by another request stays let go.
@@ -111,7 +118,7 @@ void Neighbours::SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run) 
             LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
                            "whether it has lost blocks cannot be told");
         } else if (isItself && HasAny(letGo->blocks, look.blocks) &&
-                   letGo->sent.insert(static_cast<uint32_t>(look.status.inode)).second) {
+                   inodes.insert(static_cast<uint32_t>(look.status.inode)).second) {
             neighbours.push_back(BatchFileOf(file.relativePath, look));
         }
     }

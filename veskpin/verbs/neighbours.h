@@ -23,6 +23,9 @@ public:
     // A request to let files go was sent.
     void Note(const RequestBatch &batch, const World &world);
 
+    // A request of neighbours was sent.
+    void NoteAgain(const RequestBatch &batch);
+
     // Sends the recorded files that share blocks with those, as they are now, to be pinned again.
     void Send(const std::string &configPath, ChangeRun &run);
 
@@ -39,7 +42,7 @@ private:
         BlockSet blocks;
         BlockSet owed;                       // marked before, or to be by a stored pin
         std::unordered_set<uint32_t> inodes; // low 32 bits
-        std::unordered_set<uint32_t> sent;   // of neighbours: a path may be known more than once
+        std::unordered_set<uint32_t> again;  // of neighbours that were sent
     };
     static void FindLost(const Volume &volume, LetGo *letGo);
     void SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run);

@@ -89,7 +89,9 @@ public:
         const bool isShort = unpins.End() == TalkEnd::TimeOver;
         ChangeRun pins(settings_, kRequestPinFiles, ChangePace::AtOnce, isShort ? soon : deadline_,
                        progress, world_.errors,
-                       {[this](const ChangedFile &file) { TellNeighbour(file); }, {}, {}});
+                       {[this](const ChangedFile &file) { TellNeighbour(file); },
+                        {},
+                        [this](const RequestBatch &batch) { neighbours_.NoteAgain(batch); }});
         SendNeighbours(pins, progress);
         unpins.Finish();
         pins.Finish();
