@@ -108,10 +108,12 @@ bool ChangeRun::MaySendTo(const std::string &mountPath) {
 }
 
 void ChangeRun::Skip(const RequestBatch &batch, SkipReason reason) {
+    if (!hooks_.skip) {
+        Tell({batch}, ChangeReason::NeedsRepair);
+        return;
+    }
     for (const BatchFile &file : batch.files) {
-        const std::string path = VolumePath(batch.mountPath, file.relativePath);
-        hooks_.skip ? hooks_.skip(path, reason)
-                    : hooks_.tell({path, std::nullopt, ChangeReason::NeedsRepair});
+        hooks_.skip(VolumePath(batch.mountPath, file.relativePath), reason);
         progress_.Done(1, file.sectors);
     }
 }

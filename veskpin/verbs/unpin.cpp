@@ -155,9 +155,9 @@ private:
     }
 
     void Tell(const ChangedFile &file) {
-        view_.Put(file);
-        if (file.reason == ChangeReason::NotTaken) {
-            told_.insert(file.path); // it may be a neighbour of what was sent
+        // One that was not sent may be a neighbour of what was.
+        if (file.reason != ChangeReason::NotTaken || told_.insert(file.path).second) {
+            view_.Put(file);
         }
     }
 
