@@ -41,25 +41,37 @@ void Redirect(const char *path, int fd) {
     }
 }
 
-[[noreturn]] void Become(const Program &program, const std::vector<std::string> &arguments,
-                         const Fault &fault) {
-    Redirect(kOutputPath, STDOUT_FILENO);
-    dup2(STDOUT_FILENO, STDERR_FILENO);
-    Redirect(kReportPath, kReportFd);
-    setenv("LD_PRELOAD", program.preload.c_str(), 1);
+[[noreturn]] void Become(const Command &command, const Fault &fault) {
+    Redirect(command.output.c_str(), STDOUT_FILENO);
+    if (command.errors.empty()) {
+        dup2(STDOUT_FILENO, STDERR_FILENO);
+    } else {
+        Redirect(command.errors.c_str(), STDERR_FILENO);
+    }
+    if (!command.report.empty()) {
+        Redirect(command.report.c_str(), kReportFd);
+    }
+    if (!command.preload.empty()) {
+        setenv("LD_PRELOAD", command.preload.c_str(), 1);
+    }
     if (!fault.kind.empty()) {
         setenv("VESK_FAIL_CALL", fault.kind.c_str(), 1);
         setenv("VESK_FAIL_NUMBER", std::to_string(fault.number).c_str(), 1);
         setenv("VESK_FAIL_ERRNO", std::to_string(fault.error).c_str(), 1);
     }
-    std::vector<char *> words = {const_cast<char *>("veskcachepinfiletool"),
-                                 const_cast<char *>("--stdout")};
-    for (const std::string &argument : arguments) {
-        words.push_back(const_cast<char *>(argument.c_str()));
+    std::vector<char *> words;
+    for (const std::string &word : command.words) {
+        words.push_back(const_cast<char *>(word.c_str()));
     }
     words.push_back(nullptr);
-    execv(program.tool.c_str(), words.data());
+    execv(words.front(), words.data());
     _exit(127);
+}
+
+Command ToolCommand(const Program &program, const std::vector<std::string> &arguments) {
+    Command command{{program.tool, "--stdout"}, program.preload, kOutputPath, "", kReportPath};
+    command.words.insert(command.words.end(), arguments.begin(), arguments.end());
+    return command;
 }
 
 std::string TaskPath(pid_t pid, const std::string &rest) {
@@ -86,9 +98,11 @@ int CountDescriptors(pid_t pid) {
 } // namespace
 
 Child::Child(const Program &program, const std::vector<std::string> &arguments, const Fault &fault)
-    : pid_(fork()) {
+    : Child(ToolCommand(program, arguments), fault) {}
+
+Child::Child(const Command &command, const Fault &fault) : command_(command), pid_(fork()) {
     if (pid_ == 0) {
-        Become(program, arguments, fault);
+        Become(command_, fault);
     }
     if (pid_ < 0) {
         perror("fork");
@@ -104,6 +118,9 @@ Child::~Child() {
 }
 
 bool Child::HasEnded() const {
+    if (pid_ <= 0) {
+        return true;
+    }
     siginfo_t info = {};
     return waitid(P_PID, static_cast<id_t>(pid_), &info, WEXITED | WNOHANG | WNOWAIT) != 0 ||
            info.si_pid == pid_;
@@ -126,9 +143,7 @@ bool Child::AwaitHandler() const {
 bool Child::IsQuiet() const {
     // The receiver, the first thread, comes first: before it waits it has made the others and woken
     // the worker for what it has stored.
-    const std::string receiver = std::to_string(pid_);
-    if (!IsInCall(pid_, receiver, {kMessageWait}) &&
-        WorldRead(TaskPath(pid_, receiver + "/stat")).find(") Z ") == std::string::npos) {
+    if (!IsReceiverWaiting()) {
         return false;
     }
     // The worker is the first of the others; where it has ended that is one that waits for
@@ -143,6 +158,15 @@ bool Child::IsQuiet() const {
     }
     return IsInCall(pid_, std::to_string(worker == 0 ? pid_ : worker),
                     {kRequestWait, kSignalWait, kMessageWait});
+}
+
+bool Child::HasFirstThreadEnded() const {
+    const std::string stat = TaskPath(pid_, std::to_string(pid_) + "/stat");
+    return WorldRead(stat).find(") Z ") != std::string::npos;
+}
+
+bool Child::IsReceiverWaiting() const {
+    return IsInCall(pid_, std::to_string(pid_), {kMessageWait}) || HasFirstThreadEnded();
 }
 
 bool Child::AwaitQuiet() const {
@@ -202,10 +226,14 @@ long Child::LiveAllocations() const {
 }
 
 std::string Child::Report() const {
-    return WorldRead(kReportPath);
+    return WorldRead(command_.report);
 }
 
 std::string Child::Output() const {
-    return WorldRead(kOutputPath);
+    return WorldRead(command_.output);
+}
+
+std::string Child::Errors() const {
+    return WorldRead(command_.errors);
 }
 } // namespace vesk

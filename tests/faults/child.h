@@ -1,4 +1,4 @@
-// The tool as a child process with one call that fails.
+// A program as a child process: the tool with one call that fails, or any other.
 #pragma once
 
 #include "tests/faults/scenario.h"
@@ -8,10 +8,20 @@
 #include <vector>
 
 namespace vesk {
+// What is run, and the files that it writes to.
+struct Command {
+    std::vector<std::string> words; // a path and its arguments
+    std::string preload;            // empty: nothing
+    std::string output;             // standard output
+    std::string errors;             // standard error; empty: to the same
+    std::string report;             // what the preloaded object writes; empty: nothing
+};
+
 class Child {
 public:
-    // Starts it; messages go to its standard output.
+    // Starts the tool; messages go to its standard output.
     Child(const Program &program, const std::vector<std::string> &arguments, const Fault &fault);
+    explicit Child(const Command &command, const Fault &fault = {});
     ~Child();
     Child(const Child &) = delete;
     Child &operator=(const Child &) = delete;
@@ -26,6 +36,9 @@ public:
     int Descriptors(int enough) const;
     long MemoryKiB() const;        // resident
     void Signal(int number) const; // nothing once AwaitEnd has told its status
+    bool HasEnded() const;
+    bool HasFirstThreadEnded() const; // the others may go on
+    bool IsReceiverWaiting() const;   // for the next message; true when it has ended
     // Exit status, 128 + the signal, or -1 when it has not ended within five minutes; it is killed
     // then.
     int AwaitEnd();
@@ -33,10 +46,11 @@ public:
     long LiveAllocations() const; // at its orderly end; 0 where there was none
     std::string Report() const;   // what the preloaded object wrote
     std::string Output() const;
+    std::string Errors() const;
 
 private:
-    bool HasEnded() const;
     bool IsQuiet() const;
+    Command command_;
     pid_t pid_ = -1;
 };
 } // namespace vesk

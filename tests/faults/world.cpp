@@ -118,6 +118,13 @@ bool WorldSendPin(const std::string &paths, bool waiting) {
     return msgsnd(Queue(), &message, sizeof(message.record), waiting ? 0 : IPC_NOWAIT) == 0;
 }
 
+bool WorldSendPending(bool isPending) {
+    Message message;
+    message.record.type = isPending ? 4 : 5;
+    strcpy(message.record.mountPath, "/volume1");
+    return msgsnd(Queue(), &message, sizeof(message.record), 0) == 0;
+}
+
 void WorldAwaitQueue() {
     while (Queue() == -1) {
         usleep(1000);

@@ -20,6 +20,8 @@ int WorldMessagesLeft();     // those that are still on the queue
 // it must not wait. Needs a queue, which WorldAwaitQueue waits for.
 bool WorldSendPin(const std::string &paths, bool waiting);
 void WorldAwaitQueue();
+// The same for the message that begins, or ends, the volume's pending state.
+bool WorldSendPending(bool isPending);
 
 long WorldRecords(const char *config); // pinned files of /volume1 in the document
 
