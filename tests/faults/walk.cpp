@@ -270,6 +270,7 @@ void Walk::Count(const Scene &scene, const std::vector<StoredFiles> &requests) {
     }
     for (const Client &client : clients_) {
         ++counts_["status " + std::to_string(client.attempt.status)];
+        counts_["clients ended"] += client.attempt.status > 128 ? 1 : 0;
         counts_["neighbours pinned again"] +=
             client.attempt.output.find("\"repinned\":[\"") != std::string::npos ? 1 : 0;
     }

@@ -39,9 +39,8 @@ std::string Shortened(const std::string &text) {
 
 bool IsCountMissing(const Walk &walk) {
     bool isMissing = false;
-    for (const char *name :
-         {"neighbours pinned again", "requests given up", "services killed", "caches lost",
-          "status 0", "status 1", "status 4", "status 130", "status 137", "status 143"}) {
+    for (const char *name : {"neighbours pinned again", "requests given up", "services killed",
+                             "caches lost", "clients ended", "status 0", "status 1", "status 4"}) {
         const auto count = walk.Counts().find(name);
         if (count == walk.Counts().end() || count->second == 0) {
             printf("never happened: %s\n", name);
