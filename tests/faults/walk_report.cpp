@@ -86,6 +86,10 @@ Names StatesOf(const Case &the, const std::string &path) {
             add(*pins, the.begin.disk);
             add(*pins, the.disk);
         }
+        // The bitmap file is written before the driver has it.
+        Pins half = the.after;
+        half.driverHasBitmap = the.begin.pins.driverHasBitmap;
+        add(half, the.disk);
     }
     if (isSent || WishIsStored(the.begin, path)) {
         states.insert(Underway(the, path));
