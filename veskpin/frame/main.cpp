@@ -34,7 +34,9 @@ int main(int argc, char *argv[]) {
         fprintf(stderr, "veskpin: %s\n", TextEscaped(error.what()).c_str());
     }
     if (!out.Flush()) {
-        fprintf(stderr, "veskpin: standard output: %s\n", strerror(errno));
+        if (errno != EINTR) { // which nobody would read either
+            fprintf(stderr, "veskpin: standard output: %s\n", strerror(errno));
+        }
         status = status == ExitStatus::Done ? ExitStatus::NotSo : status;
     }
     return static_cast<int>(status);

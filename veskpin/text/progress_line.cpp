@@ -2,6 +2,7 @@
 
 #include "base/clock.h"
 
+#include <poll.h>
 #include <unistd.h>
 
 namespace vesk {
@@ -47,8 +48,11 @@ void ProgressLine::Write(const std::string &text) {
 }
 
 void ProgressLine::Put(const std::string &text) const {
-    // A line that is lost harms nobody.
-    const ssize_t written = write(fd_, text.data(), text.size());
-    static_cast<void>(written);
+    // A line that is lost harms nobody, and a reader who sleeps must not keep the work waiting.
+    pollfd output{fd_, POLLOUT, 0};
+    if (poll(&output, 1, 0) > 0) {
+        const ssize_t written = write(fd_, text.data(), text.size());
+        static_cast<void>(written);
+    }
 }
 } // namespace vesk

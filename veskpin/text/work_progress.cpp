@@ -31,13 +31,15 @@ void WorkProgress::Done(uint64_t files, uint64_t sectors) {
 }
 
 void WorkProgress::End() {
-    if (line_.Form() == ProgressForm::Json && line_.HasWritten()) {
+    if (line_.Form() == ProgressForm::Json && line_.HasWritten() && files_ != filesTold_) {
         line_.Write(JsonText());
+        filesTold_ = files_;
     }
 }
 
 void WorkProgress::Tick() {
     if (line_.IsDue()) {
+        filesTold_ = files_;
         line_.Write(line_.Form() == ProgressForm::Json ? JsonText() : LineText());
     }
 }

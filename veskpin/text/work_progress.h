@@ -29,7 +29,7 @@ public:
     // So many files, with so many sectors together, have come to rest.
     void Done(uint64_t files, uint64_t sectors);
 
-    // Tells it once more to programs that were told.
+    // Tells the end to programs that were told something else.
     void End();
 
     // Tells it when it is time to; for whoever waits, now and then.
@@ -44,5 +44,6 @@ private:
     Work work_;
     uint64_t files_ = 0;
     uint64_t sectors_ = 0;
+    uint64_t filesTold_ = 0; // in the last line
 };
 } // namespace vesk

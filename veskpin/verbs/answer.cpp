@@ -1,9 +1,11 @@
 #include "verbs/answer.h"
 
+#include "act/interrupt.h"
 #include "text/escape.h"
 
+#include <unistd.h>
+
 #include <algorithm>
-#include <cstdio>
 #include <cstdlib>
 
 namespace vesk {
@@ -47,10 +49,13 @@ void AnswerEnd(JsonWriter &json, TextSink &out, const LookErrors &errors) {
 }
 
 void AnswerErrors(const LookErrors &errors) {
+    TextSink told(STDERR_FILENO);
+    told.GiveUpWhen([] { return InterruptSignal() != 0; });
     for (const LookError &error : Shown(errors)) {
         const std::string path = error.path.empty() ? "" : TextEscaped(error.path) + ": ";
-        fprintf(stderr, "veskpin: %s%s\n", path.c_str(), TextEscaped(error.text).c_str());
+        told.Put("veskpin: " + path + TextEscaped(error.text) + "\n");
     }
+    told.Flush();
 }
 
 std::string TableRow(const std::vector<std::string> &cells, const std::vector<int> &widths) {
