@@ -25,6 +25,18 @@ setup() {
     [ ! -e "$KEY_FILE" ]
 }
 
+@test "what needs nothing is told as it is, also behind what was not sent" {
+    many 12
+    random z 10K conv=fsync
+    start_service
+    look 0 pin /volume1/z
+    stop_service
+    look 4 pin /volume1/many /volume1/z
+    same 'pinned null' "$(state_of /volume1/z) $(reason_of /volume1/z)"
+    same '["unpinned","not-taken"]' \
+        "$(answer '[.files[] | select(.path != "/volume1/z") | [.state,.reason]] | unique[]')"
+}
+
 @test "a time limit ends the wait, and what was sent is told" {
     start_service
     set_pending /volume1
@@ -50,21 +62,46 @@ setup() {
     stop_service
 }
 
-@test "an interrupted one whose answer nobody reads ends all the same" {
+# A FIFO that is full, and that nobody reads.
+unread() {
+    rm -f /tmp/unread
+    mkfifo /tmp/unread
+    exec 7<>/tmp/unread
+    dd if=/dev/zero of=/tmp/unread bs=4096 oflag=nonblock status=none 2>/dev/null || true
+}
+
+ends_unread() { # COMMAND...: whose SIGINT ends it, though
     local status=0
     start_service
     set_pending /volume1
     wait_until messages_are_taken
-    mkfifo /tmp/unread
-    exec 7<>/tmp/unread
-    dd if=/dev/zero of=/tmp/unread bs=4096 oflag=nonblock status=none 2>/dev/null || true
-    in_background /tmp/unread pin /volume1/d
+    unread
+    "$@" &
+    PIN_PID=$!
     wait_until request_is_stored 0
     kill -s INT "$PIN_PID"
     wait "$PIN_PID" || status=$?
     exec 7<&-
     same 130 "$status"
     stop_service
+}
+
+answer_unread() {
+    close_descriptors
+    exec "$BIN/veskpin" --config "$CONF" --json pin /volume1/d >/tmp/unread
+}
+
+@test "an interrupted one whose answer nobody reads ends all the same" {
+    ends_unread answer_unread
+}
+
+errors_unread() {
+    close_descriptors
+    exec "$BIN/veskpin" --config "$CONF" --progress json pin /volume1/d 2>/tmp/unread >/dev/null
+}
+
+@test "so does one whose progress and errors nobody reads" {
+    ends_unread errors_unread
 }
 
 @test "a service that ends is told, with the paths" {

@@ -80,6 +80,9 @@ $(state_of /volume1/d/below/c) $(reason_of /volume1/d/below/c)"
     look 0 pin --reserve 0 /volume1/big
     look 0 pin --force /volume1/d
     holds_just big d/a d/b d/below/c
+    # Nothing to be sent needs no room.
+    look 0 pin /volume1/d
+    same '[0,3,0]' "$(left)"
     stop_service
 }
 

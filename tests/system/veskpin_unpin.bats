@@ -85,6 +85,10 @@ $(reason_of /volume1/d/b) $(state_of /volume1/d/below/c) $(reason_of /volume1/d/
     wait_until messages_are_taken
     look 0 unpin --no-wait /volume1/d
     same '["unpinning",null]' "$(answer '[.files[] | [.state,.reason]] | unique[]')"
+    # Sent once.
+    look 0 unpin --no-wait /volume1/d
+    same '[0,3,0]' "$(left)"
+    same '["unpinning",null]' "$(answer '[.files[] | [.state,.reason]] | unique[]')"
     stop_service
 }
 
@@ -173,5 +177,14 @@ grows_meanwhile() {
     wait_until request_is_stored 1
     look 0 unpin --no-wait /volume1/small/1
     same '[2,["/volume1/small/2"]]' "$(answer '[.requestsSent, .repinned]')"
+    stop_service
+}
+
+@test "a link in a recorded folder's place is no doubt about what else has lost a block" {
+    start_service
+    look 0 pin /volume1/d
+    mv d/below d/away
+    ln -s away d/below
+    look 0 unpin /volume1/d/a
     stop_service
 }

@@ -35,6 +35,11 @@ int FileStatAt(int folder, const char *name, FileStat *status) {
     return 0;
 }
 
+bool FileIsNowhere(int error) {
+    return error == ENOENT || error == ENOTDIR || error == ENAMETOOLONG || error == ELOOP ||
+           error == EXDEV;
+}
+
 FileLooker::FileLooker(const std::string &mountPath)
     : mountPath_(mountPath), root_(open(mountPath.c_str(), kOpenForReading | O_DIRECTORY)) {
     FileStat status{};

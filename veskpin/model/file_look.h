@@ -40,6 +40,10 @@ struct FileLook {
     std::vector<BitRun> blocks; // FileBlocksOf the table
 };
 
+// Whether a look ended so since no file of the volume is at the path: nothing, or a link or another
+// file system on the way.
+bool FileIsNowhere(int error);
+
 class FileLooker {
 public:
     explicit FileLooker(const std::string &mountPath);

@@ -58,12 +58,16 @@ std::string PathOf(const std::string &folder, const std::string &name) {
     return path;
 }
 
-// Gives the entries of a folder to `visit`, and those that are folders to `below`. False: `visit`
-// wants no more.
+// Gives the entries of a folder to `visit`, and those that are folders to `below`. False: nobody
+// wants more.
 bool WalkFolder(const FileLooker &looker, int folder, const std::string &here,
                 const std::vector<std::string> &names,
-                const std::function<bool(const WalkEntry &)> &visit, Level *below) {
+                const std::function<bool(const WalkEntry &)> &visit,
+                const std::function<bool()> &goesOn, Level *below) {
     for (const std::string &name : names) {
+        if (goesOn && !goesOn()) {
+            return false;
+        }
         const std::string path = PathOf(here, name);
         FileStat status{};
         const int failure = FileStatAt(folder, name.c_str(), &status);
@@ -87,14 +91,15 @@ bool WalkFolder(const FileLooker &looker, int folder, const std::string &here,
 } // namespace
 
 void PathWalk(const FileLooker &looker, const std::string &folder,
-              const std::function<bool(const WalkEntry &)> &visit) {
+              const std::function<bool(const WalkEntry &)> &visit,
+              const std::function<bool()> &goesOn) {
     if (looker.Error() != 0) {
         visit({folder, WalkKind::Unreadable, {}, looker.Error()});
         return;
     }
     // Names by levels, not paths: users make folders of any number in folders of any depth.
     std::vector<Level> levels{{"", {folder}}};
-    while (!levels.empty()) {
+    while (!levels.empty() && (!goesOn || goesOn())) {
         Level &level = levels.back();
         if (level.folders.empty()) {
             levels.pop_back();
@@ -113,7 +118,7 @@ void PathWalk(const FileLooker &looker, const std::string &folder,
             return;
         }
         Level next{here, {}};
-        if (!WalkFolder(looker, fd.Get(), here, names, visit, &next)) {
+        if (!WalkFolder(looker, fd.Get(), here, names, visit, goesOn, &next)) {
             return;
         }
         levels.push_back(std::move(next));

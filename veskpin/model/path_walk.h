@@ -25,7 +25,9 @@ struct WalkEntry {
 };
 
 // `folder` is relative to the looker's volume, empty for all of it. Memory: the names of one folder
-// and of the folders that wait. It ends early when `visit` says false.
+// and of the folders that wait. It ends early when `visit` says false, or `goesOn`, which may be
+// empty and is asked for folders, too.
 void PathWalk(const FileLooker &looker, const std::string &folder,
-              const std::function<bool(const WalkEntry &)> &visit);
+              const std::function<bool(const WalkEntry &)> &visit,
+              const std::function<bool()> &goesOn = {});
 } // namespace vesk

@@ -139,7 +139,6 @@ std::optional<KnownFile> KnownFileByInode(const KnownFiles &known, uint64_t inod
         }
         if (file.stored != kRequestUnknown && file.storedInode.value_or(wanted) == wanted) {
             found->stored = file.stored;
-            found->storedInode = file.storedInode;
         }
     }
     return found;

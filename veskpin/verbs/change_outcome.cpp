@@ -8,6 +8,10 @@
 
 namespace vesk {
 namespace {
+FileState WantedOf(const RequestBatch &batch) {
+    return batch.type == kRequestPinFiles ? FileState::Pinned : FileState::Unpinned;
+}
+
 // Whether it is what was asked for, or is on the way to it.
 bool IsDone(bool isPin, FileState state) {
     return isPin ? state == FileState::Pinned || state == FileState::Pinning
@@ -18,7 +22,7 @@ bool IsDone(bool isPin, FileState state) {
 bool IsGone(FileLooker &looker, const BatchFile &file) {
     FileStat status{};
     const int error = looker.Stat(file.relativePath, &status);
-    return error == ENOENT || error == ENOTDIR ||
+    return FileIsNowhere(error) ||
            (error == 0 && static_cast<uint32_t>(status.inode) != file.inode);
 }
 
@@ -78,9 +82,11 @@ void TellBatch(World &world, const RequestBatch &batch, std::optional<ChangeReas
     FileLooker looker(batch.mountPath);
     const BatchFile *current = nullptr;
     const VolumeLister::Visit visit = [&](const ListedFile &file) {
-        const auto why = reason || !file.state ? reason
-                                               : ReasonOf(batch, *current, volume->known, looker,
-                                                          *file.state, file.figures);
+        const bool isSo = reason == ChangeReason::NotTaken && file.state == WantedOf(batch);
+        const auto why = isSo                    ? std::nullopt
+                         : reason || !file.state ? reason
+                                                 : ReasonOf(batch, *current, volume->known, looker,
+                                                            *file.state, file.figures);
         tell({file.path, file.state, why});
     };
     VolumeLister lister(*volume, std::nullopt, world, visit);

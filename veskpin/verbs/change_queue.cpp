@@ -17,7 +17,8 @@ void TellNotSent(const SpooledFile &spooled, ChangeView &view) {
     const auto state = spooled.state == kNoState
                            ? std::nullopt
                            : std::optional(static_cast<FileState>(spooled.state));
-    view.Put({PathOf(spooled), state, ChangeReason::NotTaken});
+    const bool isSo = static_cast<QueueAction>(spooled.action) == QueueAction::TellOnly;
+    view.Put({PathOf(spooled), state, isSo ? std::nullopt : std::optional(ChangeReason::NotTaken)});
 }
 } // namespace
 

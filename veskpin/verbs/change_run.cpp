@@ -146,9 +146,10 @@ void ChangeRun::Send(const RequestBatch &batch, std::vector<BatchFile> *changed)
 }
 
 void ChangeRun::SendNow(RequestBatch batch) {
-    TalkEnd sent = talk_.Send(batch);
-    while (sent == TalkEnd::Ended && AwaitRestart() && AwaitTurn()) {
-        sent = talk_.Send(batch);
+    const TalkEnd sent = talk_.Send(batch);
+    if (sent == TalkEnd::Ended && AwaitRestart()) {
+        Send(batch, nullptr); // much may have changed meanwhile
+        return;
     }
     if (sent != TalkEnd::Done) {
         end_ = end_ == TalkEnd::Done ? sent : end_;

@@ -49,6 +49,9 @@ public:
     // The same, and waits until all is carried out unless told not to.
     void Finish();
 
+    // The service has ended, and no other one comes: nothing is sent or waited for any more.
+    void GiveUp() { end_ = TalkEnd::Ended; }
+
     uint64_t RequestsSent() const { return sent_; }
     // Done, or why not everything was carried out.
     TalkEnd End() const { return end_; }

@@ -1,9 +1,9 @@
 #include "verbs/neighbours.h"
 
+#include "act/interrupt.h"
 #include "bitmap/pin_bitmap.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <optional>
 
 namespace vesk {
@@ -30,10 +30,6 @@ void Add(BlockSet *set, const std::optional<BlockSet> &more) {
     for (size_t i = 0; more && i < std::min(set->size(), more->size()); ++i) {
         (*set)[i] = static_cast<unsigned char>((*set)[i] | (*more)[i]);
     }
-}
-
-bool IsGone(int error) {
-    return error == ENOENT || error == ENOTDIR;
 }
 } // namespace
 
@@ -103,6 +99,11 @@ void Neighbours::SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run) 
     std::unordered_set<uint32_t> inodes = letGo->again; // a path may be known more than once
     FileLooker looker(volume.mountPath);
     for (const KnownFile &file : world.known.files) {
+        if (!InterruptPause(0)) {
+            LookUnknownAdd(&errors_, volume.mountPath,
+                           "not every file that may have lost a block was looked at");
+            break;
+        }
         // One that is being let go by another request stays let go.
         if (file.stored == kRequestUnpinFiles ||
             (file.inode && letGo->inodes.count(*file.inode) > 0)) {
@@ -114,7 +115,7 @@ void Neighbours::SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run) 
         }
         const bool isItself = look.error == 0 && IsToStay(file, look) &&
                               letGo->inodes.count(static_cast<uint32_t>(look.status.inode)) == 0;
-        if ((look.error != 0 && !IsGone(look.error)) || (isItself && !look.hasExtents)) {
+        if ((look.error != 0 && !FileIsNowhere(look.error)) || (isItself && !look.hasExtents)) {
             LookUnknownAdd(&errors_, VolumePath(volume.mountPath, file.relativePath),
                            "whether it has lost blocks cannot be told");
         } else if (isItself && HasAny(letGo->blocks, look.blocks) &&

@@ -12,6 +12,7 @@
 #include <map>
 #include <string>
 #include <unordered_set>
+#include <utility>
 #include <vector>
 
 namespace vesk {
@@ -34,8 +35,8 @@ public:
     void SendOfLost(const std::string &configPath, ChangeRun &run);
 
     uint64_t Count() const { return count_; }
-    // Absolute paths of those that could not be sent any more.
-    const std::vector<std::string> &Unsent() const { return unsent_; }
+    // Absolute paths of those that could not be sent any more, once each.
+    std::vector<std::string> TakeUnsent() { return std::exchange(unsent_, {}); }
 
 private:
     struct LetGo {
@@ -47,7 +48,7 @@ private:
     static void FindLost(const Volume &volume, LetGo *letGo);
     void SendOf(const WorldVolume &world, LetGo *letGo, ChangeRun &run);
     LookErrors &errors_;
-    bool isAllDone_ = false; // who is pinned now has lost nothing
+    bool isAllDone_ = false; // what was sent is carried out, or given up
     uint64_t count_ = 0;
     std::vector<std::string> unsent_;
     std::map<std::string, LetGo> volumes_; // by mount path

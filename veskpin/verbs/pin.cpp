@@ -11,25 +11,33 @@
 
 namespace vesk {
 namespace {
+// What needs nothing to be sent always fits.
+bool Fits(const PlannedVolume &volume) {
+    return volume.figures.filesToSend == 0 || volume.figures.fits == true;
+}
+
+bool Fits(const Plan &plan) {
+    return std::all_of(plan.volumes.begin(), plan.volumes.end(),
+                       [](const PlannedVolume &volume) { return Fits(volume); });
+}
+
 // What keeps the whole call from being sent.
 void NoteWhatDoesNotFit(const Plan &plan, LookErrors *errors) {
     for (const PlannedVolume &volume : plan.volumes) {
         const PlanFigures &figures = volume.figures;
+        if (Fits(volume)) {
+            continue;
+        }
         if (!figures.fits) {
             LookUnknownAdd(errors, volume.mountPath,
                            "whether all fits is not known; nothing is sent");
-        } else if (!*figures.fits) {
+        } else {
             const auto more = static_cast<uint64_t>(llabs(*figures.headroom));
             LookErrorAdd(errors, volume.mountPath,
                          UnitsOfBytes(more << kBitmapByteShift) +
                              " more than fits with the reserve; nothing is sent");
         }
     }
-}
-
-bool Fits(const Plan &plan) {
-    return std::all_of(plan.volumes.begin(), plan.volumes.end(),
-                       [](const PlannedVolume &volume) { return volume.figures.fits == true; });
 }
 
 Work WorkOf(const Plan &plan) {

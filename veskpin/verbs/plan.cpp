@@ -47,7 +47,7 @@ public:
     }
 
     void AddFolder(const std::string &folder) {
-        PathWalk(looker_, folder, [&](const WalkEntry &entry) {
+        const auto visit = [&](const WalkEntry &entry) {
             switch (entry.kind) {
             case WalkKind::File: AddFile(entry.relativePath, &entry.status); break;
             case WalkKind::Other: Skip(entry.relativePath, SkipReason::NotRegular); break;
@@ -58,13 +58,14 @@ public:
                 Skip(entry.relativePath, SkipReasonOfError(entry.error));
                 break;
             }
-            return GoesOn();
-        });
+            return true;
+        };
+        PathWalk(looker_, folder, visit, [this] { return GoesOn(); });
     }
 
     PlannedVolume Total(unsigned reservePercent) {
         for (const KnownFile &known : world_.known.files) {
-            if (known.stored == kRequestPinFiles) {
+            if (known.stored == kRequestPinFiles && GoesOn()) {
                 sum_.AddStored(looker_.Look(known.relativePath));
                 progress_.Step();
             }
@@ -76,7 +77,7 @@ private:
     // A stored request to let a file go takes the blocks of its neighbours along.
     void NoteWhatIsLetGo() {
         for (const KnownFile &known : world_.known.files) {
-            if (known.stored != kRequestUnpinFiles) {
+            if (known.stored != kRequestUnpinFiles || !GoesOn()) {
                 continue;
             }
             if (letGo_.empty()) {
@@ -138,10 +139,14 @@ std::string FolderText(const std::string &path) {
 }
 
 // Without those that are, or lie below, another one of the same volume.
-std::vector<Target> ResolveOnce(const World &world, const std::vector<std::string> &paths) {
+std::vector<Target> ResolveOnce(const World &world, const std::vector<std::string> &paths,
+                                const PlanHooks &hooks) {
     std::vector<Target> targets;
     targets.reserve(paths.size());
     for (const std::string &path : paths) {
+        if (hooks.goesOn && !hooks.goesOn()) {
+            break;
+        }
         targets.push_back(TargetResolve(world, path));
     }
     std::stable_sort(targets.begin(), targets.end(), [](const Target &a, const Target &b) {
@@ -186,7 +191,7 @@ Plan PlanLook(World &world, const std::vector<std::string> &paths, unsigned rese
         planners.push_back(std::make_unique<VolumePlanner>(world, volume, plan, progress, hooks));
         return *planners.back();
     };
-    const std::vector<Target> targets = ResolveOnce(world, paths);
+    const std::vector<Target> targets = ResolveOnce(world, paths, hooks);
     size_t failed = 0;
     for (const Target &target : targets) {
         if (!CanBePlanned(target)) {

@@ -95,8 +95,7 @@ bool PlanSum::Add(const std::string &relativePath, const FileLook &look, bool is
 
 void PlanSum::AddStored(const FileLook &look) {
     // A file that is gone gets no blocks; of one that cannot be looked at nobody knows.
-    const bool isGone = look.error == ENOENT || look.error == ENOTDIR;
-    isStoredKnown_ = isStoredKnown_ && (isGone || look.hasExtents);
+    isStoredKnown_ = isStoredKnown_ && (FileIsNowhere(look.error) || look.hasExtents);
     for (const BitRun &run : look.blocks) {
         BlockSetAdd(&stored_, run);
     }

@@ -27,10 +27,13 @@ void NoteFailedPath(const Target &target, LookErrors *errors) {
     }
 }
 
-// Those at and below the paths.
-FilesOf FilesBelow(World &world, const std::vector<std::string> &paths) {
+// Those at and below the paths, as far as there is time.
+FilesOf FilesBelow(World &world, const std::vector<std::string> &paths, const Deadline &deadline) {
     FilesOf files;
     for (const std::string &path : paths) {
+        if (InterruptSignal() != 0 || deadline.IsOver()) {
+            break;
+        }
         const Target target = TargetResolve(world, path);
         if (target.isWithoutCache) {
             LookUnknownAdd(&world.errors, target.path, "lies on a volume without a cache");
@@ -68,7 +71,7 @@ public:
           view_(view), neighbours_(world_.errors) {}
 
     ExitStatus Carry() {
-        for (const auto &[volume, indexes] : FilesBelow(world_, settings_.paths)) {
+        for (const auto &[volume, indexes] : FilesBelow(world_, settings_.paths, deadline_)) {
             LookAt(*volume, indexes);
         }
         if (InterruptSignal() != 0 || deadline_.IsOver() || queue_.Error() != 0) {
@@ -93,11 +96,19 @@ public:
                         {},
                         [this](const RequestBatch &batch) { neighbours_.NoteAgain(batch); }});
         SendNeighbours(pins, progress);
+        // The next service is waited for once.
+        if (pins.End() == TalkEnd::Ended) {
+            unpins.GiveUp();
+        }
         unpins.Finish();
+        if (unpins.End() == TalkEnd::Ended) {
+            pins.GiveUp();
+        }
         pins.Finish();
         if (settings_.waits && unpins.End() == TalkEnd::Done && pins.End() == TalkEnd::Done) {
             neighbours_.SendOfLost(settings_.configPath, pins);
             pins.Finish();
+            TellUnsent();
         }
         queue_.TellRest(told_, view_, &world_.errors);
         ChangeNoteEnd(unpins, &world_.errors);
@@ -134,7 +145,9 @@ private:
             if (!volume.isMounted) {
                 view_.Put({path, std::nullopt, std::nullopt});
             } else if (isItself) {
-                queue_.Put(volume.mountPath, file->relativePath, look, state, QueueAction::Send);
+                const bool isUnderway = state == FileState::Unpinning && !settings_.waits;
+                queue_.Put(volume.mountPath, file->relativePath, look, state,
+                           isUnderway ? QueueAction::TellOnly : QueueAction::Send);
             } else {
                 view_.Put({path, state, ChangeReason::NeedsRepair});
             }
@@ -149,7 +162,11 @@ private:
         progress.More(neighbours_.Count());
         pins.Flush();
         InterruptGrace(0);
-        for (const std::string &path : neighbours_.Unsent()) {
+        TellUnsent();
+    }
+
+    void TellUnsent() {
+        for (const std::string &path : neighbours_.TakeUnsent()) {
             TellNeighbour({path, std::nullopt, ChangeReason::NotTaken});
         }
     }

@@ -95,6 +95,27 @@ TEST_F(PathWalkTest, WhoWantsNoMoreGetsNoMore) {
     EXPECT_EQ(Walk("none", 1), Texts{"none: No such file or directory"});
 }
 
+TEST_F(PathWalkTest, WhoIsToEndIsAskedInFoldersWithoutFilesToo) {
+    for (const char *path : {"a/x", "b/y", "c/z"}) {
+        std::filesystem::create_directories(volume_ + "/" + path);
+    }
+    Make("d/file");
+    const FileLooker looker(volume_);
+    for (const int most : {0, 1, 4, 7, 9}) {
+        int asked = 0;
+        bool isMet = false;
+        PathWalk(
+            looker, "",
+            [&](const WalkEntry &) {
+                isMet = true;
+                return true;
+            },
+            [&] { return ++asked <= most; });
+        EXPECT_EQ(asked, most + 1);
+        EXPECT_FALSE(isMet);
+    }
+}
+
 TEST_F(PathWalkTest, AFilesStatusComesWithIt) {
     Make("a", "12345");
     const FileLooker looker(volume_);
