@@ -13,12 +13,12 @@ std::string PathOf(const SpooledFile &spooled) {
 }
 
 // It is what it was when it was looked at.
-void TellNotSent(const SpooledFile &spooled, ChangeView &view) {
+void TellNotSent(const SpooledFile &spooled, const ChangeTeller &tell) {
     const auto state = spooled.state == kNoState
                            ? std::nullopt
                            : std::optional(static_cast<FileState>(spooled.state));
     const bool isSo = static_cast<QueueAction>(spooled.action) == QueueAction::TellOnly;
-    view.Put({PathOf(spooled), state, isSo ? std::nullopt : std::optional(ChangeReason::NotTaken)});
+    tell({PathOf(spooled), state, isSo ? std::nullopt : std::optional(ChangeReason::NotTaken)});
 }
 } // namespace
 
@@ -29,14 +29,14 @@ void ChangeQueue::Put(const std::string &mountPath, const std::string &relativeP
                 state ? static_cast<uint16_t>(*state) : kNoState, static_cast<uint16_t>(action)});
 }
 
-void ChangeQueue::SendAll(ChangeRun &run, ChangeView &view) {
+void ChangeQueue::SendAll(ChangeRun &run, const ChangeTeller &tell) {
     SpooledFile spooled;
     while (run.End() == TalkEnd::Done && spool_.Take(&spooled)) {
         const auto action = static_cast<QueueAction>(spooled.action);
         if (action == QueueAction::TellOnly) {
             run.AddSettled(spooled.mountPath, spooled.file);
         } else if (action == QueueAction::CannotSend || !run.Add(spooled.mountPath, spooled.file)) {
-            TellNotSent(spooled, view);
+            TellNotSent(spooled, tell);
         }
     }
 }
@@ -47,16 +47,12 @@ void ChangeQueue::SkipAll(SkipReason reason, ChangeView &view) {
     }
 }
 
-void ChangeQueue::TellRest(const std::set<std::string> &told, ChangeView &view,
-                           LookErrors *errors) {
+void ChangeQueue::TellRest(const ChangeTeller &tell, LookErrors *errors) {
     const int64_t began = NowMs();
     uint64_t untold = 0;
     for (SpooledFile spooled; spool_.Take(&spooled);) {
-        if (told.count(PathOf(spooled)) > 0) {
-            continue;
-        }
         if (NowMs() - began < kTellMs) {
-            TellNotSent(spooled, view);
+            TellNotSent(spooled, tell);
         } else {
             ++untold;
         }

@@ -9,7 +9,6 @@
 
 #include <cstdint>
 #include <optional>
-#include <set>
 #include <string>
 
 namespace vesk {
@@ -32,14 +31,13 @@ public:
     void Close() { spool_.Rewind(); }
 
     // Until none is left, or nothing is sent any more.
-    void SendAll(ChangeRun &run, ChangeView &view);
+    void SendAll(ChangeRun &run, const ChangeTeller &tell);
 
     // Leaves all out.
     void SkipAll(SkipReason reason, ChangeView &view);
 
-    // Tells that those which are left were not sent, but for `told`: as many as a second allows,
-    // and how many more.
-    void TellRest(const std::set<std::string> &told, ChangeView &view, LookErrors *errors);
+    // Tells that those which are left were not sent: as many as a second allows, and how many more.
+    void TellRest(const ChangeTeller &tell, LookErrors *errors);
 
 private:
     FileSpool spool_;

@@ -70,16 +70,17 @@ public:
             return ExitStatusOf(world_.errors.isUnknown || plan.isAllFailed, false);
         }
         WorkProgress progress(settings_.progress, WorkOf(plan));
+        const ChangeTeller tell = [this](const ChangedFile &file) { view_.Put(file); };
         ChangeRun run(settings_, kRequestPinFiles, ChangePace::Steady, deadline_, progress,
                       world_.errors,
-                      {[this](const ChangedFile &file) { view_.Put(file); },
+                      {tell,
                        [&](const std::string &path, SkipReason reason) {
                            plan.skipped.push_back({path, reason});
                        },
                        {}});
-        queue_.SendAll(run, view_);
+        queue_.SendAll(run, tell);
         run.Finish();
-        queue_.TellRest({}, view_, &world_.errors);
+        queue_.TellRest(tell, &world_.errors);
         ChangeNoteEnd(run, &world_.errors);
         End(plan, run.RequestsSent());
         const bool isUnknown = world_.errors.isUnknown || plan.isAllFailed;

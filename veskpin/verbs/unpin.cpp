@@ -86,7 +86,7 @@ public:
                          {[this](const ChangedFile &file) { Tell(file); },
                           {},
                           [this](const RequestBatch &batch) { neighbours_.Note(batch, world_); }});
-        queue_.SendAll(unpins, view_);
+        queue_.SendAll(unpins, [this](const ChangedFile &file) { Tell(file); });
         unpins.Flush();
         const Deadline soon(kSendSeconds);
         const bool isShort = unpins.End() == TalkEnd::TimeOver;
@@ -110,7 +110,7 @@ public:
             pins.Finish();
             TellUnsent();
         }
-        queue_.TellRest(told_, view_, &world_.errors);
+        queue_.TellRest([this](const ChangedFile &file) { Tell(file); }, &world_.errors);
         ChangeNoteEnd(unpins, &world_.errors);
         ChangeNoteEnd(pins, &world_.errors);
         view_.End(unpins.RequestsSent() + pins.RequestsSent(), repinned_, world_.errors);
