@@ -52,8 +52,8 @@ TEST(CachedevCachedFileTest, FollowsWhatTheDeviceHolds) {
         EXPECT_EQ(CachedText(), "000000");
         Touch(device, {0, 9, 20});
         EXPECT_EQ(CachedText(), "010210");
-        // One gives way. Which one hangs on the daemon's threads: a block is in use until its thread
-        // has gone on after the answer.
+        // One gives way. Which one hangs on the daemon's threads: a block is in use until its
+        // thread has gone on after the answer.
         Touch(device, {1, 2});
         const std::string cached = ReadWhole(kDaemonCached);
         EXPECT_EQ(CountBits(cached), 4U);
