@@ -21,6 +21,7 @@ HIS=/volume1/photos
 his() { attacker env -C "$HIS" "$@"; }
 
 # his_files NAME...: with the folders that they need.
+# shellcheck disable=SC2016  # for his shell
 his_files() {
     his bash -eu -c 'for name in "$@"; do
         [[ $name != */* ]] || mkdir -p "./${name%/*}"
