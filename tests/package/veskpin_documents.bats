@@ -56,7 +56,7 @@ texts_of() { jq -r "$2 | strings" "$TREE/docs/schemas/veskpin-$1.schema.json"; }
         # Renamed files are not looked for.
         [ "$(texts_of "$command" "$state")" = "$(texts_of list '."$defs".file.properties.state.enum[]' | grep -vx renamed)" ]
     done
-    [ "$(texts_of pin "$reason" | xargs)" = "dropped vanished not-taken" ]
+    [ "$(texts_of pin "$reason" | xargs)" = "dropped vanished not-taken needs-repair" ]
     [ "$(texts_of unpin "$reason" | xargs)" = "dropped vanished not-taken needs-repair" ]
 }
 
