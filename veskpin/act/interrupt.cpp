@@ -2,8 +2,8 @@
 
 #include "base/clock.h"
 
-#include <poll.h>
 #include <signal.h>
+#include <sys/select.h>
 
 #include <cstdint>
 #include <ctime>
@@ -74,7 +74,8 @@ bool InterruptPause(unsigned milliseconds) {
     if (!IsPauseOver()) {
         const timespec time{static_cast<time_t>(milliseconds / 1000),
                             static_cast<long>(milliseconds % 1000) * 1000000};
-        ppoll(nullptr, 0, &time, &before);
+        // Not ppoll: its checked form takes the time for one of 32 bits where that has 64.
+        pselect(0, nullptr, nullptr, nullptr, &time, &before);
     }
     sigprocmask(SIG_SETMASK, &before, nullptr);
     return !IsPauseOver();
